@@ -1,0 +1,22 @@
+/* libmetainfo: exported per-format functions that copy a time range of the
+ * compressed audio into a new file. Times are whole seconds. */
+#ifndef METAINFO_EXTRACT_H
+#define METAINFO_EXTRACT_H
+
+#include <stdint.h>
+
+#include "records.h"
+
+#ifdef __cplusplus
+extern "C" {
+#endif
+
+typedef int32_t (*MM_AudioToFileFn)(const char* path, int startSec, int endSec, const char* outPath);
+
+/* Each audio format that can be cut declares its function here. */
+
+#ifdef __cplusplus
+}
+#endif
+
+#endif

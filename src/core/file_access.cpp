@@ -1,0 +1,245 @@
+#include "core/file_access.h"
+
+#include <atomic>
+#include <cstdio>
+#include <cstring>
+#include <new>
+
+#include "core/byte_reader.h"
+#include "core/drm.h"
+#include "core/log.h"
+
+namespace metainfo {
+namespace {
+
+struct MexHandle {
+    int drmKind = -1;
+    FILE* stream = nullptr;
+    bool hasClient = false;
+    DrmClient client{};
+    void* session = nullptr;
+    int decryptApiType = 0;
+    int64_t position = 0;
+    int64_t size = 0;
+    uint32_t generation = 0;
+};
+
+// Handle value: generation above kSlotBits, slot index + 1 below.
+constexpr int kSlotBits = 13;
+constexpr uint32_t kSlots = 4096;
+constexpr uint32_t kGenerationMask = (1u << (31 - kSlotBits)) - 1;
+constexpr int kDecryptApiContainerBased = 2;
+
+std::atomic<MexHandle*> g_slots[kSlots];
+std::atomic<uint32_t> g_generations[kSlots];
+std::atomic<uint32_t> g_nextSlot{0};
+
+int Register(MexHandle* handle) {
+    uint32_t start = g_nextSlot.fetch_add(1, std::memory_order_relaxed);
+    for (uint32_t i = 0; i < kSlots; ++i) {
+        uint32_t slot = (start + i) % kSlots;
+        MexHandle* expected = nullptr;
+        if (g_slots[slot].compare_exchange_strong(expected, handle, std::memory_order_acq_rel)) {
+            uint32_t gen = (g_generations[slot].fetch_add(1, std::memory_order_relaxed) + 1) & kGenerationMask;
+            handle->generation = gen;
+            return static_cast<int>(gen << kSlotBits | (slot + 1));
+        }
+    }
+    return 0;
+}
+
+MexHandle* Lookup(int h) {
+    if (h <= 0) return nullptr;
+    uint32_t value = static_cast<uint32_t>(h);
+    uint32_t slot = (value & ((1u << kSlotBits) - 1)) - 1;
+    if (slot >= kSlots) return nullptr;
+    MexHandle* handle = g_slots[slot].load(std::memory_order_acquire);
+    if (handle == nullptr || handle->generation != (value >> kSlotBits)) return nullptr;
+    return handle;
+}
+
+void Unregister(int h) {
+    uint32_t slot = (static_cast<uint32_t>(h) & ((1u << kSlotBits) - 1)) - 1;
+    g_slots[slot].store(nullptr, std::memory_order_release);
+}
+
+void CloseProtected(MexHandle* handle) {
+    if (handle->session != nullptr && handle->hasClient &&
+        handle->client.provider.closeDecryptSession != nullptr) {
+        handle->client.provider.closeDecryptSession(handle->client.provider.context, handle->session);
+    }
+    handle->session = nullptr;
+    handle->hasClient = false;
+}
+
+bool OpenProtected(MexHandle* handle, const char* path) {
+    if (!MakeDrmClient(&handle->client) || handle->client.provider.openDecryptSession == nullptr) {
+        return false;
+    }
+    handle->hasClient = true;
+    const MM_DrmProvider& p = handle->client.provider;
+    int apiType = 0;
+    handle->session = p.openDecryptSession(p.context, path, &apiType);
+    if (handle->session == nullptr) {
+        LogPrint(kLogError, "MetaInfoExtractor", "open failed pDecryptHandle is NULL");
+        handle->hasClient = false;
+        return false;
+    }
+    handle->decryptApiType = apiType;
+    _DRM_METADATA meta;
+    std::memset(&meta, 0, sizeof meta);
+    // The service may have no metadata; the size then comes from the file system.
+    GetDRMMetaInfo(path, &handle->client, &meta);
+    if (meta.nContentLength != 0) {
+        handle->size = meta.nContentLength;
+    } else {
+        struct stat st;
+        handle->size = ::stat(path, &st) == 0 ? static_cast<int64_t>(st.st_size) : 0;
+    }
+    handle->position = 0;
+    return true;
+}
+
+int ReadProtected(MexHandle* handle, void* buf, unsigned size, unsigned count) {
+    if (handle->position >= handle->size || handle->session == nullptr ||
+        handle->decryptApiType != kDecryptApiContainerBased || handle->client.provider.pread == nullptr) {
+        return 0;
+    }
+    size_t want = static_cast<size_t>(size) * count;
+    if (want == 0) return 0;
+    const MM_DrmProvider& p = handle->client.provider;
+    long long got = p.pread(p.context, handle->session, buf, want, handle->position);
+    if (got <= 0) return 0;
+    // A service that claims more than was asked for cannot have written it.
+    if (static_cast<unsigned long long>(got) > want) got = static_cast<long long>(want);
+    if (got > 0x7FFFFFFF) got = 0x7FFFFFFF;
+    handle->position += got;
+    return static_cast<int>(got);
+}
+
+int SeekProtected(MexHandle* handle, long offset, int whence) {
+    // Positions wrap rather than overflow; no bound is checked, as a later
+    // read past the end simply answers 0.
+    uint64_t delta = static_cast<uint64_t>(static_cast<int64_t>(offset));
+    switch (whence) {
+        case SEEK_SET: handle->position = static_cast<int64_t>(delta); return 0;
+        case SEEK_CUR: handle->position = static_cast<int64_t>(static_cast<uint64_t>(handle->position) + delta); return 0;
+        case SEEK_END: handle->position = static_cast<int64_t>(static_cast<uint64_t>(handle->size) + delta); return 0;
+        default: return -1;
+    }
+}
+
+}  // namespace
+
+int MEx_fopen(const char* path, const char* mode) {
+    if (path == nullptr || mode == nullptr) return 0;
+    MexHandle* handle = new (std::nothrow) MexHandle();
+    if (handle == nullptr) return 0;
+    int kind = CheckDRM(path);
+    if (kind < 0) {
+        delete handle;
+        return 0;
+    }
+    handle->drmKind = kind;
+    bool opened;
+    if (kind == 0) {
+        handle->stream = std::fopen(path, mode);
+        opened = handle->stream != nullptr;
+    } else {
+        opened = OpenProtected(handle, path);
+    }
+    int h = opened ? Register(handle) : 0;
+    if (h == 0) {
+        if (handle->stream != nullptr) std::fclose(handle->stream);
+        CloseProtected(handle);
+        delete handle;
+    }
+    return h;
+}
+
+int MEx_fread(void* buf, unsigned size, unsigned count, int h) {
+    MexHandle* handle = Lookup(h);
+    if (handle == nullptr) return -1;
+    if (buf == nullptr) return 0;
+    if (handle->drmKind == 0) return static_cast<int>(std::fread(buf, size, count, handle->stream));
+    return ReadProtected(handle, buf, size, count);
+}
+
+int MEx_fwrite(const void* buf, unsigned size, unsigned count, int h) {
+    MexHandle* handle = Lookup(h);
+    if (handle == nullptr || handle->drmKind != 0) return -1;
+    if (buf == nullptr) return 0;
+    return static_cast<int>(std::fwrite(buf, size, count, handle->stream));
+}
+
+int MEx_fseek(int h, long offset, int whence) {
+    MexHandle* handle = Lookup(h);
+    if (handle == nullptr) return -1;
+    if (handle->drmKind == 0) return std::fseek(handle->stream, offset, whence);
+    return SeekProtected(handle, offset, whence);
+}
+
+long MEx_ftell(int h) {
+    MexHandle* handle = Lookup(h);
+    if (handle == nullptr) return -1;
+    if (handle->drmKind == 0) return std::ftell(handle->stream);
+    return static_cast<long>(static_cast<int32_t>(static_cast<uint32_t>(handle->position)));
+}
+
+int MEx_feof(int h) {
+    MexHandle* handle = Lookup(h);
+    if (handle == nullptr) return -1;
+    if (handle->drmKind == 0) return std::feof(handle->stream);
+    return handle->position >= handle->size ? 1 : 0;
+}
+
+int MEx_fclose(int h) {
+    MexHandle* handle = Lookup(h);
+    if (handle == nullptr) return 0;
+    Unregister(h);
+    int result = 0;
+    if (handle->drmKind == 0) {
+        result = std::fclose(handle->stream);
+    } else {
+        CloseProtected(handle);
+    }
+    delete handle;
+    return result;
+}
+
+int MEx_stat(const char* path, struct stat* st) {
+    if (path == nullptr || st == nullptr) return -1;
+    int kind = CheckDRM(path);
+    if (kind < 0) return -1;
+    if (kind != 0) {
+        _DRM_METADATA meta;
+        std::memset(&meta, 0, sizeof meta);
+        if (GetDRMMetaInfo(path, nullptr, &meta) == 0 && meta.nContentLength != 0) {
+            st->st_size = static_cast<off_t>(meta.nContentLength);
+            return 0;
+        }
+    }
+    return ::stat(path, st);
+}
+
+uint32_t GetUINT32(int h, bool bLittle) {
+    uint8_t b[4] = {0, 0, 0, 0};
+    MEx_fread(b, 1, 4, h);
+    return bLittle ? ReadLE32(b) : ReadBE32(b);
+}
+
+int GetFileExtension(const char* path, char* ext) {
+    if (path == nullptr || ext == nullptr) return 1;
+    char work[4096];
+    size_t len = strnlen(path, sizeof work - 1);
+    std::memcpy(work, path, len);
+    work[len] = '\0';
+    // A DRM content URI carries "?cid=..." after the file name.
+    if (char* cid = std::strstr(work, "?cid=")) *cid = '\0';
+    const char* dot = std::strrchr(work, '.');
+    if (dot == nullptr) return 1;
+    std::memcpy(ext, dot, strnlen(dot, 9));
+    return 0;
+}
+
+}  // namespace metainfo

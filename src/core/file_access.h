@@ -1,0 +1,49 @@
+// All file input and output of the library: plain files and, transparently,
+// files read through the content-protection service.
+//
+// A handle is an int, 0 on failure. It names a slot of a table of open handles
+// (with a generation, so a handle that was closed is refused rather than
+// reaching another file).
+#pragma once
+
+#include <sys/stat.h>
+
+#include <cstdint>
+
+namespace metainfo {
+
+int MEx_fopen(const char* path, const char* mode);
+// Plain: items read; protected: bytes read; -1 for a bad handle.
+int MEx_fread(void* buf, unsigned size, unsigned count, int h);
+// Items written; -1 for a protected or bad handle.
+int MEx_fwrite(const void* buf, unsigned size, unsigned count, int h);
+int MEx_fseek(int h, long offset, int whence);
+long MEx_ftell(int h);
+int MEx_feof(int h);
+int MEx_fclose(int h);
+int MEx_stat(const char* path, struct stat* st);
+
+// Next four bytes as a 32-bit value; missing bytes of a short read count as 0.
+uint32_t GetUINT32(int h, bool bLittle);
+
+// Copies the path's extension (dot included, at most 9 characters, not
+// terminated) into ext, which must be zeroed and at least 10 bytes long.
+// 0 when found, 1 when the path has no dot.
+int GetFileExtension(const char* path, char* ext);
+
+// Closes a handle when the scope ends.
+class FileCloser {
+public:
+    explicit FileCloser(int h) : h_(h) {}
+    ~FileCloser() {
+        if (h_ != 0) MEx_fclose(h_);
+    }
+    FileCloser(const FileCloser&) = delete;
+    FileCloser& operator=(const FileCloser&) = delete;
+    int get() const { return h_; }
+
+private:
+    int h_;
+};
+
+}  // namespace metainfo

@@ -1,0 +1,16 @@
+# metainfo probe must answer for every bundled sample, in text and JSON.
+file(GLOB samples ${SAMPLES}/*)
+list(LENGTH samples count)
+if(count EQUAL 0)
+  message(FATAL_ERROR "no samples in ${SAMPLES}")
+endif()
+foreach(flag "" "--json")
+  execute_process(COMMAND ${TOOL} probe ${flag} ${samples}
+    OUTPUT_VARIABLE out RESULT_VARIABLE rc)
+  if(NOT rc EQUAL 0)
+    message(FATAL_ERROR "metainfo probe ${flag} failed (${rc}):\n${out}")
+  endif()
+  if(out MATCHES "not probed" OR out MATCHES "\"media_type\":255")
+    message(FATAL_ERROR "a sample was not recognised:\n${out}")
+  endif()
+endforeach()

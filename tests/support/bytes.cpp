@@ -1,0 +1,65 @@
+#include "support/bytes.h"
+
+#include <dirent.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <cstdio>
+#include <cstdlib>
+#include <fstream>
+#include <iterator>
+#include <stdexcept>
+
+namespace testing_support {
+
+Bytes& Bytes::patch_be32(size_t offset, uint32_t v) {
+    for (int i = 0; i < 4; ++i) data_.at(offset + i) = static_cast<uint8_t>(v >> (24 - 8 * i));
+    return *this;
+}
+
+Bytes& Bytes::patch_le32(size_t offset, uint32_t v) {
+    for (int i = 0; i < 4; ++i) data_.at(offset + i) = static_cast<uint8_t>(v >> (8 * i));
+    return *this;
+}
+
+TempDir::TempDir() {
+    const char* base = std::getenv("TMPDIR");
+    std::string pattern = std::string(base != nullptr ? base : "/tmp") + "/metainfo-test-XXXXXX";
+    std::vector<char> buf(pattern.begin(), pattern.end());
+    buf.push_back('\0');
+    if (mkdtemp(buf.data()) == nullptr) throw std::runtime_error("mkdtemp failed");
+    path_ = buf.data();
+}
+
+TempDir::~TempDir() {
+    if (DIR* dir = opendir(path_.c_str())) {
+        while (dirent* entry = readdir(dir)) {
+            std::string name = entry->d_name;
+            if (name != "." && name != "..") std::remove((path_ + "/" + name).c_str());
+        }
+        closedir(dir);
+    }
+    rmdir(path_.c_str());
+}
+
+std::string TempDir::Write(const std::string& name, const std::vector<uint8_t>& bytes) const {
+    std::string full = PathOf(name);
+    std::ofstream out(full, std::ios::binary);
+    out.write(reinterpret_cast<const char*>(bytes.data()), static_cast<std::streamsize>(bytes.size()));
+    return full;
+}
+
+std::vector<uint8_t> ReadFileBytes(const std::string& path) {
+    std::ifstream in(path, std::ios::binary);
+    return std::vector<uint8_t>(std::istreambuf_iterator<char>(in), std::istreambuf_iterator<char>());
+}
+
+std::string CorpusDir() {
+#ifdef METAINFO_CORPUS_DIR
+    struct stat st;
+    if (stat(METAINFO_CORPUS_DIR, &st) == 0 && S_ISDIR(st.st_mode)) return METAINFO_CORPUS_DIR;
+#endif
+    return "";
+}
+
+}  // namespace testing_support
