@@ -55,6 +55,16 @@ Clip ClipOf(const std::string& path) {
     return c;
 }
 
+struct LogLine {
+    int priority;
+    std::string tag;
+    std::string message;
+};
+std::vector<LogLine> g_lines;
+void Capture(int priority, const char* tag, const char* message) {
+    g_lines.push_back({priority, tag != nullptr ? tag : "", message});
+}
+
 int OpenDescriptors() {
     int n = 0;
     if (DIR* d = opendir("/proc/self/fd")) {
@@ -309,4 +319,21 @@ TEST(AsfNames, IsEqualNameNeedsEqualLengths) {
     EXPECT_EQ(metainfo::ASF_IsEqualName(name, "WM/Year", 7, 7), 1);
     EXPECT_EQ(metainfo::ASF_IsEqualName(name, "WM/Yea", 6, 7), 0);
     EXPECT_EQ(metainfo::ASF_IsEqualName(name, "WM/Yeah", 7, 7), 0);
+}
+
+TEST(AsfLog, DiagnosticsGoToTheLogAtVerbosePriorityWithTheAsfTag) {
+    TempDir dir;
+    auto path = dir.Write("a.wma", AsfFile({AsfAudioStream(1, Audio(44100, 2, 16000))}));
+    g_lines.clear();
+    MM_MediaExtractor_SetLogSink(Capture);
+    _MM_CODECTYPE codec;
+    metainfo::ASF_GetCodecType(path.c_str(), &codec);
+    MM_MediaExtractor_SetLogSink(nullptr);
+    ASSERT_GE(g_lines.size(), 3u);
+    EXPECT_EQ(g_lines[0].message, "\nEnter the ASF GetCodec Type " + path + "\n");
+    EXPECT_EQ(g_lines[1].message, "the currObjSize = 96\n");
+    for (const auto& line : g_lines) {
+        EXPECT_EQ(line.priority, 2);
+        EXPECT_EQ(line.tag, "ASF_LEVEL");
+    }
 }
