@@ -181,35 +181,21 @@ TEST(AsfVideoCodec, NullArgumentsAreRejected) {
     EXPECT_EQ(metainfo::ASF_GetCodecInfo(1, nullptr), MM_E_INVALIDARG);
 }
 
-TEST(AsfWmv9Levels, SimpleProfileRulesInOrder) {
-    EXPECT_EQ(metainfo::ASF_SimpleProfileLevel(96, 14, 176, 144), kLow);
-    EXPECT_EQ(metainfo::ASF_SimpleProfileLevel(96, 14, 320, 240), kMedium);
-    EXPECT_EQ(metainfo::ASF_SimpleProfileLevel(416, 14, 176, 144), 0u);  // rate above 384
-    EXPECT_EQ(metainfo::ASF_SimpleProfileLevel(384, 30, 240, 176), kMedium);
-    EXPECT_EQ(metainfo::ASF_SimpleProfileLevel(384, 30, 352, 288), 0u);
-    EXPECT_EQ(metainfo::ASF_SimpleProfileLevel(160, 14, 352, 288), kMedium);
-}
-
-TEST(AsfWmv9Levels, MainProfileRulesInOrder) {
-    EXPECT_EQ(metainfo::ASF_MainProfileLevel(0, 22, true, 320, 240), kLow);
-    EXPECT_EQ(metainfo::ASF_MainProfileLevel(0, 30, false, 320, 240), kMedium);
-    EXPECT_EQ(metainfo::ASF_MainProfileLevel(0, 26, false, 720, 576), kMedium);
-    EXPECT_EQ(metainfo::ASF_MainProfileLevel(0, 30, false, 720, 576), kHigh);
-    EXPECT_EQ(metainfo::ASF_MainProfileLevel(0, 30, false, 1920, 1080), kHigh);
-    EXPECT_EQ(metainfo::ASF_MainProfileLevel(0, 30, false, 1920, 1088), 0u);
-    EXPECT_EQ(metainfo::ASF_MainProfileLevel(0, 30, true, 1280, 720), 0u);
-}
-
-TEST(AsfWmv9Levels, AdvancedProfileRulesInOrder) {
-    EXPECT_EQ(metainfo::ASF_AdvancedProfileLevel(30, true, 352, 288), kL0);
-    EXPECT_EQ(metainfo::ASF_AdvancedProfileLevel(30, true, 720, 480), kL1);
-    EXPECT_EQ(metainfo::ASF_AdvancedProfileLevel(26, false, 720, 576), kL1);
-    EXPECT_EQ(metainfo::ASF_AdvancedProfileLevel(30, false, 1280, 720), kL2);
-    EXPECT_EQ(metainfo::ASF_AdvancedProfileLevel(30, false, 1920, 1080), kL4);
-    EXPECT_EQ(metainfo::ASF_AdvancedProfileLevel(24, false, 1920, 1080), kL3);
-    EXPECT_EQ(metainfo::ASF_AdvancedProfileLevel(30, true, 1920, 1080), kL3);
-    EXPECT_EQ(metainfo::ASF_AdvancedProfileLevel(24, false, 2048, 1536), kL4);
-    EXPECT_EQ(metainfo::ASF_AdvancedProfileLevel(30, false, 2048, 1536), 0u);
-    EXPECT_EQ(metainfo::ASF_AdvancedProfileLevel(24, true, 2048, 1536), kL4);
-    EXPECT_EQ(metainfo::ASF_AdvancedProfileLevel(24, false, 2049, 1536), 0u);
+// Cases the sequence header cannot express (24 fps) and the order in which the rules fire.
+TEST(AsfWmv9Levels, RulesFireInTheirOrder) {
+    using metainfo::ASF_AdvancedProfileLevel;
+    using metainfo::ASF_MainProfileLevel;
+    using metainfo::ASF_SimpleProfileLevel;
+    EXPECT_EQ(ASF_SimpleProfileLevel(416, 14, 176, 144), 0u);      // above 384 kbps before MEDIUM
+    EXPECT_EQ(ASF_SimpleProfileLevel(160, 14, 352, 288), kMedium);
+    EXPECT_EQ(ASF_MainProfileLevel(0, 22, true, 320, 240), kLow);    // LOW before the interlace rule
+    EXPECT_EQ(ASF_MainProfileLevel(0, 26, false, 720, 576), kMedium);
+    EXPECT_EQ(ASF_MainProfileLevel(0, 30, false, 1920, 1088), 0u);
+    EXPECT_EQ(ASF_AdvancedProfileLevel(30, true, 352, 288), kL0);
+    EXPECT_EQ(ASF_AdvancedProfileLevel(26, false, 720, 576), kL1);
+    EXPECT_EQ(ASF_AdvancedProfileLevel(30, false, 1280, 720), kL2);
+    EXPECT_EQ(ASF_AdvancedProfileLevel(24, false, 1920, 1080), kL3);
+    EXPECT_EQ(ASF_AdvancedProfileLevel(30, true, 1920, 1080), kL3);
+    EXPECT_EQ(ASF_AdvancedProfileLevel(24, true, 2048, 1536), kL4);  // only the slow rule
+    EXPECT_EQ(ASF_AdvancedProfileLevel(30, false, 2048, 1536), 0u);
 }
