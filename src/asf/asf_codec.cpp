@@ -198,8 +198,8 @@ int32_t ASF_GetCodecInfo(int h, _MM_CODECTYPE* codec) {
     ReadOrZero(h, p, sizeof p);
     uint32_t size = ReadLE32(p);
     const uint8_t* type = p + 8;
-    uint32_t specLength = ReadLE32(p + 48);
-    LogPrint(kVerbose, kLogTag, "the specDataLen = 0x%x, %d\n", specLength, static_cast<int>(specLength));
+    uint32_t typeSpecificLength = ReadLE32(p + 48);
+    LogPrint(kVerbose, kLogTag, "the specDataLen = 0x%x, %d\n", typeSpecificLength, static_cast<int>(typeSpecificLength));
 
     if (SameGuid(type, ASF_Audio_Media)) {
         AudioStream(h, size, codec);

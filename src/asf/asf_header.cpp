@@ -175,9 +175,8 @@ int32_t ASF_GetMediaInfo(const char* path, uint16_t mode, void* out, int32_t fla
     if (h == 0) return kWalkFailed;
     FileCloser closer(h);
 
-    uint8_t head[30];
-    if (!ReadExact(h, head, 16) || !SameGuid(head, ASF_Header_Object)) return kWalkFailed;
-    if (!ReadExact(h, head + 16, 8)) return kWalkFailed;
+    uint8_t head[24];  // GUID and the size, which nothing uses
+    if (!ReadExact(h, head, sizeof head) || !SameGuid(head, ASF_Header_Object)) return kWalkFailed;
     uint32_t count = 0;
     if (!Read32(h, &count) || count > kMaxHeaderObjects) return kWalkFailed;
     if (!SeekBy(h, 2)) return kWalkFailed;

@@ -9,7 +9,7 @@
 
 namespace testing_support {
 
-// GUIDs as the ASF specification writes them.
+// GUIDs as the ASF standard writes them.
 namespace asf_guid {
 extern const char* const kHeader;
 extern const char* const kFileProperties;
