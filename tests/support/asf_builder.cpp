@@ -1,0 +1,194 @@
+#include "support/asf_builder.h"
+
+#include <cstdlib>
+#include <stdexcept>
+
+namespace testing_support {
+
+namespace asf_guid {
+const char* const kHeader = "75B22630-668E-11CF-A6D9-00AA0062CE6C";
+const char* const kFileProperties = "8CABDCA1-A947-11CF-8EE4-00C00C205365";
+const char* const kStreamProperties = "B7DC0791-A9B7-11CF-8EE6-00C00C205365";
+const char* const kHeaderExtension = "5FBF03B5-A92E-11CF-8EE3-00C00C205365";
+const char* const kContentDescription = "75B22633-668E-11CF-A6D9-00AA0062CE6C";
+const char* const kExtContentDescription = "D2D0A440-E307-11D2-97F0-00A0C95EA850";
+const char* const kContentBranding = "2211B3FA-BD23-11D2-B4B7-00A0C955FC6E";
+const char* const kStreamBitrate = "7BF875CE-468D-11D1-8D82-006097C9A2B2";
+const char* const kExtStreamProperties = "14E6A5CB-C672-4332-8399-A96952065B5A";
+const char* const kMetadata = "C5F8CBEA-5BAF-4877-8467-AA8C44FA4CCA";
+const char* const kMetadataLibrary = "44231C94-9498-49D1-A141-1D134E457054";
+const char* const kPadding = "1806D474-CADF-4509-A4BA-9AABCB96AAE8";
+const char* const kAudio = "F8699E40-5B4D-11CF-A8FD-00805F5C442B";
+const char* const kVideo = "BC19EFC0-5B4D-11CF-A8FD-00805F5C442B";
+const char* const kCommand = "59DACFC0-59E6-11D0-A3AC-00A0C90348F6";
+const char* const kJfif = "B61BE100-5B4E-11CF-A8FD-00805F5C442B";
+const char* const kDegradableJpeg = "35907DE0-E415-11CF-A917-00805F5C442B";
+const char* const kFileTransfer = "91BD222C-F21C-497A-8B6D-5AA86BFC0185";
+const char* const kBinary = "3AFB65E2-47EF-40F2-AC2C-70A90D71D343";
+}  // namespace asf_guid
+
+Bytes AsfGuid(const char* text) {
+    std::string hex;
+    for (const char* p = text; *p != '\0'; ++p) {
+        if (*p != '-') hex.push_back(*p);
+    }
+    if (hex.size() != 32) throw std::invalid_argument("GUID text");
+    auto byteAt = [&](size_t i) { return std::strtoul(hex.substr(2 * i, 2).c_str(), nullptr, 16); };
+    Bytes out;
+    // First three groups little-endian, the last eight bytes as written.
+    for (int i : {3, 2, 1, 0, 5, 4, 7, 6}) out.u8(byteAt(i));
+    for (int i = 8; i < 16; ++i) out.u8(byteAt(i));
+    return out;
+}
+
+Bytes AsfObject(const char* guid, const Bytes& body, int64_t size) {
+    uint64_t total = size >= 0 ? static_cast<uint64_t>(size) : 24 + body.size();
+    return Bytes().raw(AsfGuid(guid)).le64(total).raw(body);
+}
+
+Bytes AsfHeader(const std::vector<Bytes>& objects, int64_t count) {
+    Bytes body;
+    body.le32(count >= 0 ? static_cast<uint32_t>(count) : static_cast<uint32_t>(objects.size()));
+    body.u8(1).u8(2);
+    for (const Bytes& o : objects) body.raw(o);
+    return AsfObject(asf_guid::kHeader, body);
+}
+
+Bytes AsfFileProperties(uint64_t fileSize, uint64_t playDuration, uint64_t preroll, uint32_t maxBitrate) {
+    Bytes b;
+    b.fill(16, 0xAB);         // File ID
+    b.le64(fileSize);
+    b.le64(0);                // Creation Date
+    b.le64(10);               // Data Packets Count
+    b.le64(playDuration);
+    b.le64(playDuration);     // Send Duration
+    b.le64(preroll);
+    b.le32(2);                // Flags: seekable
+    b.le32(3200).le32(3200);  // Minimum and Maximum Data Packet Size
+    b.le32(maxBitrate);
+    return AsfObject(asf_guid::kFileProperties, b);
+}
+
+Bytes AsfStreamProperties(const char* typeGuid, int streamNumber, const Bytes& typeSpecific) {
+    Bytes b;
+    b.raw(AsfGuid(typeGuid));
+    b.raw(AsfGuid("20FB5700-5B55-11CF-A8FD-00805F5C442B"));  // No Error Correction
+    b.le64(0);                                                // Time Offset
+    b.le32(static_cast<uint32_t>(typeSpecific.size()));
+    b.le32(0);  // Error Correction Data Length
+    b.le16(static_cast<uint32_t>(streamNumber) & 0x7F);
+    b.le32(0);  // Reserved
+    b.raw(typeSpecific);
+    return AsfObject(asf_guid::kStreamProperties, b);
+}
+
+Bytes AsfAudioStream(int streamNumber, const AsfAudio& a) {
+    Bytes w;
+    w.le16(a.formatTag).le16(a.channels).le32(a.sampleRate).le32(a.avgBytesPerSec);
+    w.le16(a.blockAlign).le16(a.bitsPerSample).le16(static_cast<uint32_t>(a.extra.size()));
+    w.raw(a.extra);
+    return AsfStreamProperties(asf_guid::kAudio, streamNumber, w);
+}
+
+Bytes AsfVideoStream(int streamNumber, const AsfVideo& v) {
+    Bytes t;
+    t.le32(v.width).le32(v.height).u8(2);
+    t.le16(static_cast<uint32_t>(40 + v.codecData.size()));
+    t.le32(static_cast<uint32_t>(40 + v.codecData.size()));  // BITMAPINFOHEADER size
+    t.le32(v.width).le32(v.height).le16(1).le16(24);
+    t.str(v.compression.substr(0, 4));
+    t.le32(v.width * v.height * 3).le32(0).le32(0).le32(0).le32(0);
+    t.raw(v.codecData);
+    return AsfStreamProperties(asf_guid::kVideo, streamNumber, t);
+}
+
+Bytes AsfStreamBitrates(const std::vector<std::pair<int, uint32_t>>& rates) {
+    Bytes b;
+    b.le16(static_cast<uint32_t>(rates.size()));
+    for (const auto& r : rates) b.le16(static_cast<uint32_t>(r.first)).le32(r.second);
+    return AsfObject(asf_guid::kStreamBitrate, b);
+}
+
+Bytes AsfHeaderExtension(const std::vector<Bytes>& inner, int64_t dataSize) {
+    Bytes data;
+    for (const Bytes& o : inner) data.raw(o);
+    Bytes b;
+    b.raw(AsfGuid("ABD3D211-A9BA-11CF-8EE6-00C00C205365"));  // Reserved Field 1
+    b.le16(6);
+    b.le32(dataSize >= 0 ? static_cast<uint32_t>(dataSize) : static_cast<uint32_t>(data.size()));
+    b.raw(data);
+    return AsfObject(asf_guid::kHeaderExtension, b);
+}
+
+Bytes AsfExtStreamProperties(int streamNumber, uint64_t avgTimePerFrame) {
+    Bytes b;
+    b.le64(0).le64(0);                  // Start and End Time
+    b.le32(200000).le32(4000).le32(0);  // Data Bitrate, Buffer Size, Initial Fullness
+    b.le32(0).le32(0).le32(0);          // Alternate values
+    b.le32(5000).le32(0);               // Maximum Object Size, Flags
+    b.le16(static_cast<uint32_t>(streamNumber)).le16(0);
+    b.le64(avgTimePerFrame);
+    b.le16(0).le16(0);  // Stream Name and Payload Extension System counts
+    return AsfObject(asf_guid::kExtStreamProperties, b);
+}
+
+Bytes Utf16(const std::string& text, bool terminator) {
+    Bytes b;
+    for (unsigned char c : text) b.le16(c);
+    if (terminator) b.le16(0);
+    return b;
+}
+
+Bytes AsfContentDescription(const std::string& title, const std::string& author,
+                            const std::string& copyright, const std::string& description,
+                            const std::string& rating) {
+    std::vector<Bytes> texts;
+    for (const std::string* s : {&title, &author, &copyright, &description, &rating}) {
+        texts.push_back(s->empty() ? Bytes() : Utf16(*s));
+    }
+    Bytes b;
+    for (const Bytes& t : texts) b.le16(static_cast<uint32_t>(t.size()));
+    for (const Bytes& t : texts) b.raw(t);
+    return AsfObject(asf_guid::kContentDescription, b);
+}
+
+Bytes AsfExtContentDescription(const std::vector<AsfDescriptor>& descriptors) {
+    Bytes b;
+    b.le16(static_cast<uint32_t>(descriptors.size()));
+    for (const AsfDescriptor& d : descriptors) {
+        Bytes name = Utf16(d.name);
+        b.le16(static_cast<uint32_t>(name.size())).raw(name);
+        b.le16(d.type).le16(static_cast<uint32_t>(d.value.size())).raw(d.value);
+    }
+    return AsfObject(asf_guid::kExtContentDescription, b);
+}
+
+Bytes AsfMetadata(const std::vector<AsfDescriptor>& records, bool library) {
+    Bytes b;
+    b.le16(static_cast<uint32_t>(records.size()));
+    for (const AsfDescriptor& r : records) {
+        Bytes name = Utf16(r.name);
+        b.le16(0).le16(0).le16(static_cast<uint32_t>(name.size())).le16(r.type);
+        b.le32(static_cast<uint32_t>(r.value.size())).raw(name).raw(r.value);
+    }
+    return AsfObject(library ? asf_guid::kMetadataLibrary : asf_guid::kMetadata, b);
+}
+
+Bytes AsfContentBranding(uint32_t imageType, const Bytes& image, const std::string& bannerUrl,
+                         const std::string& copyrightUrl) {
+    Bytes b;
+    b.le32(imageType).le32(static_cast<uint32_t>(image.size())).raw(image);
+    b.le32(static_cast<uint32_t>(bannerUrl.size())).str(bannerUrl);
+    b.le32(static_cast<uint32_t>(copyrightUrl.size())).str(copyrightUrl);
+    return AsfObject(asf_guid::kContentBranding, b);
+}
+
+Bytes AsfWmPicture(uint8_t pictureType, const std::string& mime, const std::string& description,
+                   const Bytes& data) {
+    Bytes b;
+    b.u8(pictureType).le32(static_cast<uint32_t>(data.size()));
+    b.raw(Utf16(mime)).raw(Utf16(description)).raw(data);
+    return b;
+}
+
+}  // namespace testing_support
