@@ -2,6 +2,7 @@
 // row here and nothing else of the core knows about it.
 #include "core/dispatch.h"
 
+#include "aac/aac_clip.h"
 #include "speech/midi.h"
 
 namespace metainfo {
@@ -19,7 +20,7 @@ const MM_TrackTypeFn MM_GetTrackType[MM_MEDIA_SLOTS] = {
     /* 3 MP4 */ nullptr,
     /* 4 ASF */ nullptr,
     /* 5 MIDI */ MIDI_GetTrackType,
-    /* 6 AAC */ nullptr,
+    /* 6 AAC */ AAC_GetTrackType,
     /* 7 WAVE */ nullptr,
     /* 8 AMR-NB */ nullptr,
     /* 9 AMR-WB */ nullptr,
@@ -49,7 +50,7 @@ const MM_ClipInfoFn MM_GetClipInfo[MM_MEDIA_SLOTS] = {
     /* 3 MP4 */ nullptr,
     /* 4 ASF */ nullptr,
     /* 5 MIDI */ MIDI_GetClipInfo,
-    /* 6 AAC */ nullptr,
+    /* 6 AAC */ AAC_GetClipInfo,
     /* 7 WAVE */ nullptr,
     /* 8 AMR-NB */ nullptr,
     /* 9 AMR-WB */ nullptr,
@@ -63,7 +64,16 @@ const MM_ClipInfoFn MM_GetClipInfo[MM_MEDIA_SLOTS] = {
 
 const MM_MIMETypeFn MM_GetMIMEType[MM_MEDIA_SLOTS] = {};
 const MM_AudioDataFn MM_GetAudioData[MM_MEDIA_SLOTS] = {};
-const MM_CodecTypeFn MM_GetCodecType[MM_MEDIA_SLOTS] = {};
+const MM_CodecTypeFn MM_GetCodecType[MM_MEDIA_SLOTS] = {
+    /* 0 */ nullptr,
+    /* 1 MP3 */ nullptr,
+    /* 2 RealMedia */ nullptr,
+    /* 3 MP4 */ nullptr,
+    /* 4 ASF */ nullptr,
+    /* 5 MIDI */ nullptr,
+    /* 6 AAC */ AAC_GetCodecType,
+    /* 7..15 */ nullptr, nullptr, nullptr, nullptr, nullptr, nullptr, nullptr, nullptr, nullptr,
+};
 const MM_VideoDataFn MM_GetVideoData[MM_MEDIA_SLOTS] = {};
 
 }  // extern "C"
