@@ -75,25 +75,29 @@ void PutDataStream(BitWriter& w, int count, bool byteAlign) {
 void PutEnd(BitWriter& w) { w.put(7, 3).align(); }
 
 std::vector<uint8_t> AacBlock(bool stereo, int sbrExtension, size_t bytes) {
-    BitWriter w;
-    if (stereo) {
-        PutSilentCpe(w, true);
-    } else {
-        PutSilentSce(w);
+    // Some sizes cannot be met with one padding fill element (its escaped
+    // count costs a byte): then an empty fill element goes first.
+    for (int emptyFills = 0; emptyFills < 8; ++emptyFills) {
+        BitWriter w;
+        if (stereo) {
+            PutSilentCpe(w, true);
+        } else {
+            PutSilentSce(w);
+        }
+        if (sbrExtension != 0) PutFill(w, sbrExtension, 1);
+        if (bytes != 0) {
+            for (int i = 0; i < emptyFills; ++i) PutFill(w, 0, 0);
+            // The padding fill's id, count (and escape count) and END take 10 (18) bits.
+            const size_t used = w.bitSize();
+            long payload = static_cast<long>(bytes) - static_cast<long>((used + 10 + 7) / 8);
+            if (payload >= 15) payload = static_cast<long>(bytes) - static_cast<long>((used + 18 + 7) / 8);
+            if (payload < 0) throw std::invalid_argument("block too small");
+            PutFill(w, 0, static_cast<int>(payload));
+        }
+        PutEnd(w);
+        if (bytes == 0 || w.bytes().size() == bytes) return w.bytes();
     }
-    if (sbrExtension != 0) PutFill(w, sbrExtension, 1);
-    if (bytes != 0) {
-        // Pad with a fill element of extension type 0 up to the size asked for:
-        // its id, count (and escape count) and END take 10 (18) bits.
-        const size_t used = w.bitSize();
-        long payload = static_cast<long>(bytes) - static_cast<long>((used + 10 + 7) / 8);
-        if (payload >= 15) payload = static_cast<long>(bytes) - static_cast<long>((used + 18 + 7) / 8);
-        if (payload < 0) throw std::invalid_argument("block too small");
-        PutFill(w, 0, static_cast<int>(payload));
-    }
-    PutEnd(w);
-    if (bytes != 0 && w.bytes().size() != bytes) throw std::invalid_argument("block size not reachable");
-    return w.bytes();
+    throw std::invalid_argument("block size not reachable");
 }
 
 void PutPce(BitWriter& w, const PceSpec& p) {
