@@ -39,7 +39,7 @@ AacResult Probe(const std::string& path) {
     return r;
 }
 
-AdtsSpec Spec(int samplingIndex, int channelConfig, int profile = 1) {
+AdtsSpec Layout(int samplingIndex, int channelConfig, int profile = 1) {
     AdtsSpec s;
     s.samplingIndex = samplingIndex;
     s.channelConfig = channelConfig;
@@ -87,7 +87,8 @@ TEST(AacClipInfo, SbrFillElementGivesAacPlusCodeAndDoubledRate) {
     TempDir dir;
     for (int ext : {13, 14}) {
         for (int channels : {1, 2}) {
-            const std::string path = dir.Write("sbr.aac", AdtsFrames(Spec(6, channels), std::vector<size_t>(8, 60), ext));
+            const std::vector<uint8_t> frames = AdtsFrames(Layout(6, channels), std::vector<size_t>(8, 60), ext);
+            const std::string path = dir.Write("sbr.aac", frames);
             const AacResult r = Probe(path);
             EXPECT_EQ(MM_OK, r.clipResult);
             EXPECT_EQ(0x2012u, r.codec.nAudioCodec) << ext << " " << channels;
@@ -100,7 +101,7 @@ TEST(AacClipInfo, SbrFillElementGivesAacPlusCodeAndDoubledRate) {
 TEST(AacClipInfo, PlainAdtsKeepsHeaderRateAndPlainCode) {
     TempDir dir;
     for (int channels : {1, 2}) {
-        const std::string path = dir.Write("plain.aac", AdtsFrames(Spec(6, channels), std::vector<size_t>(8, 60)));
+        const std::string path = dir.Write("plain.aac", AdtsFrames(Layout(6, channels), std::vector<size_t>(8, 60)));
         const AacResult r = Probe(path);
         EXPECT_EQ(MM_OK, r.clipResult);
         EXPECT_EQ(MM_OK, r.codecResult);
@@ -116,12 +117,12 @@ TEST(AacClipInfo, PlainAdtsKeepsHeaderRateAndPlainCode) {
 // (besides the first two), so SBR in the third frame of a short file is not seen.
 TEST(AacClipInfo, LaterFramesAreWalkedOnlyFarFromTheDataEnd) {
     TempDir dir;
-    const AdtsSpec spec = Spec(4, 2);
-    const std::vector<uint8_t> head = AdtsFrames(spec, {200, 200});
-    const std::vector<uint8_t> sbrFrame = AdtsFrames(spec, {200}, 13);
-    const std::vector<uint8_t> shortFile = Join(Join(head, sbrFrame), AdtsFrames(spec, std::vector<size_t>(5, 200)));
+    const AdtsSpec layout = Layout(4, 2);
+    const std::vector<uint8_t> head = AdtsFrames(layout, {200, 200});
+    const std::vector<uint8_t> sbrFrame = AdtsFrames(layout, {200}, 13);
+    const std::vector<uint8_t> shortFile = Join(Join(head, sbrFrame), AdtsFrames(layout, std::vector<size_t>(5, 200)));
     EXPECT_EQ(0x2011u, Probe(dir.Write("short.aac", shortFile)).codec.nAudioCodec);
-    const std::vector<uint8_t> longFile = Join(Join(head, sbrFrame), AdtsFrames(spec, std::vector<size_t>(60, 200)));
+    const std::vector<uint8_t> longFile = Join(Join(head, sbrFrame), AdtsFrames(layout, std::vector<size_t>(60, 200)));
     EXPECT_EQ(0x2012u, Probe(dir.Write("long.aac", longFile)).codec.nAudioCodec);
 }
 
@@ -129,13 +130,13 @@ TEST(AacCodecType, ProfileGoesIntoSubtype) {
     TempDir dir;
     const uint32_t expected[] = {0x2101, 0x2102, 0x2103};
     for (int profile = 0; profile < 3; ++profile) {
-        const std::string path = dir.Write("p.aac", AdtsFrames(Spec(4, 2, profile), std::vector<size_t>(6, 80)));
+        const std::string path = dir.Write("p.aac", AdtsFrames(Layout(4, 2, profile), std::vector<size_t>(6, 80)));
         const AacResult r = Probe(path);
         EXPECT_EQ(expected[profile], r.codec.nAudioSubType);
         EXPECT_EQ(0u, r.codec.nAudioProfile);
     }
     // Profile 3 leaves the field as it was.
-    const std::string path = dir.Write("ltp.aac", AdtsFrames(Spec(4, 2, 3), std::vector<size_t>(6, 80)));
+    const std::string path = dir.Write("ltp.aac", AdtsFrames(Layout(4, 2, 3), std::vector<size_t>(6, 80)));
     _MM_CODECTYPE codec;
     std::memset(&codec, 0, sizeof codec);
     codec.nAudioSubType = 0x1234;
@@ -147,13 +148,14 @@ TEST(AacCodecType, ProfileGoesIntoSubtype) {
 
 TEST(AacClipInfo, ChannelConfigurationZeroAndSeven) {
     TempDir dir;
-    EXPECT_EQ(0xFFFFFFFFu, Probe(dir.Write("c0.aac", AdtsFrames(Spec(4, 0), std::vector<size_t>(6, 80)))).clip.nChannels);
-    EXPECT_EQ(8u, Probe(dir.Write("c7.aac", AdtsFrames(Spec(4, 7), std::vector<size_t>(6, 80)))).clip.nChannels);
+    const std::vector<size_t> sizes(6, 80);
+    EXPECT_EQ(0xFFFFFFFFu, Probe(dir.Write("c0.aac", AdtsFrames(Layout(4, 0), sizes))).clip.nChannels);
+    EXPECT_EQ(8u, Probe(dir.Write("c7.aac", AdtsFrames(Layout(4, 7), sizes))).clip.nChannels);
 }
 
 TEST(AacClipInfo, FewerThanFourFramesAverageAllOfThem) {
     TempDir dir;
-    const std::string path = dir.Write("three.aac", Join(AdtsFrames(Spec(4, 2), {60, 100, 140}), Zeros(200)));
+    const std::string path = dir.Write("three.aac", Join(AdtsFrames(Layout(4, 2), {60, 100, 140}), Zeros(200)));
     const AacResult r = Probe(path);
     ASSERT_EQ(MM_OK, r.clipResult);
     EXPECT_EQ(44100u * 100 / 128, r.clip.nBitrate);
@@ -164,7 +166,7 @@ TEST(AacClipInfo, FourOrMoreFramesLeaveOutTheFirstAndTheTwoLargest) {
     TempDir dir;
     // Sorted 100 120 130 160 250 300: without the first (130) and 300, 250.
     const std::string path =
-        dir.Write("six.aac", Join(AdtsFrames(Spec(4, 2), {130, 100, 120, 300, 250, 160}), Zeros(200)));
+        dir.Write("six.aac", Join(AdtsFrames(Layout(4, 2), {130, 100, 120, 300, 250, 160}), Zeros(200)));
     const AacResult r = Probe(path);
     ASSERT_EQ(MM_OK, r.clipResult);
     const uint32_t average = (1060 - 130 - 300 - 250) / 3;
@@ -174,15 +176,15 @@ TEST(AacClipInfo, FourOrMoreFramesLeaveOutTheFirstAndTheTwoLargest) {
 
 TEST(AacClipInfo, FrameLengthAbove4096EndsTheScan) {
     TempDir dir;
-    const AdtsSpec spec = Spec(4, 2);
-    std::vector<uint8_t> third = AdtsFrames(spec, {300});
+    const AdtsSpec layout = Layout(4, 2);
+    std::vector<uint8_t> third = AdtsFrames(layout, {300});
     std::vector<uint8_t> bad = third;
     const uint32_t length = 5000;  // announced, above the 4096 limit
     bad[3] = static_cast<uint8_t>((bad[3] & 0xFC) | (length >> 11));
     bad[4] = static_cast<uint8_t>(length >> 3);
     bad[5] = static_cast<uint8_t>((length & 7) << 5 | 0x1F);
-    const std::vector<uint8_t> tail = AdtsFrames(spec, std::vector<size_t>(6, 300));
-    const std::vector<uint8_t> head = AdtsFrames(spec, {200, 200});
+    const std::vector<uint8_t> tail = AdtsFrames(layout, std::vector<size_t>(6, 300));
+    const std::vector<uint8_t> head = AdtsFrames(layout, {200, 200});
     EXPECT_EQ(44100u * 200 / 128, Probe(dir.Write("cut.aac", Join(Join(head, bad), tail))).clip.nBitrate);
     EXPECT_NE(44100u * 200 / 128, Probe(dir.Write("whole.aac", Join(Join(head, third), tail))).clip.nBitrate);
     // A first frame that long is no stream at all.
@@ -192,8 +194,9 @@ TEST(AacClipInfo, FrameLengthAbove4096EndsTheScan) {
 
 TEST(AacClipInfo, SecondFrameMustMatchTheFirst) {
     TempDir dir;
-    const std::vector<uint8_t> first = AdtsFrames(Spec(4, 2, 1), {100});
-    EXPECT_EQ(MM_E_UNSUPPORTED, Probe(dir.Write("kind.aac", Join(first, AdtsFrames(Spec(4, 2, 2), {100, 100})))).clipResult);
+    const std::vector<uint8_t> first = AdtsFrames(Layout(4, 2, 1), {100});
+    const std::vector<uint8_t> ssr = AdtsFrames(Layout(4, 2, 2), {100, 100});
+    EXPECT_EQ(MM_E_UNSUPPORTED, Probe(dir.Write("kind.aac", Join(first, ssr))).clipResult);
     // A lone frame: the second header would lie beyond the data read.
     EXPECT_EQ(MM_E_UNSUPPORTED, Probe(dir.Write("one.aac", Join(Bytes().zeros(20).data(), first))).clipResult);
 }
@@ -201,7 +204,7 @@ TEST(AacClipInfo, SecondFrameMustMatchTheFirst) {
 // 8 kHz frames of 128 bytes make 8000 bit/s: 1000 bytes of data a second.
 TEST(AacClipInfo, Id3TagWithFooterIsSkippedWholeButCountsOnlyItsBody) {
     TempDir dir;
-    const std::vector<uint8_t> stream = Join(AdtsFrames(Spec(11, 1), std::vector<size_t>(15, 128)), Zeros(60));
+    const std::vector<uint8_t> stream = Join(AdtsFrames(Layout(11, 1), std::vector<size_t>(15, 128)), Zeros(60));
     const AacResult r = Probe(dir.Write("footer.aac", Join(Id3WithFooter(100), stream)));
     ASSERT_EQ(MM_OK, r.clipResult);
     EXPECT_EQ(8000u, r.clip.nBitrate);
@@ -213,7 +216,7 @@ TEST(AacClipInfo, Id3TagWithFooterIsSkippedWholeButCountsOnlyItsBody) {
 
 TEST(AacClipInfo, TrailingTagBlockIsLeftOutOfTheDuration) {
     TempDir dir;
-    const std::vector<uint8_t> stream = Join(AdtsFrames(Spec(11, 1), std::vector<size_t>(15, 128)), Zeros(79));
+    const std::vector<uint8_t> stream = Join(AdtsFrames(Layout(11, 1), std::vector<size_t>(15, 128)), Zeros(79));
     const AacResult r = Probe(dir.Write("tag.aac", Join(stream, TrailingTag())));
     ASSERT_EQ(MM_OK, r.clipResult);
     EXPECT_EQ(1999u + 128, r.clip.nFileSize);
@@ -222,7 +225,7 @@ TEST(AacClipInfo, TrailingTagBlockIsLeftOutOfTheDuration) {
 
 TEST(AacClipInfo, ReservedSamplingIndexGivesZeroDurationWithoutFault) {
     TempDir dir;
-    const AacResult r = Probe(dir.Write("sf13.aac", AdtsFrames(Spec(13, 2), std::vector<size_t>(6, 80))));
+    const AacResult r = Probe(dir.Write("sf13.aac", AdtsFrames(Layout(13, 2), std::vector<size_t>(6, 80))));
     EXPECT_EQ(MM_OK, r.clipResult);
     EXPECT_EQ(0u, r.clip.nSampleRate);
     EXPECT_EQ(0u, r.clip.nBitrate);
@@ -242,12 +245,12 @@ TEST(AacClipInfo, ShortDataAfterTheTag) {
 
 TEST(AacAdif, HeaderWithoutCopyrightConstantRate) {
     TempDir dir;
-    AdifSpec spec;
-    spec.bitrate = 96000;
-    spec.bufferFullness = 0xFFFFF;
-    spec.pces[0].samplingIndex = 3;
-    spec.pces[0].front = {true};
-    const std::vector<uint8_t> file = Join(AdifFile(spec, AacBlock(true, 0, 20)), Zeros(24000 - 60));
+    AdifSpec layout;
+    layout.bitrate = 96000;
+    layout.bufferFullness = 0xFFFFF;
+    layout.pces[0].samplingIndex = 3;
+    layout.pces[0].front = {true};
+    const std::vector<uint8_t> file = Join(AdifFile(layout, AacBlock(true, 0, 20)), Zeros(24000 - 60));
     const std::string path = dir.Write("cbr.aac", file);
     const AacResult r = Probe(path);
     ASSERT_EQ(MM_OK, r.clipResult);
@@ -263,14 +266,14 @@ TEST(AacAdif, HeaderWithoutCopyrightConstantRate) {
 TEST(AacAdif, HeaderWithCopyrightIdShiftsEveryField) {
     TempDir dir;
     for (bool variableRate : {false, true}) {
-        AdifSpec spec;
-        spec.copyright = true;
-        spec.variableRate = variableRate;
-        spec.bitrate = 64000;
-        spec.pces[0].samplingIndex = 8;
-        spec.pces[0].objectType = 0;
-        spec.pces[0].front = {false};
-        const std::string path = dir.Write("copy.aac", AdifFile(spec, AacBlock(false, 0, 20)));
+        AdifSpec layout;
+        layout.copyright = true;
+        layout.variableRate = variableRate;
+        layout.bitrate = 64000;
+        layout.pces[0].samplingIndex = 8;
+        layout.pces[0].objectType = 0;
+        layout.pces[0].front = {false};
+        const std::string path = dir.Write("copy.aac", AdifFile(layout, AacBlock(false, 0, 20)));
         const AacResult r = Probe(path);
         ASSERT_EQ(MM_OK, r.clipResult) << variableRate;
         EXPECT_EQ(64000u, r.clip.nBitrate) << variableRate;
@@ -283,8 +286,8 @@ TEST(AacAdif, HeaderWithCopyrightIdShiftsEveryField) {
 
 TEST(AacAdif, ProgramConfigElementsAreSummedAndTheLastObjectTypeKept) {
     TempDir dir;
-    AdifSpec spec;
-    spec.variableRate = true;
+    AdifSpec layout;
+    layout.variableRate = true;
     PceSpec first;
     first.objectType = 1;
     first.samplingIndex = 4;
@@ -295,8 +298,8 @@ TEST(AacAdif, ProgramConfigElementsAreSummedAndTheLastObjectTypeKept) {
     PceSpec second;
     second.objectType = 2;
     second.side = {true, false};
-    spec.pces = {first, second};
-    const AacResult r = Probe(dir.Write("pce.aac", AdifFile(spec, AacBlock(true, 0, 20))));
+    layout.pces = {first, second};
+    const AacResult r = Probe(dir.Write("pce.aac", AdifFile(layout, AacBlock(true, 0, 20))));
     ASSERT_EQ(MM_OK, r.clipResult);
     EXPECT_EQ(6u + 3u, r.clip.nChannels);
     EXPECT_EQ(0x2103u, r.codec.nAudioSubType);
@@ -305,19 +308,19 @@ TEST(AacAdif, ProgramConfigElementsAreSummedAndTheLastObjectTypeKept) {
 
 TEST(AacAdif, SbrInTheFirstBlockGivesAacPlusCode) {
     TempDir dir;
-    AdifSpec spec;
-    spec.pces[0].samplingIndex = 6;
-    spec.pces[0].front = {true};
-    const AacResult r = Probe(dir.Write("sbr.aac", AdifFile(spec, AacBlock(true, 13))));
+    AdifSpec layout;
+    layout.pces[0].samplingIndex = 6;
+    layout.pces[0].front = {true};
+    const AacResult r = Probe(dir.Write("sbr.aac", AdifFile(layout, AacBlock(true, 13))));
     EXPECT_EQ(0x2002u, r.codec.nAudioCodec);
     EXPECT_EQ(48000u, r.clip.nSampleRate);
 }
 
 TEST(AacAdif, ZeroBitrateGivesZeroDuration) {
     TempDir dir;
-    AdifSpec spec;
-    spec.bitrate = 0;
-    const std::string path = dir.Write("zero.aac", Join(AdifFile(spec, AacBlock(false)), Zeros(3000)));
+    AdifSpec layout;
+    layout.bitrate = 0;
+    const std::string path = dir.Write("zero.aac", Join(AdifFile(layout, AacBlock(false)), Zeros(3000)));
     const AacResult r = Probe(path);
     EXPECT_EQ(MM_OK, r.clipResult);
     EXPECT_EQ(0u, r.clip.nDuration);
@@ -328,8 +331,8 @@ TEST(AacAdif, ZeroBitrateGivesZeroDuration) {
 
 TEST(AacAdif, RecognisedOnlyAtTheStartOfTheData) {
     TempDir dir;
-    AdifSpec spec;
-    const std::vector<uint8_t> adif = AdifFile(spec, AacBlock(false, 0, 20));
+    AdifSpec layout;
+    const std::vector<uint8_t> adif = AdifFile(layout, AacBlock(false, 0, 20));
     const std::string tagged = dir.Write("tagged.aac", Join(Id3v2Tag(3, Zeros(30)), adif));
     EXPECT_EQ(0x2001u, Probe(tagged).codec.nAudioCodec);
     const std::string late = dir.Write("late.aac", Join(Zeros(40), adif));
@@ -341,11 +344,11 @@ TEST(AacAdif, RecognisedOnlyAtTheStartOfTheData) {
 
 TEST(AacAdif, TruncatedHeadersAnswerWithoutFault) {
     TempDir dir;
-    AdifSpec spec;
-    spec.copyright = true;
-    spec.pces[0].front = {true, true, true};
-    spec.pces[0].comment = std::string(200, 'c');
-    const std::vector<uint8_t> full = AdifFile(spec, AacBlock(true, 13, 30));
+    AdifSpec layout;
+    layout.copyright = true;
+    layout.pces[0].front = {true, true, true};
+    layout.pces[0].comment = std::string(200, 'c');
+    const std::vector<uint8_t> full = AdifFile(layout, AacBlock(true, 13, 30));
     const std::vector<uint8_t> tag = Id3v2Tag(3, Zeros(20));
     for (size_t cut = 5; cut < full.size(); cut += 3) {
         const std::vector<uint8_t> part(full.begin(), full.begin() + static_cast<long>(cut));
@@ -358,7 +361,7 @@ TEST(AacAdif, TruncatedHeadersAnswerWithoutFault) {
 
 TEST(AacInterface, SlotsAnswerThroughThePublicQueries) {
     TempDir dir;
-    const std::string path = dir.Write("x.aac", AdtsFrames(Spec(4, 2), std::vector<size_t>(10, 100)));
+    const std::string path = dir.Write("x.aac", AdtsFrames(Layout(4, 2), std::vector<size_t>(10, 100)));
     int type = 0;
     ASSERT_EQ(MM_OK, MM_MediaExtractor_DetectMediaType(path.c_str(), &type));
     ASSERT_EQ(MEDIA_TYPE_AAC, type);

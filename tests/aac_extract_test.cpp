@@ -20,7 +20,7 @@ using namespace testing_support;
 
 namespace {
 
-AdtsSpec Spec8k() {
+AdtsSpec Layout8k() {
     AdtsSpec s;
     s.samplingIndex = 11;  // 8000 Hz: a frame of F bytes makes 62.5 x F bit/s
     s.channelConfig = 1;
@@ -28,7 +28,7 @@ AdtsSpec Spec8k() {
 }
 
 // n frames of 100 bytes: 6250 bit/s, 12 whole seconds for 100 frames.
-std::vector<uint8_t> HundredByteFrames(size_t n) { return AdtsFrames(Spec8k(), std::vector<size_t>(n, 100)); }
+std::vector<uint8_t> HundredByteFrames(size_t n) { return AdtsFrames(Layout8k(), std::vector<size_t>(n, 100)); }
 
 std::vector<uint8_t> Slice(const std::vector<uint8_t>& v, size_t from, size_t to) {
     return std::vector<uint8_t>(v.begin() + static_cast<long>(from), v.begin() + static_cast<long>(to));
@@ -120,9 +120,9 @@ TEST(AacExtractFile, EndBeyondTheDurationCutsAtTheFileEnd) {
 
 TEST(AacExtractFile, AdifFileIsCutAsRawBytes) {
     TempDir dir;
-    AdifSpec spec;
-    spec.bitrate = 8000;
-    const std::vector<uint8_t> input = Join(AdifFile(spec, AacBlock(false, 0, 20)), std::vector<uint8_t>(5000, 0x11));
+    AdifSpec layout;
+    layout.bitrate = 8000;
+    const std::vector<uint8_t> input = Join(AdifFile(layout, AacBlock(false, 0, 20)), std::vector<uint8_t>(5000, 0x11));
     const std::string path = dir.Write("adif.aac", input);
     const std::string out = dir.PathOf("out.aac");
     ASSERT_EQ(MM_OK, AAC_GetAuidoData_File(path.c_str(), 1, 3, out.c_str()));
@@ -152,8 +152,8 @@ TEST(AacExtractBuf, TrimsToWholeFramesAndDropsTheLastOne) {
 // one second of bytes is shorter than a frame.
 TEST(AacExtractBuf, RangeWithOneSyncGivesNothingAndWithoutSyncIsRejected) {
     TempDir dir;
-    std::vector<uint8_t> input = AdtsFrames(Spec8k(), std::vector<size_t>(30, 128));
-    for (int i = 0; i < 10; ++i) input = Join(input, AdtsFrame(Spec8k(), std::vector<uint8_t>(3993, 0)));
+    std::vector<uint8_t> input = AdtsFrames(Layout8k(), std::vector<size_t>(30, 128));
+    for (int i = 0; i < 10; ++i) input = Join(input, AdtsFrame(Layout8k(), std::vector<uint8_t>(3993, 0)));
     const std::string path = dir.Write("big.aac", input);
     ASSERT_EQ(43840u, input.size());  // 43 seconds, 1019 bytes each
     // 39 s: bytes 39763..40782 hold the frame start at 39840 only.
@@ -170,7 +170,7 @@ TEST(AacExtractBuf, RangeWithOneSyncGivesNothingAndWithoutSyncIsRejected) {
 TEST(AacExtractBuf, RangeOfAHundredBytesOrLessIsNotFrontTrimmed) {
     TempDir dir;
     std::vector<uint8_t> input;
-    for (int i = 0; i < 100; ++i) input = Join(input, AdtsFrame(Spec8k(), {0xE0}));
+    for (int i = 0; i < 100; ++i) input = Join(input, AdtsFrame(Layout8k(), {0xE0}));
     const std::string path = dir.Write("small.aac", input);  // 800 bytes, 12 s
     const BufResult r = CutToBuffer(path, 2, 3);
     ASSERT_EQ(MM_OK, r.result);
@@ -180,10 +180,10 @@ TEST(AacExtractBuf, RangeOfAHundredBytesOrLessIsNotFrontTrimmed) {
 
 TEST(AacExtractBuf, AdifFileWithoutSyncIsRejected) {
     TempDir dir;
-    AdifSpec spec;
-    spec.bitrate = 8000;
+    AdifSpec layout;
+    layout.bitrate = 8000;
     const std::string path =
-        dir.Write("adif.aac", Join(AdifFile(spec, AacBlock(false, 0, 20)), std::vector<uint8_t>(5000, 0x11)));
+        dir.Write("adif.aac", Join(AdifFile(layout, AacBlock(false, 0, 20)), std::vector<uint8_t>(5000, 0x11)));
     EXPECT_EQ(1, CutToBuffer(path, 1, 3).result);
 }
 
@@ -208,10 +208,10 @@ TEST(AacExtract, RejectedRangesAnswerOne) {
 
 TEST(AacExtract, ZeroDurationIsRejectedEvenForNegativeStart) {
     TempDir dir;
-    AdifSpec spec;
-    spec.bitrate = 0;  // duration 0
+    AdifSpec layout;
+    layout.bitrate = 0;  // duration 0
     const std::string path =
-        dir.Write("zero.aac", Join(AdifFile(spec, AacBlock(false, 0, 20)), std::vector<uint8_t>(3000, 0)));
+        dir.Write("zero.aac", Join(AdifFile(layout, AacBlock(false, 0, 20)), std::vector<uint8_t>(3000, 0)));
     const std::string out = dir.PathOf("out.aac");
     EXPECT_EQ(1, AAC_GetAuidoData_File(path.c_str(), -5, 5, out.c_str()));
     EXPECT_EQ(1, CutToBuffer(path, -5, 5).result);
@@ -228,7 +228,7 @@ TEST(AacExtract, EveryPathClosesItsFiles) {
     CutToBuffer(path, 1, 4);
     CutToBuffer(path, 4, 1);
     CutToBuffer(path, 0, 1);
-    const std::string tiny = dir.Write("tiny.aac", AdtsFrames(Spec8k(), std::vector<size_t>(4, 30)));
+    const std::string tiny = dir.Write("tiny.aac", AdtsFrames(Layout8k(), std::vector<size_t>(4, 30)));
     AAC_GetAuidoData_File(tiny.c_str(), -1, 1, out.c_str());
     CutToBuffer(tiny, -1, 1);
     EXPECT_EQ(before, OpenDescriptors());

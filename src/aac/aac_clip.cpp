@@ -96,8 +96,7 @@ int32_t OpenPastTags(const char* path, _MMClipInfo* clip, int* handle, uint32_t*
         return MM_E_FAIL;
     }
     const uint32_t tagSize = BytesEqual(probe, "ID3", 3) ? ReadSyncsafe32(probe + 6) : 0;
-    const uint32_t dataStart = tagSize > 0 ? tagSize + ((probe[5] & 0x10) ? 20 : 10) : 0;
-    MEx_fseek(h, static_cast<long>(dataStart), SEEK_SET);
+    MEx_fseek(h, static_cast<long>(AACLeadingTagSkip(probe)), SEEK_SET);
     *skipped = tagSize + trailing;
     *handle = h;
     return MM_OK;

@@ -139,12 +139,12 @@ std::vector<uint8_t> AdifFile(const AdifSpec& s, const std::vector<uint8_t>& fir
     return out;
 }
 
-std::vector<uint8_t> AdtsFrames(const AdtsSpec& spec, const std::vector<size_t>& sizes, int sbrExtension) {
+std::vector<uint8_t> AdtsFrames(const AdtsSpec& layout, const std::vector<size_t>& sizes, int sbrExtension) {
     std::vector<uint8_t> out;
-    const size_t header = spec.crc ? 9 : 7;
+    const size_t header = layout.crc ? 9 : 7;
     for (size_t size : sizes) {
         std::vector<uint8_t> frame =
-            AdtsFrame(spec, AacBlock(spec.channelConfig == 2, sbrExtension, size - header));
+            AdtsFrame(layout, AacBlock(layout.channelConfig == 2, sbrExtension, size - header));
         out.insert(out.end(), frame.begin(), frame.end());
     }
     return out;

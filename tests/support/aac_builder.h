@@ -63,9 +63,9 @@ struct AdifSpec {
     std::vector<PceSpec> pces{PceSpec{}};
 };
 // The ADIF header, its program configuration elements and the first raw data block.
-std::vector<uint8_t> AdifFile(const AdifSpec& spec, const std::vector<uint8_t>& firstBlock);
+std::vector<uint8_t> AdifFile(const AdifSpec& layout, const std::vector<uint8_t>& firstBlock);
 
 // ADTS frames, one per entry of sizes (each at least 18 bytes: 7 header + 11 block).
-std::vector<uint8_t> AdtsFrames(const AdtsSpec& spec, const std::vector<size_t>& sizes, int sbrExtension = 0);
+std::vector<uint8_t> AdtsFrames(const AdtsSpec& layout, const std::vector<size_t>& sizes, int sbrExtension = 0);
 
 }  // namespace testing_support
