@@ -3,6 +3,7 @@
 #include <cstdio>
 #include <cstdlib>
 
+#include "metainfo/aac.h"
 #include "metainfo/extract.h"
 #include "metainfo/metainfo.h"
 #include "probe_format.h"
@@ -18,6 +19,7 @@ struct FileCutter {
 // One row per format whose audio can be cut into a file.
 const FileCutter kCutters[] = {
     {MEDIA_TYPE_NONE, nullptr},
+    {MEDIA_TYPE_AAC, AAC_GetAuidoData_File},
 };
 
 MM_AudioToFileFn CutterFor(int type) {

@@ -1,7 +1,8 @@
 #include "aac/aac_frame.h"
 
 #include <cstdio>
-#include <vector>
+#include <memory>
+#include <new>
 
 #include "core/byte_reader.h"
 #include "core/file_access.h"
@@ -31,13 +32,14 @@ uint32_t AACLeadingTagSkip(const uint8_t* probe) {
 int32_t VerifyAAC(int h, const uint8_t* probe) {
     if (probe == nullptr) return MM_E_INVALIDARG;
     MEx_fseek(h, static_cast<long>(AACLeadingTagSkip(probe)), SEEK_SET);
-    std::vector<uint8_t> buf(kVerifyWindow);
-    const int n = MEx_fread(buf.data(), 1, kVerifyWindow, h);
+    std::unique_ptr<uint8_t[]> buf(new (std::nothrow) uint8_t[kVerifyWindow]);
+    if (!buf) return MM_E_FAIL;
+    const int n = MEx_fread(buf.get(), 1, kVerifyWindow, h);
     if (n < 4) return MM_E_FAIL;
     const int limit = n - 8;
     if (limit <= 0) return MM_E_UNSUPPORTED;
 
-    const uint8_t* b = buf.data();
+    const uint8_t* b = buf.get();
     int pos = 0;
     while (pos < limit && !IsADTSSync(b + pos) && !BytesEqual(b + pos, "ADIF", 4)) ++pos;
     if (pos >= limit) return MM_E_UNSUPPORTED;

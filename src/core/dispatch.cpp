@@ -2,6 +2,7 @@
 // row here and nothing else of the core knows about it.
 #include "core/dispatch.h"
 
+#include "aac/aac_clip.h"
 #include "asf/asf_header.h"
 #include "speech/midi.h"
 
@@ -20,7 +21,7 @@ const MM_TrackTypeFn MM_GetTrackType[MM_MEDIA_SLOTS] = {
     /* 3 MP4 */ nullptr,
     /* 4 ASF */ ASF_GetTrackType,
     /* 5 MIDI */ MIDI_GetTrackType,
-    /* 6 AAC */ nullptr,
+    /* 6 AAC */ AAC_GetTrackType,
     /* 7 WAVE */ nullptr,
     /* 8 AMR-NB */ nullptr,
     /* 9 AMR-WB */ nullptr,
@@ -40,17 +41,6 @@ const MM_MetaInfoFn MM_GetMetaInfo[MM_MEDIA_SLOTS] = {
     /* 4 ASF */ ASF_GetMetaInfo,
     /* 5 MIDI */ MIDI_GetMetaInfo,
     /* 6 AAC */ nullptr,
-    /* 7..15 */ nullptr, nullptr, nullptr, nullptr, nullptr, nullptr, nullptr, nullptr, nullptr,
-};
-
-const MM_ClipInfoFn MM_GetClipInfo[MM_MEDIA_SLOTS] = {
-    /* 0 */ nullptr,
-    /* 1 MP3 */ nullptr,
-    /* 2 RealMedia */ nullptr,
-    /* 3 MP4 */ nullptr,
-    /* 4 ASF */ ASF_GetClipInfo,
-    /* 5 MIDI */ MIDI_GetClipInfo,
-    /* 6 AAC */ nullptr,
     /* 7 WAVE */ nullptr,
     /* 8 AMR-NB */ nullptr,
     /* 9 AMR-WB */ nullptr,
@@ -62,14 +52,31 @@ const MM_ClipInfoFn MM_GetClipInfo[MM_MEDIA_SLOTS] = {
     /* 15 */ nullptr,
 };
 
-const MM_MIMETypeFn MM_GetMIMEType[MM_MEDIA_SLOTS] = {};
-const MM_AudioDataFn MM_GetAudioData[MM_MEDIA_SLOTS] = {};
-const MM_CodecTypeFn MM_GetCodecType[MM_MEDIA_SLOTS] = {
+const MM_ClipInfoFn MM_GetClipInfo[MM_MEDIA_SLOTS] = {
     /* 0 */ nullptr,
     /* 1 MP3 */ nullptr,
     /* 2 RealMedia */ nullptr,
     /* 3 MP4 */ nullptr,
-    /* 4 ASF */ ASF_GetCodecType,
+    /* 4 ASF */ ASF_GetClipInfo,
+    /* 5 MIDI */ MIDI_GetClipInfo,
+    /* 6 AAC */ AAC_GetClipInfo,
+    /* 7 WAVE */ nullptr,
+    /* 8 AMR-NB */ nullptr,
+    /* 9 AMR-WB */ nullptr,
+    /* 10 */ nullptr,
+    /* 11 AVI */ nullptr,
+    /* 12 QCP */ nullptr,
+    /* 13 EVRC */ nullptr,
+    /* 14 */ nullptr,
+    /* 15 */ nullptr,
+};
+
+const MM_MIMETypeFn MM_GetMIMEType[MM_MEDIA_SLOTS] = {
+    /* 0 */ nullptr,
+    /* 1 MP3 */ nullptr,
+    /* 2 RealMedia */ nullptr,
+    /* 3 MP4 */ nullptr,
+    /* 4 ASF */ nullptr,
     /* 5 MIDI */ nullptr,
     /* 6 AAC */ nullptr,
     /* 7 WAVE */ nullptr,
@@ -82,6 +89,46 @@ const MM_CodecTypeFn MM_GetCodecType[MM_MEDIA_SLOTS] = {
     /* 14 */ nullptr,
     /* 15 */ nullptr,
 };
+
+const MM_AudioDataFn MM_GetAudioData[MM_MEDIA_SLOTS] = {
+    /* 0 */ nullptr,
+    /* 1 MP3 */ nullptr,
+    /* 2 RealMedia */ nullptr,
+    /* 3 MP4 */ nullptr,
+    /* 4 ASF */ nullptr,
+    /* 5 MIDI */ nullptr,
+    /* 6 AAC */ nullptr,
+    /* 7 WAVE */ nullptr,
+    /* 8 AMR-NB */ nullptr,
+    /* 9 AMR-WB */ nullptr,
+    /* 10 */ nullptr,
+    /* 11 AVI */ nullptr,
+    /* 12 QCP */ nullptr,
+    /* 13 EVRC */ nullptr,
+    /* 14 */ nullptr,
+    /* 15 */ nullptr,
+};
+
+const MM_CodecTypeFn MM_GetCodecType[MM_MEDIA_SLOTS] = {
+    /* 0 */ nullptr,
+    /* 1 MP3 */ nullptr,
+    /* 2 RealMedia */ nullptr,
+    /* 3 MP4 */ nullptr,
+    /* 4 ASF */ ASF_GetCodecType,
+    /* 5 MIDI */ nullptr,
+    /* 6 AAC */ AAC_GetCodecType,
+    /* 7 WAVE */ nullptr,
+    /* 8 AMR-NB */ nullptr,
+    /* 9 AMR-WB */ nullptr,
+    /* 10 */ nullptr,
+    /* 11 AVI */ nullptr,
+    /* 12 QCP */ nullptr,
+    /* 13 EVRC */ nullptr,
+    /* 14 */ nullptr,
+    /* 15 */ nullptr,
+};
+
+// No format hands out video data.
 const MM_VideoDataFn MM_GetVideoData[MM_MEDIA_SLOTS] = {};
 
 }  // extern "C"
