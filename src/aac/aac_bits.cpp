@@ -33,7 +33,7 @@ void byte_alignment(int* bytePos, int* bitCount) {
 }
 
 AacBitReader MakeAacBitReader(const uint8_t* buf, int size, int bytePos, int bitCount) {
-    AacBitReader r{buf, size, bytePos, bitCount, false};
+    AacBitReader r{buf, size, bytePos, bitCount, false, false};
     if (buf == nullptr || size < 0 || bytePos < 0 || bitCount < 1 || bitCount > 8) r.exhausted = true;
     return r;
 }

@@ -27,6 +27,10 @@ struct AacBitReader {
     int bytePos;
     int bitCount;
     bool exhausted;
+    // Set once a short-window TNS filter has been read: the walker reads its
+    // coefficients one bit shorter than the encoders write them, so from there
+    // on the walk may leave the element boundaries.
+    bool shortWindowTns;
 };
 
 AacBitReader MakeAacBitReader(const uint8_t* buf, int size, int bytePos, int bitCount = 8);

@@ -207,7 +207,13 @@ int tns_data(AacBitReader* r, const ChannelStream* cs) {
             if (order == 0) continue;
             ReadBits(r, 1);  // direction
             const int coef_compress = static_cast<int>(ReadBits(r, 1));
-            const int coefBits = coef_res + 3 - coef_compress;
+            // Short windows take their coefficients one bit shorter: the walk
+            // has always read them so, and where SBR is found depends on it.
+            int coefBits = coef_res + 3 - coef_compress;
+            if (isShort) {
+                --coefBits;
+                r->shortWindowTns = true;
+            }
             for (int i = 0; i < order; ++i) ReadBits(r, coefBits);
         }
         if (r->exhausted) return kWalkOutOfData;
