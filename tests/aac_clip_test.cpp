@@ -67,8 +67,6 @@ std::vector<uint8_t> Id3WithFooter(size_t bodySize) {
     return Join(Id3v2Tag(4, Zeros(bodySize), 0x10), footer.data());
 }
 
-bool HaveFfmpeg() { return std::system("test -x /usr/bin/ffmpeg && test -x /usr/bin/ffprobe") == 0; }
-
 std::string CommandOutput(const std::string& cmd) {
     std::string out;
     FILE* p = popen(cmd.c_str(), "r");

@@ -57,17 +57,6 @@ BufResult CutToBuffer(const std::string& path, int start, int end) {
     return r;
 }
 
-int OpenDescriptors() {
-    int n = 0;
-    if (DIR* d = opendir("/proc/self/fd")) {
-        while (readdir(d) != nullptr) ++n;
-        closedir(d);
-    }
-    return n;
-}
-
-bool HaveFfmpeg() { return std::system("test -x /usr/bin/ffmpeg && test -x /usr/bin/ffprobe") == 0; }
-
 }  // namespace
 
 // --- File variant --------------------------------------------------------

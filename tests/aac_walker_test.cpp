@@ -71,8 +71,6 @@ std::string WalkEveryFrame(const std::vector<uint8_t>& data, size_t* walked, siz
     return failures;
 }
 
-bool HaveFfmpeg() { return std::system("test -x /usr/bin/ffmpeg && test -x /usr/bin/ffprobe") == 0; }
-
 }  // namespace
 
 TEST(AacWalker, EndElementFirstReadsNothingElse) {

@@ -65,15 +65,6 @@ void Capture(int priority, const char* tag, const char* message) {
     g_lines.push_back({priority, tag != nullptr ? tag : "", message});
 }
 
-int OpenDescriptors() {
-    int n = 0;
-    if (DIR* d = opendir("/proc/self/fd")) {
-        while (readdir(d) != nullptr) ++n;
-        closedir(d);
-    }
-    return n;
-}
-
 }  // namespace
 
 TEST(AsfClipInfo, FilePropertiesGiveSizeDurationAndBitrate) {

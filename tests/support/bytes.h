@@ -64,4 +64,10 @@ std::vector<uint8_t> ReadFileBytes(const std::string& path);
 // Folder of real-world media kept beside the project, or "" when absent.
 std::string CorpusDir();
 
+// True when ffmpeg and ffprobe are installed (tests that use them skip otherwise).
+bool HaveFfmpeg();
+
+// Number of file descriptors this process holds open (for leak checks).
+int OpenDescriptors();
+
 }  // namespace testing_support
