@@ -2,6 +2,8 @@
 // row here and nothing else of the core knows about it.
 #include "core/dispatch.h"
 
+#include "avi/avi_queries.h"
+#include "realmedia/rm_parser.h"
 #include "speech/midi.h"
 
 namespace metainfo {
@@ -15,7 +17,7 @@ extern "C" {
 const MM_TrackTypeFn MM_GetTrackType[MM_MEDIA_SLOTS] = {
     /* 0 */ nullptr,
     /* 1 MP3 */ nullptr,
-    /* 2 RealMedia */ nullptr,
+    /* 2 RealMedia */ RM_GetTrackType,
     /* 3 MP4 */ nullptr,
     /* 4 ASF */ nullptr,
     /* 5 MIDI */ MIDI_GetTrackType,
@@ -24,7 +26,7 @@ const MM_TrackTypeFn MM_GetTrackType[MM_MEDIA_SLOTS] = {
     /* 8 AMR-NB */ nullptr,
     /* 9 AMR-WB */ nullptr,
     /* 10 */ nullptr,
-    /* 11 AVI */ nullptr,
+    /* 11 AVI */ AVI_GetTrackType,
     /* 12 QCP */ nullptr,
     /* 13 EVRC */ nullptr,
     /* 14 */ nullptr,
@@ -34,7 +36,7 @@ const MM_TrackTypeFn MM_GetTrackType[MM_MEDIA_SLOTS] = {
 const MM_MetaInfoFn MM_GetMetaInfo[MM_MEDIA_SLOTS] = {
     /* 0 */ nullptr,
     /* 1 MP3 */ nullptr,
-    /* 2 RealMedia */ nullptr,
+    /* 2 RealMedia */ RM_GetMetaInfo,
     /* 3 MP4 */ nullptr,
     /* 4 ASF */ nullptr,
     /* 5 MIDI */ MIDI_GetMetaInfo,
@@ -45,7 +47,7 @@ const MM_MetaInfoFn MM_GetMetaInfo[MM_MEDIA_SLOTS] = {
 const MM_ClipInfoFn MM_GetClipInfo[MM_MEDIA_SLOTS] = {
     /* 0 */ nullptr,
     /* 1 MP3 */ nullptr,
-    /* 2 RealMedia */ nullptr,
+    /* 2 RealMedia */ RM_GetClipInfo,
     /* 3 MP4 */ nullptr,
     /* 4 ASF */ nullptr,
     /* 5 MIDI */ MIDI_GetClipInfo,
@@ -54,16 +56,30 @@ const MM_ClipInfoFn MM_GetClipInfo[MM_MEDIA_SLOTS] = {
     /* 8 AMR-NB */ nullptr,
     /* 9 AMR-WB */ nullptr,
     /* 10 */ nullptr,
-    /* 11 AVI */ nullptr,
+    /* 11 AVI */ AVI_GetClipInfo,
     /* 12 QCP */ nullptr,
     /* 13 EVRC */ nullptr,
     /* 14 */ nullptr,
     /* 15 */ nullptr,
 };
 
-const MM_MIMETypeFn MM_GetMIMEType[MM_MEDIA_SLOTS] = {};
+const MM_MIMETypeFn MM_GetMIMEType[MM_MEDIA_SLOTS] = {
+    /* 0 */ nullptr,
+    /* 1 MP3 */ nullptr,
+    /* 2 RealMedia */ RM_GetMIMEType,
+    /* 3..15 */ nullptr, nullptr, nullptr, nullptr, nullptr, nullptr, nullptr, nullptr, nullptr, nullptr, nullptr,
+    nullptr, nullptr,
+};
 const MM_AudioDataFn MM_GetAudioData[MM_MEDIA_SLOTS] = {};
-const MM_CodecTypeFn MM_GetCodecType[MM_MEDIA_SLOTS] = {};
+// AVI_GetCodecType exists but stays out of this table: AVI codec queries
+// answer "unsupported".
+const MM_CodecTypeFn MM_GetCodecType[MM_MEDIA_SLOTS] = {
+    /* 0 */ nullptr,
+    /* 1 MP3 */ nullptr,
+    /* 2 RealMedia */ RM_GetCodecType,
+    /* 3..15 */ nullptr, nullptr, nullptr, nullptr, nullptr, nullptr, nullptr, nullptr, nullptr, nullptr, nullptr,
+    nullptr, nullptr,
+};
 const MM_VideoDataFn MM_GetVideoData[MM_MEDIA_SLOTS] = {};
 
 }  // extern "C"
