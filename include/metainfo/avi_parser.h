@@ -182,6 +182,9 @@ private:
     int32_t parseInfo();
     int32_t parseHdrl();
     int32_t ParseStrl(const unsigned char* body, uint32_t size);
+    int32_t getAVIMainHeader(const unsigned char* body, uint32_t size);
+    int32_t getAVIStreamHeader(const unsigned char* body, uint32_t size, _AVIStreamHeader* header,
+                               uint32_t* chunkSize);
     int32_t getAVIStreamFormat(const unsigned char* chunk, uint32_t avail, uint32_t fccType);
     int32_t getChunkHeader(int handle, _CHUNKHEADER* header);
     int32_t getChunkHeader(const unsigned char* buf, _CHUNKHEADER* header);

@@ -231,25 +231,7 @@ int32_t CAVIParser::parseHdrl() {
         return MM_E_FAIL;
     }
 
-    // The main header is taken without checking its "avih" identifier.
-    uint8_t avih[kMainHeaderBytes];
-    CopyPadded(avih, sizeof avih, body, bodySize, 0);
-    mainHeader.cb = ReadLE32(avih + 4);
-    mainHeader.dwMicroSecPerFrame = ReadLE32(avih + 8);
-    mainHeader.dwMaxBytesPerSec = ReadLE32(avih + 12);
-    mainHeader.dwFlags = ReadBE32(avih + 20);
-    mainHeader.dwTotalFrames = ReadLE32(avih + 24);
-    mainHeader.dwInitialFrames = ReadLE32(avih + 28);
-    mainHeader.dwStreams = ReadLE32(avih + 32);
-    mainHeader.dwSuggestedBufferSize = ReadLE32(avih + 36);
-    mainHeader.dwWidth = ReadLE32(avih + 40);
-    mainHeader.dwHeight = ReadLE32(avih + 44);
-    for (int i = 0; i < 4; ++i) mainHeader.dwReserved[i] = ReadLE32(avih + 48 + 4 * i);
-    // The flag word is read big-endian, so the bits come from its swapped form.
-    mainHeader.bHasIndex = (mainHeader.dwFlags >> 4) & 1;
-    mainHeader.bMustUseIndex = (mainHeader.dwFlags >> 5) & 1;
-    mainHeader.bInterleaved = (mainHeader.dwFlags >> 8) & 1;
-    mainHeader.bCopyrighted = (mainHeader.dwFlags >> 17) & 1;
+    getAVIMainHeader(body, bodySize);
 
     int32_t result = MM_OK;
     uint64_t off = kMainHeaderBytes;
@@ -276,27 +258,58 @@ int32_t CAVIParser::parseHdrl() {
     return result;
 }
 
+// Takes the main header from the start of the header list without checking
+// its "avih" identifier; it always occupies 64 bytes.
+int32_t CAVIParser::getAVIMainHeader(const unsigned char* body, uint32_t size) {
+    uint8_t avih[kMainHeaderBytes];
+    CopyPadded(avih, sizeof avih, body, size, 0);
+    mainHeader.cb = ReadLE32(avih + 4);
+    mainHeader.dwMicroSecPerFrame = ReadLE32(avih + 8);
+    mainHeader.dwMaxBytesPerSec = ReadLE32(avih + 12);
+    mainHeader.dwFlags = ReadBE32(avih + 20);
+    mainHeader.dwTotalFrames = ReadLE32(avih + 24);
+    mainHeader.dwInitialFrames = ReadLE32(avih + 28);
+    mainHeader.dwStreams = ReadLE32(avih + 32);
+    mainHeader.dwSuggestedBufferSize = ReadLE32(avih + 36);
+    mainHeader.dwWidth = ReadLE32(avih + 40);
+    mainHeader.dwHeight = ReadLE32(avih + 44);
+    for (int i = 0; i < 4; ++i) mainHeader.dwReserved[i] = ReadLE32(avih + 48 + 4 * i);
+    // The flag word is read big-endian, so the bits come from its swapped form.
+    mainHeader.bHasIndex = (mainHeader.dwFlags >> 4) & 1;
+    mainHeader.bMustUseIndex = (mainHeader.dwFlags >> 5) & 1;
+    mainHeader.bInterleaved = (mainHeader.dwFlags >> 8) & 1;
+    mainHeader.bCopyrighted = (mainHeader.dwFlags >> 17) & 1;
+    return MM_OK;
+}
+
+int32_t CAVIParser::getAVIStreamHeader(const unsigned char* body, uint32_t size, _AVIStreamHeader* header,
+                                       uint32_t* chunkSize) {
+    if (size < 8 || !BytesEqual(body, "strh", 4)) return MM_E_FAIL;
+    uint8_t f[kStreamHeaderFieldBytes];
+    CopyPadded(f, sizeof f, body, size, 8);
+    header->fccType = ReadBE32(f);
+    header->fccHandler = ReadBE32(f + 4);
+    header->dwFlags = ReadBE32(f + 8);
+    header->dwPriorityLanguage = ReadLE32(f + 12);
+    header->dwInitialFrames = ReadLE32(f + 16);
+    header->dwScale = ReadLE32(f + 20);
+    header->dwRate = ReadLE32(f + 24);
+    header->dwStart = ReadLE32(f + 28);
+    header->dwLength = ReadLE32(f + 32);
+    header->dwSuggestedBufferSize = ReadLE32(f + 36);
+    header->dwQuality = ReadLE32(f + 40);
+    header->dwSampleSize = ReadLE32(f + 44);
+    *chunkSize = ReadLE32(body + 4);
+    return MM_OK;
+}
+
 int32_t CAVIParser::ParseStrl(const unsigned char* body, uint32_t size) {
     uint32_t slot = nStreamNum;
     if (slot >= AVI_STREAM_SLOTS) return MM_OK;
     std::memset(&aStreams[slot], 0, sizeof aStreams[slot]);
-    if (size < 8 || !BytesEqual(body, "strh", 4)) return MM_E_FAIL;
-    uint32_t strhSize = ReadLE32(body + 4);
-    uint8_t f[kStreamHeaderFieldBytes];
-    CopyPadded(f, sizeof f, body, size, 8);
     _AVIStreamHeader& h = aStreams[slot].header;
-    h.fccType = ReadBE32(f);
-    h.fccHandler = ReadBE32(f + 4);
-    h.dwFlags = ReadBE32(f + 8);
-    h.dwPriorityLanguage = ReadLE32(f + 12);
-    h.dwInitialFrames = ReadLE32(f + 16);
-    h.dwScale = ReadLE32(f + 20);
-    h.dwRate = ReadLE32(f + 24);
-    h.dwStart = ReadLE32(f + 28);
-    h.dwLength = ReadLE32(f + 32);
-    h.dwSuggestedBufferSize = ReadLE32(f + 36);
-    h.dwQuality = ReadLE32(f + 40);
-    h.dwSampleSize = ReadLE32(f + 44);
+    uint32_t strhSize = 0;
+    if (getAVIStreamHeader(body, size, &h, &strhSize) != MM_OK) return MM_E_FAIL;
 
     uint64_t formatAt = uint64_t(strhSize) + 8;
     if (formatAt < size) {
