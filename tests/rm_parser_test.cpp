@@ -265,6 +265,13 @@ TEST(RmHeaders, FileHeaderAndPropertiesAreChecked) {
     extraHeaders.patch_be32(14, 20);  // more headers than the file holds
     EXPECT_EQ(RM_GetMediaInfo(dir.Write("e.rm", extraHeaders).c_str(), 2, &clip), -3);
 
+    // A stream header cut off by the end of the file is a short read.
+    std::vector<uint8_t> late = RmFile(Props(1), {RmCont("", "", "", std::string(300, 'c')), RmMdpr(AudioStream())});
+    size_t mdprAt = 18 + 50 + 8 + 2 + 8 + 300;
+    ASSERT_EQ(std::memcmp(late.data() + mdprAt, "MDPR", 4), 0);
+    late.resize(mdprAt + 60);
+    EXPECT_EQ(RM_GetMediaInfo(dir.Write("late.rm", late).c_str(), 2, &clip), -4);
+
     EXPECT_EQ(RM_GetMediaInfo(dir.PathOf("missing.rm").c_str(), 2, &clip), -1);
     EXPECT_EQ(metainfo::RM_GetClipInfo(dir.PathOf("missing.rm").c_str(), &clip), -1);
     int mask = 5;

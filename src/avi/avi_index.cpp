@@ -257,6 +257,8 @@ int32_t CAVIParser::getNextFrame(uint32_t stream, _FrameInfo* info) {
     info->dwSize = e.dwChunkLength;
     info->dwTimeMs = e.dwTimeMs;
     if (e.dwChunkLength == 0) return MM_OK;
+    // A chunk the file cannot hold is a short read; nothing is allocated for it.
+    if (at + e.dwChunkLength > nFileSize) return MM_E_FAIL;
     unsigned char* data = new (std::nothrow) unsigned char[e.dwChunkLength];
     if (data == nullptr) return MM_E_OUTOFMEMORY;
     if (MEx_fseek(hFile, static_cast<long>(at), SEEK_SET) != 0 ||

@@ -26,9 +26,13 @@ public:
     ChunkBuffer(const ChunkBuffer&) = delete;
     ChunkBuffer& operator=(const ChunkBuffer&) = delete;
 
-    // The file stands at the chunk's start. 0 or kRmReadFailed.
-    int32_t Read(int h, uint32_t size, uint32_t minBytes) {
+    // The file stands at the chunk's start, fileSize - start bytes before the
+    // end. 0 or kRmReadFailed.
+    int32_t Read(int h, uint32_t size, uint32_t minBytes, uint64_t left) {
         delete[] data_;
+        data_ = nullptr;
+        // A chunk the file cannot hold is a short read; nothing is allocated for it.
+        if (size > left) return kRmReadFailed;
         uint64_t room = size > minBytes ? size : minBytes;
         data_ = new (std::nothrow) unsigned char[room]();
         if (data_ == nullptr) return kRmReadFailed;
@@ -40,6 +44,10 @@ public:
 private:
     unsigned char* data_ = nullptr;
 };
+
+uint64_t Left(uint64_t fileSize, long start) {
+    return start >= 0 && uint64_t(start) < fileSize ? fileSize - uint64_t(start) : 0;
+}
 
 bool ReadTag(int h, unsigned char tag[4]) { return MEx_fread(tag, 1, 4, h) == 4; }
 
@@ -146,7 +154,7 @@ int32_t RM_GetMediaInfo(const char* path, uint16_t request, void* out) {
     if (size < 1 || size >= fileSize) return kRmNotRealMedia;
     MEx_fseek(h, -8, SEEK_CUR);
     ChunkBuffer chunk;
-    int32_t r = chunk.Read(h, size, kRmfFieldBytes);
+    int32_t r = chunk.Read(h, size, kRmfFieldBytes, fileSize);
     if (r != 0) return r;
     uint16_t version = ReadBE16(chunk.data() + 8);
     uint32_t headerCount = ReadBE32(chunk.data() + 14);
@@ -155,8 +163,9 @@ int32_t RM_GetMediaInfo(const char* path, uint16_t request, void* out) {
     if (!ReadTag(h, tag) || std::memcmp(tag, "PROP", 4) != 0) return kRmBadHeader;
     size = GetUINT32(h, false);
     if (size < 1 || size >= fileSize) return kRmNotRealMedia;
+    long propStart = MEx_ftell(h) - 8;
     MEx_fseek(h, -8, SEEK_CUR);
-    r = chunk.Read(h, size, kPropFieldBytes);
+    r = chunk.Read(h, size, kPropFieldBytes, Left(fileSize, propStart));
     if (r != 0) return r;
     _PROPERTIES prop;
     anaProperties(chunk.data(), size, &prop);
@@ -173,7 +182,7 @@ int32_t RM_GetMediaInfo(const char* path, uint16_t request, void* out) {
         if (size <= 9 || size >= fileSize) return kRmBadChunk;
         if (std::memcmp(id, "MDPR", 4) == 0 && request != INFO_METADATA && taken < prop.num_streams) {
             MEx_fseek(h, start, SEEK_SET);
-            r = chunk.Read(h, size, kMdprFieldBytes);
+            r = chunk.Read(h, size, kMdprFieldBytes, Left(fileSize, start));
             if (r != 0) return r;
             _MEDIA_PROPERTIES mp;
             r = anaMediaProperties(chunk.data(), size, &mp);
@@ -182,7 +191,7 @@ int32_t RM_GetMediaInfo(const char* path, uint16_t request, void* out) {
             Classify(&mp, &streams);
         } else if (std::memcmp(id, "CONT", 4) == 0 && request == INFO_METADATA) {
             MEx_fseek(h, start, SEEK_SET);
-            r = chunk.Read(h, size, 0);
+            r = chunk.Read(h, size, 0, Left(fileSize, start));
             if (r != 0) return r;
             contentResult = anaContentHdr(chunk.data(), size, static_cast<_MMMetaInfo*>(out));
             break;
