@@ -4,6 +4,8 @@
 
 #include "aac/aac_clip.h"
 #include "asf/asf_header.h"
+#include "avi/avi_queries.h"
+#include "realmedia/rm_parser.h"
 #include "speech/midi.h"
 
 namespace metainfo {
@@ -17,7 +19,7 @@ extern "C" {
 const MM_TrackTypeFn MM_GetTrackType[MM_MEDIA_SLOTS] = {
     /* 0 */ nullptr,
     /* 1 MP3 */ nullptr,
-    /* 2 RealMedia */ nullptr,
+    /* 2 RealMedia */ RM_GetTrackType,
     /* 3 MP4 */ nullptr,
     /* 4 ASF */ ASF_GetTrackType,
     /* 5 MIDI */ MIDI_GetTrackType,
@@ -26,7 +28,7 @@ const MM_TrackTypeFn MM_GetTrackType[MM_MEDIA_SLOTS] = {
     /* 8 AMR-NB */ nullptr,
     /* 9 AMR-WB */ nullptr,
     /* 10 */ nullptr,
-    /* 11 AVI */ nullptr,
+    /* 11 AVI */ AVI_GetTrackType,
     /* 12 QCP */ nullptr,
     /* 13 EVRC */ nullptr,
     /* 14 */ nullptr,
@@ -36,7 +38,7 @@ const MM_TrackTypeFn MM_GetTrackType[MM_MEDIA_SLOTS] = {
 const MM_MetaInfoFn MM_GetMetaInfo[MM_MEDIA_SLOTS] = {
     /* 0 */ nullptr,
     /* 1 MP3 */ nullptr,
-    /* 2 RealMedia */ nullptr,
+    /* 2 RealMedia */ RM_GetMetaInfo,
     /* 3 MP4 */ nullptr,
     /* 4 ASF */ ASF_GetMetaInfo,
     /* 5 MIDI */ MIDI_GetMetaInfo,
@@ -55,7 +57,7 @@ const MM_MetaInfoFn MM_GetMetaInfo[MM_MEDIA_SLOTS] = {
 const MM_ClipInfoFn MM_GetClipInfo[MM_MEDIA_SLOTS] = {
     /* 0 */ nullptr,
     /* 1 MP3 */ nullptr,
-    /* 2 RealMedia */ nullptr,
+    /* 2 RealMedia */ RM_GetClipInfo,
     /* 3 MP4 */ nullptr,
     /* 4 ASF */ ASF_GetClipInfo,
     /* 5 MIDI */ MIDI_GetClipInfo,
@@ -64,7 +66,7 @@ const MM_ClipInfoFn MM_GetClipInfo[MM_MEDIA_SLOTS] = {
     /* 8 AMR-NB */ nullptr,
     /* 9 AMR-WB */ nullptr,
     /* 10 */ nullptr,
-    /* 11 AVI */ nullptr,
+    /* 11 AVI */ AVI_GetClipInfo,
     /* 12 QCP */ nullptr,
     /* 13 EVRC */ nullptr,
     /* 14 */ nullptr,
@@ -74,7 +76,7 @@ const MM_ClipInfoFn MM_GetClipInfo[MM_MEDIA_SLOTS] = {
 const MM_MIMETypeFn MM_GetMIMEType[MM_MEDIA_SLOTS] = {
     /* 0 */ nullptr,
     /* 1 MP3 */ nullptr,
-    /* 2 RealMedia */ nullptr,
+    /* 2 RealMedia */ RM_GetMIMEType,
     /* 3 MP4 */ nullptr,
     /* 4 ASF */ nullptr,
     /* 5 MIDI */ nullptr,
@@ -109,10 +111,12 @@ const MM_AudioDataFn MM_GetAudioData[MM_MEDIA_SLOTS] = {
     /* 15 */ nullptr,
 };
 
+// AVI_GetCodecType exists but stays out of this table: AVI codec queries
+// answer "unsupported".
 const MM_CodecTypeFn MM_GetCodecType[MM_MEDIA_SLOTS] = {
     /* 0 */ nullptr,
     /* 1 MP3 */ nullptr,
-    /* 2 RealMedia */ nullptr,
+    /* 2 RealMedia */ RM_GetCodecType,
     /* 3 MP4 */ nullptr,
     /* 4 ASF */ ASF_GetCodecType,
     /* 5 MIDI */ nullptr,

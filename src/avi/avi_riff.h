@@ -1,0 +1,31 @@
+// Small RIFF helpers shared by the AVI parser's files.
+#pragma once
+
+#include <cstdint>
+
+namespace metainfo {
+namespace avi {
+
+// A four-character code as the parser compares it (read big-endian).
+constexpr uint32_t Fourcc(const char (&s)[5]) {
+    return uint32_t(uint8_t(s[0])) << 24 | uint32_t(uint8_t(s[1])) << 16 | uint32_t(uint8_t(s[2])) << 8 |
+           uint32_t(uint8_t(s[3]));
+}
+
+// File positions and sizes are kept in 32 bits; larger values saturate.
+inline uint32_t PositionToU32(long v) {
+    if (v < 0) return 0;
+    return static_cast<unsigned long long>(v) > 0xFFFFFFFFull ? 0xFFFFFFFFu : static_cast<uint32_t>(v);
+}
+inline uint32_t ClampToU32(uint64_t v) { return v > 0xFFFFFFFFull ? 0xFFFFFFFFu : static_cast<uint32_t>(v); }
+
+// "avih" chunk header and body as the header list holds them.
+constexpr uint32_t kMainHeaderBytes = 64;
+// "strh" fields from fccType to dwSampleSize.
+constexpr uint32_t kStreamHeaderFieldBytes = 48;
+constexpr uint32_t kBitmapHeaderBytes = 40;
+constexpr uint32_t kWaveFormatBytes = 18;
+constexpr uint32_t kIndexEntryBytes = 16;
+
+}  // namespace avi
+}  // namespace metainfo
