@@ -432,7 +432,7 @@ TEST(AacFfmpeg, ClipInfoAgreesWithFfprobe) {
                           Case{44100, 2, 128}, Case{48000, 1, 64}}) {
         const std::string out = dir.PathOf("f" + std::to_string(c.rate) + ".aac");
         const std::string cmd = "/usr/bin/ffmpeg -hide_banner -loglevel error -y -f lavfi -i "
-                                "\"anoisesrc=d=6:c=pink:a=0.3:r=" + std::to_string(c.rate) + "\" -ac " +
+                                "\"anoisesrc=d=6:c=pink:a=0.3:seed=7:r=" + std::to_string(c.rate) + "\" -ac " +
                                 std::to_string(c.channels) + " -b:a " + std::to_string(c.kbps) + "k -c:a aac \"" +
                                 out + "\"";
         ASSERT_EQ(0, std::system(cmd.c_str())) << cmd;

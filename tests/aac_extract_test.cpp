@@ -246,7 +246,7 @@ TEST(AacExtractFfmpeg, CutsDecode) {
     TempDir dir;
     const std::string in = dir.PathOf("in.aac");
     const std::string cmd = "/usr/bin/ffmpeg -hide_banner -loglevel error -y -f lavfi -i "
-                            "\"anoisesrc=d=6:c=pink:a=0.3:r=44100\" -ac 2 -c:a aac \"" + in + "\"";
+                            "\"anoisesrc=d=6:c=pink:a=0.3:seed=7:r=44100\" -ac 2 -c:a aac \"" + in + "\"";
     ASSERT_EQ(0, std::system(cmd.c_str()));
     const std::string out = dir.PathOf("cut.aac");
     ASSERT_EQ(MM_OK, AAC_GetAuidoData_File(in.c_str(), 1, 4, out.c_str()));
