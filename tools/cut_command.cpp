@@ -18,6 +18,7 @@ struct FileCutter {
 // One row per format whose audio can be cut into a file.
 const FileCutter kCutters[] = {
     {MEDIA_TYPE_NONE, nullptr},
+    {MEDIA_TYPE_MP3, MP3_GetAudioData2File},
 };
 
 MM_AudioToFileFn CutterFor(int type) {

@@ -2,6 +2,9 @@
 // row here and nothing else of the core knows about it.
 #include "core/dispatch.h"
 
+#include "mp3/id3.h"
+#include "mp3/mp3_extract.h"
+#include "mp3/mp3_info.h"
 #include "speech/midi.h"
 
 namespace metainfo {
@@ -14,7 +17,7 @@ extern "C" {
 
 const MM_TrackTypeFn MM_GetTrackType[MM_MEDIA_SLOTS] = {
     /* 0 */ nullptr,
-    /* 1 MP3 */ nullptr,
+    /* 1 MP3 */ MP3_GetTrackType,
     /* 2 RealMedia */ nullptr,
     /* 3 MP4 */ nullptr,
     /* 4 ASF */ nullptr,
@@ -33,18 +36,18 @@ const MM_TrackTypeFn MM_GetTrackType[MM_MEDIA_SLOTS] = {
 
 const MM_MetaInfoFn MM_GetMetaInfo[MM_MEDIA_SLOTS] = {
     /* 0 */ nullptr,
-    /* 1 MP3 */ nullptr,
+    /* 1 MP3 */ ID3_GetMetaInfo,
     /* 2 RealMedia */ nullptr,
     /* 3 MP4 */ nullptr,
     /* 4 ASF */ nullptr,
     /* 5 MIDI */ MIDI_GetMetaInfo,
-    /* 6 AAC */ nullptr,
+    /* 6 AAC */ ID3_GetMetaInfo,
     /* 7..15 */ nullptr, nullptr, nullptr, nullptr, nullptr, nullptr, nullptr, nullptr, nullptr,
 };
 
 const MM_ClipInfoFn MM_GetClipInfo[MM_MEDIA_SLOTS] = {
     /* 0 */ nullptr,
-    /* 1 MP3 */ nullptr,
+    /* 1 MP3 */ MP3_GetClipInfo,
     /* 2 RealMedia */ nullptr,
     /* 3 MP4 */ nullptr,
     /* 4 ASF */ nullptr,
@@ -61,9 +64,18 @@ const MM_ClipInfoFn MM_GetClipInfo[MM_MEDIA_SLOTS] = {
     /* 15 */ nullptr,
 };
 
-const MM_MIMETypeFn MM_GetMIMEType[MM_MEDIA_SLOTS] = {};
-const MM_AudioDataFn MM_GetAudioData[MM_MEDIA_SLOTS] = {};
-const MM_CodecTypeFn MM_GetCodecType[MM_MEDIA_SLOTS] = {};
+const MM_MIMETypeFn MM_GetMIMEType[MM_MEDIA_SLOTS] = {
+    /* 0 */ nullptr,
+    /* 1 MP3 */ MP3_GetMIMEType,
+};
+const MM_AudioDataFn MM_GetAudioData[MM_MEDIA_SLOTS] = {
+    /* 0 */ nullptr,
+    /* 1 MP3 */ MP3_GetAudioData2Buf,
+};
+const MM_CodecTypeFn MM_GetCodecType[MM_MEDIA_SLOTS] = {
+    /* 0 */ nullptr,
+    /* 1 MP3 */ MP3_GetCodecType,
+};
 const MM_VideoDataFn MM_GetVideoData[MM_MEDIA_SLOTS] = {};
 
 }  // extern "C"
