@@ -447,3 +447,23 @@ TEST(Id3Tags, ByteOrderHelpers) {
     uint8_t shortBody[] = {1, 2, 3};
     EXPECT_EQ(RemoveDataLengthIndicator(shortBody, 3), 3u);
 }
+
+TEST(Id3Tags, ShortFrameBodyEndsAVersion24TagOnly) {
+    // An embedded tag whose bound exceeds what the file still holds: a v2.4
+    // frame cut short fails the tag, a v2.3 one keeps what was read.
+    for (int version : {3, 4}) {
+        TempDir dir;
+        Bytes tag;
+        tag.raw(Id3Frame(version, "TIT2", TextBody(0, "From v2")))
+            .raw(Id3Frame(version, "PRIV", std::vector<uint8_t>(400, 1)));
+        std::vector<uint8_t> file = Id3Tag(version, {tag.data()});
+        file.resize(file.size() - 300);
+        const int h = MEx_fopen(dir.Write("cut.bin", file).c_str(), "rb");
+        ASSERT_NE(h, 0);
+        Meta m;
+        ID3_MetaInfo ctx = {&m.meta, 100000, 0, 1, 0, 0};
+        EXPECT_EQ(ParseID3V2(h, &ctx), version == 4 ? 1 : 0) << version;
+        EXPECT_EQ(m.Text(META_TITLE), "From v2");
+        MEx_fclose(h);
+    }
+}

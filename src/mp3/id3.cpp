@@ -76,6 +76,19 @@ void SetV24Encoding(_MMMetaItem* item, uint8_t encodingByte) {
     else if (encodingByte > 3) item->nEncoding = ENCODING_LATIN1;
 }
 
+// Passes over a frame body that fills nothing. Where a short body fails the
+// tag (v2.4) the bytes are read through a small block, else the file seeks.
+bool PassOver(int h, uint32_t size, bool mustBePresent) {
+    if (!mustBePresent) return MEx_fseek(h, static_cast<long>(size), SEEK_CUR) == 0;
+    uint8_t block[4096];
+    while (size > 0) {
+        const uint32_t want = std::min<uint32_t>(size, sizeof block);
+        if (MEx_fread(block, 1, want, h) != static_cast<int>(want)) return false;
+        size -= want;
+    }
+    return true;
+}
+
 // Reads a frame body of `size` bytes; a short read leaves zeros, or is
 // reported through *complete.
 uint8_t* ReadBody(int h, uint32_t size, bool* complete) {
@@ -212,6 +225,10 @@ int32_t ParseFrames(int h, ID3_MetaInfo* ctx) {
             if (MEx_fseek(h, bodyStart + static_cast<long>(size), SEEK_SET) != 0) return MM_E_FAIL;
             continue;
         }
+        if (!IsTableFrame(id)) {
+            if (!PassOver(h, size, v24)) return MM_E_FAIL;
+            continue;
+        }
         bool complete = false;
         uint8_t* body = ReadBody(h, size, &complete);
         if (body == nullptr) return MM_E_FAIL;
@@ -284,6 +301,10 @@ int32_t ParseID3V2_2(int h, ID3_MetaInfo* ctx) {
             const long bodyStart = MEx_ftell(h);
             if (GetPicData(h, size, ctx, ctx->unsync != 0) == MM_E_OUTOFMEMORY) return MM_E_FAIL;
             if (MEx_fseek(h, bodyStart + static_cast<long>(size), SEEK_SET) != 0) return MM_E_FAIL;
+            continue;
+        }
+        if (!IsTableFrame(id)) {
+            if (!PassOver(h, size, false)) return MM_E_FAIL;
             continue;
         }
         bool complete = false;

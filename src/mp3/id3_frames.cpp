@@ -219,6 +219,8 @@ int32_t FillTimeStamp(const uint8_t* body, uint32_t size, _MMMetaInfo* meta) {
     return MM_OK;
 }
 
+bool IsTableFrame(uint32_t id) { return RuleFor(id) != nullptr; }
+
 _MMMetaItem* V24TextItem(uint32_t id, _MMMetaInfo* meta) {
     const FrameRule* rule = RuleFor(id);
     return rule != nullptr && rule->v24Text ? ItemOf(*rule, meta) : nullptr;

@@ -20,6 +20,9 @@ constexpr uint32_t FrameId(const char (&s)[4]) {
 // 0; MM_E_FAIL for a short "PCNT" or a "POPM" without terminator.
 int32_t GetMetaData(uint32_t id, uint8_t* body, uint32_t size, _MMMetaInfo* meta);
 
+// True for the frames that fill the record; all others are passed over.
+bool IsTableFrame(uint32_t id);
+
 // The item a text frame of v2.4 takes its encoding code from, or null.
 _MMMetaItem* V24TextItem(uint32_t id, _MMMetaInfo* meta);
 
