@@ -107,6 +107,7 @@ long ParsePictureHead(const uint8_t* buf, uint32_t length, uint8_t version, bool
     ByteReader r(buf, length);
     uint8_t encoding = 0;
     if (!r.U8(&encoding)) return -1;
+    format->nEncoding = ENCODING_LATIN1;
     if (version == 2) {
         const uint8_t* image = r.Peek(3);
         if (image == nullptr) return -1;
@@ -130,7 +131,6 @@ long ParsePictureHead(const uint8_t* buf, uint32_t length, uint8_t version, bool
         if (zero == nullptr) return -1;
         r.Skip(static_cast<size_t>(static_cast<const uint8_t*>(zero) - mime) + 1);
     }
-    format->nEncoding = ENCODING_LATIN1;
     if (!r.Skip(1)) return -1;  // picture type
     if (encoding == 1) {
         for (;;) {
