@@ -15,6 +15,8 @@
 #include "mp3/mp3_extract.h"
 #include "mp3/mp3_info.h"
 #include "support/bytes.h"
+#include "support/id3_builder.h"
+#include "support/mp3_builder.h"
 
 using namespace testing_support;
 using namespace metainfo;
@@ -120,4 +122,53 @@ TEST(Mp3Corpus, HandDerivedValues) {
 
     // Hostile files are refused or answered, never more.
     EXPECT_NE(MP3_GetClipInfo((corpus + "/mutagen/emptyfile.mp3").c_str(), &clip), MM_OK);
+}
+
+TEST(Mp3Robustness, DamagedCopiesOfATaggedXingFileAreAnsweredWithoutFault) {
+    // Deterministic byte damage over a file with every structure the readers
+    // walk: v2.3 tag with text and picture, Xing frame, frames, v1 tag.
+    Bytes apic;
+    apic.u8(0).str("image/png").u8(0).u8(3).str("d").u8(0).fill(64, 0xFF);
+    Bytes comm;
+    comm.u8(1).str("eng").raw(std::vector<uint8_t>{0xFF, 0xFE, 0, 0, 0xFF, 0xFE, 'c', 0});
+    XingSpec xing;
+    xing.frames = 40;
+    xing.bytes = 40 * 417;
+    Id3v1Spec v1;
+    v1.title = "v1";
+    Bytes file;
+    file.raw(Id3Tag(3, {Id3Frame(3, "TIT2", TextBody(0, "Title")), Id3Frame(3, "APIC", apic.data()),
+                        Id3Frame(3, "COMM", comm.data()), Id3Frame(3, "TCON", TextBody(0, "(17)")),
+                        Id3Frame(3, "TDRC", TextBody(0, "2004-05-0"))}))
+        .raw(XingFrame(Mp3FrameSpec{}, xing))
+        .raw(Mp3Frames(Mp3FrameSpec{}, 39))
+        .raw(Id3v1(v1));
+    const std::vector<uint8_t>& source = file.data();
+    TempDir dir;
+    uint32_t seed = 12345;
+    auto next = [&seed]() {
+        seed = seed * 1103515245u + 12345u;
+        return seed >> 8;
+    };
+    for (int round = 0; round < 150; ++round) {
+        std::vector<uint8_t> damaged = source;
+        const int edits = 1 + static_cast<int>(next() % 8);
+        for (int e = 0; e < edits; ++e) {
+            // Most damage lands in the first kilobyte, where the tag and first frames are.
+            const size_t span = (next() & 1) ? 1024 : damaged.size();
+            damaged[next() % span] = static_cast<uint8_t>(next());
+        }
+        if (round % 10 == 0) damaged.resize(next() % damaged.size());
+        const std::string path = dir.Write("damaged.mp3", damaged);
+        _MMClipInfo clip;
+        MM_MediaExtractor_GetClipInfo(path.c_str(), MEDIA_TYPE_MP3, &clip);
+        _MMMetaInfo meta;
+        MM_MediaExtractor_GetMetaInfo(path.c_str(), MEDIA_TYPE_MP3, &meta);
+        MM_MediaExtractor_FreeMetaInfo(&meta);
+        unsigned char* data = nullptr;
+        int size = 0;
+        MP3_GetAudioData2Buf(path.c_str(), 0, 2, &data, &size);
+        MM_MediaExtractor_FreeBuffer(data);
+        MP3_GetAudioData2File(path.c_str(), 1, 3, dir.PathOf("out.mp3").c_str());
+    }
 }

@@ -60,7 +60,7 @@ int32_t SkipUnsyncExtendedHeader(int h, uint32_t tagSize, uint32_t* extendedSize
     // Up to twice the size in raw bytes, never more than the tag holds.
     const uint32_t want = static_cast<uint32_t>(std::min<uint64_t>(uint64_t(size) * 2, tagSize));
     uint8_t* scratch = new (std::nothrow) uint8_t[want];
-    if (scratch == nullptr) return MM_E_NOEXTENSION;
+    if (scratch == nullptr) return MM_E_NOEXTENSION;  // the code this step has always given for memory
     const int read = MEx_fread(scratch, 1, want, h);
     const uint32_t span = read > 0 ? RawSpan(scratch, static_cast<uint32_t>(read), size) : 0;
     delete[] scratch;

@@ -19,7 +19,7 @@ struct XingSpec {
     uint32_t quality = 57;
     const char* tag = "Xing";
 };
-// A frame of spec's size carrying a Xing header at the offset the reader expects.
+// A frame of the given kind's size, carrying a Xing header at the offset the reader expects.
 std::vector<uint8_t> XingFrame(const Mp3FrameSpec& spec, const XingSpec& xing);
 uint32_t XingDistanceFor(const Mp3FrameSpec& spec);
 
