@@ -20,6 +20,7 @@ struct FileCutter {
 const FileCutter kCutters[] = {
     {MEDIA_TYPE_NONE, nullptr},
     {MEDIA_TYPE_AAC, AAC_GetAuidoData_File},
+    {MEDIA_TYPE_MP3, MP3_GetAudioData2File},
 };
 
 MM_AudioToFileFn CutterFor(int type) {

@@ -15,6 +15,10 @@ typedef int32_t (*MM_AudioToFileFn)(const char* path, int startSec, int endSec, 
 
 /* Each audio format that can be cut declares its function here. */
 
+/* MP3: the leading ID3v2 data, a Xing frame rewritten for the range (when the
+ * source has one), the frames of [startSec, endSec) and the trailing ID3v1 tag. */
+MM_EXPORT int32_t MP3_GetAudioData2File(const char* path, int startSec, int endSec, const char* outPath);
+
 #ifdef __cplusplus
 }
 #endif

@@ -5,6 +5,9 @@
 #include "aac/aac_clip.h"
 #include "asf/asf_header.h"
 #include "avi/avi_queries.h"
+#include "mp3/id3.h"
+#include "mp3/mp3_extract.h"
+#include "mp3/mp3_info.h"
 #include "realmedia/rm_parser.h"
 #include "speech/midi.h"
 
@@ -18,7 +21,7 @@ extern "C" {
 
 const MM_TrackTypeFn MM_GetTrackType[MM_MEDIA_SLOTS] = {
     /* 0 */ nullptr,
-    /* 1 MP3 */ nullptr,
+    /* 1 MP3 */ MP3_GetTrackType,
     /* 2 RealMedia */ RM_GetTrackType,
     /* 3 MP4 */ nullptr,
     /* 4 ASF */ ASF_GetTrackType,
@@ -37,12 +40,12 @@ const MM_TrackTypeFn MM_GetTrackType[MM_MEDIA_SLOTS] = {
 
 const MM_MetaInfoFn MM_GetMetaInfo[MM_MEDIA_SLOTS] = {
     /* 0 */ nullptr,
-    /* 1 MP3 */ nullptr,
+    /* 1 MP3 */ ID3_GetMetaInfo,
     /* 2 RealMedia */ RM_GetMetaInfo,
     /* 3 MP4 */ nullptr,
     /* 4 ASF */ ASF_GetMetaInfo,
     /* 5 MIDI */ MIDI_GetMetaInfo,
-    /* 6 AAC */ nullptr,
+    /* 6 AAC */ ID3_GetMetaInfo,
     /* 7 WAVE */ nullptr,
     /* 8 AMR-NB */ nullptr,
     /* 9 AMR-WB */ nullptr,
@@ -56,7 +59,7 @@ const MM_MetaInfoFn MM_GetMetaInfo[MM_MEDIA_SLOTS] = {
 
 const MM_ClipInfoFn MM_GetClipInfo[MM_MEDIA_SLOTS] = {
     /* 0 */ nullptr,
-    /* 1 MP3 */ nullptr,
+    /* 1 MP3 */ MP3_GetClipInfo,
     /* 2 RealMedia */ RM_GetClipInfo,
     /* 3 MP4 */ nullptr,
     /* 4 ASF */ ASF_GetClipInfo,
@@ -75,7 +78,7 @@ const MM_ClipInfoFn MM_GetClipInfo[MM_MEDIA_SLOTS] = {
 
 const MM_MIMETypeFn MM_GetMIMEType[MM_MEDIA_SLOTS] = {
     /* 0 */ nullptr,
-    /* 1 MP3 */ nullptr,
+    /* 1 MP3 */ MP3_GetMIMEType,
     /* 2 RealMedia */ RM_GetMIMEType,
     /* 3 MP4 */ nullptr,
     /* 4 ASF */ nullptr,
@@ -94,7 +97,7 @@ const MM_MIMETypeFn MM_GetMIMEType[MM_MEDIA_SLOTS] = {
 
 const MM_AudioDataFn MM_GetAudioData[MM_MEDIA_SLOTS] = {
     /* 0 */ nullptr,
-    /* 1 MP3 */ nullptr,
+    /* 1 MP3 */ MP3_GetAudioData2Buf,
     /* 2 RealMedia */ nullptr,
     /* 3 MP4 */ nullptr,
     /* 4 ASF */ nullptr,
@@ -115,7 +118,7 @@ const MM_AudioDataFn MM_GetAudioData[MM_MEDIA_SLOTS] = {
 // answer "unsupported".
 const MM_CodecTypeFn MM_GetCodecType[MM_MEDIA_SLOTS] = {
     /* 0 */ nullptr,
-    /* 1 MP3 */ nullptr,
+    /* 1 MP3 */ MP3_GetCodecType,
     /* 2 RealMedia */ RM_GetCodecType,
     /* 3 MP4 */ nullptr,
     /* 4 ASF */ ASF_GetCodecType,
