@@ -7,6 +7,7 @@
 #include "metainfo/metainfo.h"
 #include "realmedia/rm_parser.h"
 #include "support/bytes.h"
+#include "support/id3_builder.h"
 #include "support/rm_builder.h"
 
 using namespace testing_support;
@@ -227,6 +228,27 @@ TEST(RmMetaInfo, WithoutContentAndWithoutTagTheQueryFails) {
     _MMMetaInfo meta{};
     EXPECT_NE(RM_GetMediaInfo(path.c_str(), 1, &meta), 0);
     EXPECT_EQ(metainfo::RM_GetMetaInfo(path.c_str(), &meta, 1), 1);
+}
+
+TEST(RmMetaInfo, WithoutContentAnId3v1TagAtTheEndIsRead) {
+    TempDir dir;
+    Id3v1Spec tag;
+    tag.title = "Tagged";
+    tag.artist = "Someone";
+    tag.genre = 8;  // Jazz
+    Bytes file = Bytes().raw(RmFile(Props(1), {RmMdpr(AudioStream())})).raw(Id3v1(tag));
+    std::string path = dir.Write("tagged.rm", file);
+    _MMMetaInfo meta{};
+    ASSERT_EQ(MM_MediaExtractor_GetMetaInfo(path.c_str(), MEDIA_TYPE_REALMEDIA, &meta), MM_OK);
+    EXPECT_EQ(Item(meta, META_TITLE), "Tagged");
+    EXPECT_EQ(Item(meta, META_ARTIST), "Someone");
+    EXPECT_EQ(Item(meta, META_GENRE), "Jazz");
+
+    Bytes both = Bytes().raw(RmFile(Props(1), {RmCont("Content", "", "", ""), RmMdpr(AudioStream())})).raw(Id3v1(tag));
+    std::string bp = dir.Write("both.rm", both);
+    std::memset(&meta, 0, sizeof meta);
+    ASSERT_EQ(MM_MediaExtractor_GetMetaInfo(bp.c_str(), MEDIA_TYPE_REALMEDIA, &meta), MM_OK);
+    EXPECT_EQ(Item(meta, META_TITLE), "Content") << "the content description comes first";
 }
 
 TEST(RmHeaders, FileHeaderAndPropertiesAreChecked) {

@@ -9,7 +9,7 @@
 
 #include "core/byte_reader.h"
 #include "core/file_access.h"
-#include "realmedia/rm_id3_bridge.h"
+#include "mp3/id3.h"
 
 namespace metainfo {
 namespace {
@@ -207,7 +207,7 @@ int32_t RM_GetMediaInfo(const char* path, uint16_t request, void* out) {
         case INFO_METADATA:
             if (contentResult == 0) return 0;
             // No usable "CONT": an ID3v1 tag at the end may still name the clip.
-            return RmParseID3V1(h, static_cast<_MMMetaInfo*>(out)) == 0 ? 0 : contentResult;
+            return ParseID3V1(h, static_cast<_MMMetaInfo*>(out)) == 0 ? 0 : contentResult;
         case INFO_CLIPINFO:
             FillClip(prop, streams, static_cast<_MMClipInfo*>(out));
             return 0;
