@@ -15,6 +15,11 @@ typedef int32_t (*MM_AudioToFileFn)(const char* path, int startSec, int endSec, 
 
 /* Each audio format that can be cut declares its function here. */
 
+/* AMR: a new file with the source's magic and the range's frames. */
+MM_EXPORT int32_t AMR_GetAudioData2File(const char* path, int startSec, int endSec, const char* outPath);
+/* WAVE: a new RIFF WAVE file with the source's header chunks and the range's samples. */
+MM_EXPORT int32_t WAVE_GetAudioData2File(const char* path, int startSec, int endSec, const char* outPath);
+
 #ifdef __cplusplus
 }
 #endif

@@ -2,7 +2,11 @@
 // row here and nothing else of the core knows about it.
 #include "core/dispatch.h"
 
+#include "speech/amr.h"
+#include "speech/evrc.h"
 #include "speech/midi.h"
+#include "speech/qcp.h"
+#include "speech/wave.h"
 
 namespace metainfo {
 const MakerInfoFn kMakerInfoReader = nullptr;
@@ -20,13 +24,13 @@ const MM_TrackTypeFn MM_GetTrackType[MM_MEDIA_SLOTS] = {
     /* 4 ASF */ nullptr,
     /* 5 MIDI */ MIDI_GetTrackType,
     /* 6 AAC */ nullptr,
-    /* 7 WAVE */ nullptr,
-    /* 8 AMR-NB */ nullptr,
-    /* 9 AMR-WB */ nullptr,
+    /* 7 WAVE */ WAVE_GetTrackType,
+    /* 8 AMR-NB */ AMR_GetTrackType,
+    /* 9 AMR-WB */ AMR_GetTrackType,
     /* 10 */ nullptr,
     /* 11 AVI */ nullptr,
-    /* 12 QCP */ nullptr,
-    /* 13 EVRC */ nullptr,
+    /* 12 QCP */ QCP_GetTrackType,
+    /* 13 EVRC */ EVRC_GetTrackType,
     /* 14 */ nullptr,
     /* 15 */ nullptr,
 };
@@ -50,9 +54,28 @@ const MM_ClipInfoFn MM_GetClipInfo[MM_MEDIA_SLOTS] = {
     /* 4 ASF */ nullptr,
     /* 5 MIDI */ MIDI_GetClipInfo,
     /* 6 AAC */ nullptr,
-    /* 7 WAVE */ nullptr,
-    /* 8 AMR-NB */ nullptr,
-    /* 9 AMR-WB */ nullptr,
+    /* 7 WAVE */ WAVE_GetClipInfo,
+    /* 8 AMR-NB */ AMR_GetClipInfo,
+    /* 9 AMR-WB */ AMR_GetClipInfo,
+    /* 10 */ nullptr,
+    /* 11 AVI */ nullptr,
+    /* 12 QCP */ QCP_GetClipInfo,
+    /* 13 EVRC */ EVRC_GetClipInfo,
+    /* 14 */ nullptr,
+    /* 15 */ nullptr,
+};
+
+const MM_MIMETypeFn MM_GetMIMEType[MM_MEDIA_SLOTS] = {
+    /* 0 */ nullptr,
+    /* 1 MP3 */ nullptr,
+    /* 2 RealMedia */ nullptr,
+    /* 3 MP4 */ nullptr,
+    /* 4 ASF */ nullptr,
+    /* 5 MIDI */ nullptr,
+    /* 6 AAC */ nullptr,
+    /* 7 WAVE */ WAVE_GetMIMEType,
+    /* 8 AMR-NB */ AMR_GetMIMEType,
+    /* 9 AMR-WB */ AMR_GetMIMEType,
     /* 10 */ nullptr,
     /* 11 AVI */ nullptr,
     /* 12 QCP */ nullptr,
@@ -61,9 +84,44 @@ const MM_ClipInfoFn MM_GetClipInfo[MM_MEDIA_SLOTS] = {
     /* 15 */ nullptr,
 };
 
-const MM_MIMETypeFn MM_GetMIMEType[MM_MEDIA_SLOTS] = {};
-const MM_AudioDataFn MM_GetAudioData[MM_MEDIA_SLOTS] = {};
-const MM_CodecTypeFn MM_GetCodecType[MM_MEDIA_SLOTS] = {};
+const MM_AudioDataFn MM_GetAudioData[MM_MEDIA_SLOTS] = {
+    /* 0 */ nullptr,
+    /* 1 MP3 */ nullptr,
+    /* 2 RealMedia */ nullptr,
+    /* 3 MP4 */ nullptr,
+    /* 4 ASF */ nullptr,
+    /* 5 MIDI */ nullptr,
+    /* 6 AAC */ nullptr,
+    /* 7 WAVE */ WAVE_GetAudioData2Buf,
+    /* 8 AMR-NB */ AMR_GetAudioData2Buf,
+    /* 9 AMR-WB */ AMR_GetAudioData2Buf,
+    /* 10 */ nullptr,
+    /* 11 AVI */ nullptr,
+    /* 12 QCP */ nullptr,
+    /* 13 EVRC */ nullptr,
+    /* 14 */ nullptr,
+    /* 15 */ nullptr,
+};
+
+const MM_CodecTypeFn MM_GetCodecType[MM_MEDIA_SLOTS] = {
+    /* 0 */ nullptr,
+    /* 1 MP3 */ nullptr,
+    /* 2 RealMedia */ nullptr,
+    /* 3 MP4 */ nullptr,
+    /* 4 ASF */ nullptr,
+    /* 5 MIDI */ nullptr,
+    /* 6 AAC */ nullptr,
+    /* 7 WAVE */ WAVE_GetCodecType,
+    /* 8 AMR-NB */ AMR_GetCodecType,
+    /* 9 AMR-WB */ AMR_GetCodecType,
+    /* 10 */ nullptr,
+    /* 11 AVI */ nullptr,
+    /* 12 QCP */ QCP_GetCodecType,
+    /* 13 EVRC */ EVRC_GetCodecType,
+    /* 14 */ nullptr,
+    /* 15 */ nullptr,
+};
+
 const MM_VideoDataFn MM_GetVideoData[MM_MEDIA_SLOTS] = {};
 
 }  // extern "C"
