@@ -89,39 +89,29 @@ uint32_t CodecOfTag(uint16_t tag) {
 
 int32_t ParseFormatChunk(const uint8_t* buffer, size_t length, _FormatChunk* format) {
     std::memset(format, 0, sizeof *format);
-    if (buffer == nullptr || length < 12 || !BytesEqual(buffer, "RIFF", 4) || !BytesEqual(buffer + 8, "WAVE", 4)) {
+    ByteReader r(buffer, length);
+    if (!r.Tag("RIFF", 4) || !r.Seek(8) || !r.Tag("WAVE", 4)) return MM_E_UNSUPPORTED;
+    r.Seek(12);
+    uint64_t skipped = 0;
+    uint32_t size = 0;
+    while (!r.Tag("fmt ", 4)) {
+        if (!r.Skip(4) || !r.LE32(&size) || !r.Skip(size)) return MM_E_UNSUPPORTED;
+        skipped += size;
+    }
+    size_t fmtStart = r.position();
+    if (!r.BE32(&format->nChunkId) || !r.LE32(&format->nChunkSize) || !r.LE16(&format->wFormatTag) ||
+        !r.LE16(&format->nChannels) || !r.LE32(&format->nSamplesPerSec) || !r.LE32(&format->nAvgBytesPerSec) ||
+        !r.LE16(&format->nBlockAlign) || !r.LE16(&format->wBitsPerSample)) {
         return MM_E_UNSUPPORTED;
     }
-    uint64_t pos = 12;
-    uint64_t skipped = 0;
-    for (;;) {
-        if (pos + 8 > length) return MM_E_UNSUPPORTED;
-        if (BytesEqual(buffer + pos, "fmt ", 4)) break;
-        uint32_t size = ReadLE32(buffer + pos + 4);
-        skipped += size;
-        pos += 8 + static_cast<uint64_t>(size);
-    }
-    if (pos + 24 > length) return MM_E_UNSUPPORTED;
-    const uint8_t* f = buffer + pos;
-    format->nChunkId = ReadBE32(f);
-    format->nChunkSize = ReadLE32(f + 4);
-    format->wFormatTag = ReadLE16(f + 8);
-    format->nChannels = ReadLE16(f + 10);
-    format->nSamplesPerSec = ReadLE32(f + 12);
-    format->nAvgBytesPerSec = ReadLE32(f + 16);
-    format->nBlockAlign = ReadLE16(f + 20);
-    format->wBitsPerSample = ReadLE16(f + 22);
     if (!KnownFormatTag(format->wFormatTag)) return MM_E_UNSUPPORTED;
-    pos += 8 + static_cast<uint64_t>(format->nChunkSize);
-    for (;;) {
-        if (pos + 4 > length) return MM_E_UNSUPPORTED;
-        if (BytesEqual(buffer + pos, "data", 4)) break;
-        if (pos + 8 > length) return MM_E_UNSUPPORTED;
-        pos += 8 + static_cast<uint64_t>(ReadLE32(buffer + pos + 4));
+    if (!r.Seek(fmtStart + 8) || !r.Skip(format->nChunkSize)) return MM_E_UNSUPPORTED;
+    while (!r.Tag("data", 4)) {
+        if (!r.Skip(4) || !r.LE32(&size) || !r.Skip(size)) return MM_E_UNSUPPORTED;
     }
     // Both quirks are what extraction has always been computed from: the
     // offset names the "data" id, and chunks before "fmt " count twice.
-    format->nDataOffset = static_cast<uint32_t>(pos + skipped);
+    format->nDataOffset = static_cast<uint32_t>(r.position() + skipped);
     return MM_OK;
 }
 
