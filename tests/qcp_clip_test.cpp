@@ -156,6 +156,10 @@ TEST(QcpClip, ThirteenByteRiffReportsTheFileSizeOnly) {
     EXPECT_EQ(clip.nBitrate, 0u);
     EXPECT_EQ(clip.bHasAudio, 1u);
     EXPECT_STREQ(clip.szFormat, "qcp");
+    std::string bare = dir.Write("bare.qcp", Bytes().str("RIFF").u8(1).data());
+    clip = _MMClipInfo{};
+    ASSERT_EQ(metainfo::QCP_GetClipInfo(bare.c_str(), &clip), MM_OK);
+    EXPECT_EQ(clip.nFileSize, 5u);
 }
 
 TEST(QcpClip, BrokenFilesFailAndAreClosed) {
@@ -172,11 +176,11 @@ TEST(QcpClip, BrokenFilesFailAndAreClosed) {
     EXPECT_EQ(metainfo::QCP_GetClipInfo(shortFmt.c_str(), &clip), MM_E_FAIL);
     _MM_CODECTYPE codec{};
     EXPECT_EQ(metainfo::QCP_GetCodecType(shortFmt.c_str(), &codec), MM_E_FAIL);
-    std::string good = Qcp({QcpFmtChunk(kQcelpGuid1, 13000)}).empty() ? "" : dir.Write("noext", Qcp({QcpFmtChunk(kQcelpGuid1, 13000)}));
-    EXPECT_EQ(metainfo::QCP_GetClipInfo(good.c_str(), &clip), MM_E_FAIL);  // no extension
+    std::string noExtension = dir.Write("noext", Qcp({QcpFmtChunk(kQcelpGuid1, 13000)}));
+    EXPECT_EQ(metainfo::QCP_GetClipInfo(noExtension.c_str(), &clip), MM_E_FAIL);
     EXPECT_EQ(metainfo::QCP_GetClipInfo(dir.PathOf("missing.qcp").c_str(), &clip), -1);
     EXPECT_EQ(metainfo::QCP_GetClipInfo(nullptr, &clip), MM_E_INVALIDARG);
-    EXPECT_EQ(metainfo::QCP_GetCodecType(good.c_str(), nullptr), MM_E_INVALIDARG);
+    EXPECT_EQ(metainfo::QCP_GetCodecType(noExtension.c_str(), nullptr), MM_E_INVALIDARG);
     EXPECT_EQ(OpenDescriptors(), before);
 }
 

@@ -133,8 +133,9 @@ int32_t QCP_GetMediaInfo(const char* path, int request, void* out) {
         uint32_t size = GetUINT32(h, true);
         if (size > fileSize) return MM_E_FAIL;
         long after = MEx_ftell(h);
-        if (after < 8) return MM_E_FAIL;
-        uint64_t chunkStart = static_cast<uint64_t>(after) - 8;
+        if (after < 0) return MM_E_FAIL;
+        // Only a header read in full can name a chunk that is dispatched.
+        uint64_t chunkStart = after >= 8 ? static_cast<uint64_t>(after) - 8 : 0;
         int32_t result = MM_OK;
         if (id == FourCC("fmt ")) {
             result = parseFmt(h, request, out, chunkStart, fileSize);
