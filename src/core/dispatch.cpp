@@ -9,7 +9,11 @@
 #include "mp3/mp3_extract.h"
 #include "mp3/mp3_info.h"
 #include "realmedia/rm_parser.h"
+#include "speech/amr.h"
+#include "speech/evrc.h"
 #include "speech/midi.h"
+#include "speech/qcp.h"
+#include "speech/wave.h"
 
 namespace metainfo {
 const MakerInfoFn kMakerInfoReader = nullptr;
@@ -27,13 +31,13 @@ const MM_TrackTypeFn MM_GetTrackType[MM_MEDIA_SLOTS] = {
     /* 4 ASF */ ASF_GetTrackType,
     /* 5 MIDI */ MIDI_GetTrackType,
     /* 6 AAC */ AAC_GetTrackType,
-    /* 7 WAVE */ nullptr,
-    /* 8 AMR-NB */ nullptr,
-    /* 9 AMR-WB */ nullptr,
+    /* 7 WAVE */ WAVE_GetTrackType,
+    /* 8 AMR-NB */ AMR_GetTrackType,
+    /* 9 AMR-WB */ AMR_GetTrackType,
     /* 10 */ nullptr,
     /* 11 AVI */ AVI_GetTrackType,
-    /* 12 QCP */ nullptr,
-    /* 13 EVRC */ nullptr,
+    /* 12 QCP */ QCP_GetTrackType,
+    /* 13 EVRC */ EVRC_GetTrackType,
     /* 14 */ nullptr,
     /* 15 */ nullptr,
 };
@@ -65,13 +69,13 @@ const MM_ClipInfoFn MM_GetClipInfo[MM_MEDIA_SLOTS] = {
     /* 4 ASF */ ASF_GetClipInfo,
     /* 5 MIDI */ MIDI_GetClipInfo,
     /* 6 AAC */ AAC_GetClipInfo,
-    /* 7 WAVE */ nullptr,
-    /* 8 AMR-NB */ nullptr,
-    /* 9 AMR-WB */ nullptr,
+    /* 7 WAVE */ WAVE_GetClipInfo,
+    /* 8 AMR-NB */ AMR_GetClipInfo,
+    /* 9 AMR-WB */ AMR_GetClipInfo,
     /* 10 */ nullptr,
     /* 11 AVI */ AVI_GetClipInfo,
-    /* 12 QCP */ nullptr,
-    /* 13 EVRC */ nullptr,
+    /* 12 QCP */ QCP_GetClipInfo,
+    /* 13 EVRC */ EVRC_GetClipInfo,
     /* 14 */ nullptr,
     /* 15 */ nullptr,
 };
@@ -84,9 +88,9 @@ const MM_MIMETypeFn MM_GetMIMEType[MM_MEDIA_SLOTS] = {
     /* 4 ASF */ nullptr,
     /* 5 MIDI */ nullptr,
     /* 6 AAC */ nullptr,
-    /* 7 WAVE */ nullptr,
-    /* 8 AMR-NB */ nullptr,
-    /* 9 AMR-WB */ nullptr,
+    /* 7 WAVE */ WAVE_GetMIMEType,
+    /* 8 AMR-NB */ AMR_GetMIMEType,
+    /* 9 AMR-WB */ AMR_GetMIMEType,
     /* 10 */ nullptr,
     /* 11 AVI */ nullptr,
     /* 12 QCP */ nullptr,
@@ -103,9 +107,9 @@ const MM_AudioDataFn MM_GetAudioData[MM_MEDIA_SLOTS] = {
     /* 4 ASF */ nullptr,
     /* 5 MIDI */ nullptr,
     /* 6 AAC */ nullptr,
-    /* 7 WAVE */ nullptr,
-    /* 8 AMR-NB */ nullptr,
-    /* 9 AMR-WB */ nullptr,
+    /* 7 WAVE */ WAVE_GetAudioData2Buf,
+    /* 8 AMR-NB */ AMR_GetAudioData2Buf,
+    /* 9 AMR-WB */ AMR_GetAudioData2Buf,
     /* 10 */ nullptr,
     /* 11 AVI */ nullptr,
     /* 12 QCP */ nullptr,
@@ -124,13 +128,13 @@ const MM_CodecTypeFn MM_GetCodecType[MM_MEDIA_SLOTS] = {
     /* 4 ASF */ ASF_GetCodecType,
     /* 5 MIDI */ nullptr,
     /* 6 AAC */ AAC_GetCodecType,
-    /* 7 WAVE */ nullptr,
-    /* 8 AMR-NB */ nullptr,
-    /* 9 AMR-WB */ nullptr,
+    /* 7 WAVE */ WAVE_GetCodecType,
+    /* 8 AMR-NB */ AMR_GetCodecType,
+    /* 9 AMR-WB */ AMR_GetCodecType,
     /* 10 */ nullptr,
     /* 11 AVI */ nullptr,
-    /* 12 QCP */ nullptr,
-    /* 13 EVRC */ nullptr,
+    /* 12 QCP */ QCP_GetCodecType,
+    /* 13 EVRC */ EVRC_GetCodecType,
     /* 14 */ nullptr,
     /* 15 */ nullptr,
 };

@@ -1,0 +1,290 @@
+#include "speech/amr.h"
+
+#include <climits>
+#include <cstring>
+#include <memory>
+#include <new>
+
+#include "core/file_access.h"
+#include "metainfo/extract.h"
+
+namespace metainfo {
+namespace {
+
+constexpr size_t kAmrProbeBytes = 32768;
+constexpr size_t kAmrCopyChunk = 32768;
+constexpr int kAmrMaxBlocks = 4096;
+
+struct AmrKind {
+    const char* magic;
+    uint32_t headerLen;
+    uint32_t firstFrame;  // position of the first frame header byte
+};
+
+// Multi-channel kinds keep a 4-byte channel description between the magic and
+// the first frame; its last byte holds the channel count.
+const AmrKind kAmrKinds[] = {
+    {"#!AMR\n", 6, 6},
+    {"#!AMR-WB\n", 9, 9},
+    {"#!AMR_MC1.0\n", 12, 16},
+    {"#!AMR-WB_MC1.0\n", 15, 19},
+};
+
+const uint32_t kNbBitrate[16] = {4750, 5150, 5900, 6700, 7400, 7950, 10200, 12200, 1750, 0, 0, 0, 0, 0, 0, 40};
+const uint32_t kNbFrameSize[16] = {13, 14, 16, 18, 20, 21, 27, 32, 6, 0, 0, 0, 0, 0, 0, 1};
+const uint32_t kWbBitrate[16] = {6600, 8850, 12650, 14250, 15850, 18250, 19850, 23050,
+                                 23850, 1750, 0, 0, 0, 0, 0, 40};
+const uint32_t kWbFrameSize[16] = {18, 24, 33, 37, 41, 47, 51, 59, 61, 6, 0, 0, 0, 0, 0, 1};
+
+// Frame-type sub-codes 0x1010..0x1023; a wide-band frame type ft answers entry ft + 9.
+const uint32_t kAmrSubCodes[20] = {0x1010, 0x1011, 0x1012, 0x1013, 0x1014, 0x1015, 0x1016,
+                                   0x1017, 0x1018, 0x1019, 0x101A, 0x101B, 0x101C, 0x101D,
+                                   0x101E, 0x101F, 0x1020, 0x1021, 0x1022, 0x1023};
+
+bool IsWideBand(int kind) { return kind == kAmrWideBand || kind == kAmrWideBandMulti; }
+bool IsMultiChannel(int kind) { return kind == kAmrNarrowBandMulti || kind == kAmrWideBandMulti; }
+int FrameTypeOf(uint8_t header) { return (header >> 3) & 0x0F; }
+uint32_t FrameSizeOf(int kind, int frameType) {
+    return IsWideBand(kind) ? kWbFrameSize[frameType] : kNbFrameSize[frameType];
+}
+
+bool SeekTo(int h, uint64_t pos) {
+    return pos <= static_cast<uint64_t>(LONG_MAX) && MEx_fseek(h, static_cast<long>(pos), 0) == 0;
+}
+
+// The magic and the first frame header of what was read from the file.
+int32_t ParseAmrHead(const uint8_t* buf, size_t length, _AMR_FrameInfo* info) {
+    std::memset(info, 0, sizeof *info);
+    int kind = -1;
+    for (int k = 0; k < 4; ++k) {
+        size_t n = std::strlen(kAmrKinds[k].magic);
+        if (length >= n && std::memcmp(buf, kAmrKinds[k].magic, n) == 0) {
+            kind = k;
+            break;
+        }
+    }
+    if (kind < 0) return MM_E_UNSUPPORTED;
+    const AmrKind& k = kAmrKinds[kind];
+    if (k.firstFrame >= length) return MM_E_FAIL;
+    uint8_t header = buf[k.firstFrame];
+    // Padding bits 0, quality bit 1.
+    if ((header & 0x87) != 0x04) return MM_E_FAIL;
+    int frameType = FrameTypeOf(header);
+    bool reserved = IsWideBand(kind) ? (frameType >= 10 && frameType <= 14) : (frameType >= 9 && frameType <= 14);
+    if (reserved) return MM_E_FAIL;
+    info->nFileType = kind;
+    info->nFrameType = frameType;
+    info->nHeaderLen = k.headerLen;
+    info->nFrameSize = FrameSizeOf(kind, frameType);
+    info->nChannels = IsMultiChannel(kind) ? (buf[k.firstFrame - 1] & 0x0F) : 1;
+    info->nQuality = 1;
+    info->nBitrate = IsWideBand(kind) ? kWbBitrate[frameType] : kNbBitrate[frameType];
+    return MM_OK;
+}
+
+int32_t SetMimeType(_MM_MIMETYPE* mime, int kind) {
+    delete[] mime->pszMimeType;
+    mime->pszMimeType = nullptr;
+    mime->nMimeLength = 0;
+    const char* text = IsWideBand(kind) ? "audio/AMR-WB" : "audio/AMR";
+    size_t length = std::strlen(text);
+    char* s = new (std::nothrow) char[length + 1];
+    if (s == nullptr) return MM_E_OUTOFMEMORY;
+    std::memcpy(s, text, length + 1);
+    mime->pszMimeType = s;
+    mime->nMimeLength = static_cast<uint32_t>(length);
+    return MM_OK;
+}
+
+}  // namespace
+
+int Get_avBlockSize(const uint8_t* data, int kind, size_t length, uint32_t channels) {
+    if (data == nullptr || kind < 0 || kind > 3) return 0;
+    uint64_t offset = 0;
+    uint64_t sum = 0;
+    uint64_t largest = 0;
+    uint64_t smallest = UINT64_MAX;
+    int count = 0;
+    while (count < kAmrMaxBlocks && offset < length) {
+        uint64_t block = 0;
+        if (!IsMultiChannel(kind)) {
+            block = FrameSizeOf(kind, FrameTypeOf(data[offset]));
+        } else {
+            // Each channel's frame header stands 4 bytes after the frame's start.
+            uint64_t at = offset;
+            bool complete = true;
+            for (uint32_t ch = 0; ch < channels; ++ch) {
+                if (at + 4 >= length) {
+                    complete = false;
+                    break;
+                }
+                uint32_t frame = FrameSizeOf(kind, FrameTypeOf(data[at + 4]));
+                block += frame;
+                at += frame;
+            }
+            if (!complete) break;
+        }
+        ++count;
+        sum += block;
+        if (block > largest) largest = block;
+        if (block < smallest) smallest = block;
+        offset += block;
+    }
+    if (count == 0) return 0;
+    // One outlier at either end does not skew the average.
+    if (count > 2) return static_cast<int>((sum - largest - smallest) / static_cast<uint64_t>(count - 2));
+    return static_cast<int>(sum / static_cast<uint64_t>(count));
+}
+
+int32_t GetMediaInfo_AMR(const char* path, void* out, int request) {
+    if (path == nullptr || out == nullptr) return MM_E_INVALIDARG;
+    std::unique_ptr<uint8_t[]> buffer(new (std::nothrow) uint8_t[kAmrProbeBytes]);
+    if (!buffer) return MM_E_FAIL;
+    int h = MEx_fopen(path, "rb");
+    if (h == 0) return MM_E_FAIL;
+    FileCloser closer(h);
+    int got = MEx_fread(buffer.get(), 1, kAmrProbeBytes, h);
+    if (got < 16) return MM_E_FAIL;
+    _AMR_FrameInfo frame;
+    int32_t result = ParseAmrHead(buffer.get(), static_cast<size_t>(got), &frame);
+    if (result != MM_OK) return result;
+    if (MEx_fseek(h, 0, 2) != 0) return MM_E_FAIL;
+    long end = MEx_ftell(h);
+    uint64_t fileSize = end > 0 ? static_cast<uint64_t>(end) : 0;
+    uint64_t payload = fileSize > frame.nHeaderLen ? fileSize - frame.nHeaderLen : 0;
+
+    switch (request) {
+        case INFO_MIMETYPE:
+            return SetMimeType(static_cast<_MM_MIMETYPE*>(out), frame.nFileType);
+        case INFO_CODECTYPE: {
+            // A narrow-band file has no codec answer.
+            if (!IsWideBand(frame.nFileType)) return MM_E_UNSUPPORTED;
+            _MM_CODECTYPE* codec = static_cast<_MM_CODECTYPE*>(out);
+            codec->nAudioCodec = 0x1020;  // CODEC_AMR_WB
+            int entry = frame.nFrameType + 9;
+            // A first frame without data (15) has no sub-code.
+            codec->nAudioSubType = entry < 20 ? kAmrSubCodes[entry] : 0;
+            return MM_OK;
+        }
+        case INFO_CLIPINFO: {
+            _MMClipInfo* clip = static_cast<_MMClipInfo*>(out);
+            std::memset(clip, 0, sizeof *clip);
+            clip->nFileSize = static_cast<uint32_t>(fileSize);
+            bool wide = IsWideBand(frame.nFileType);
+            std::strcpy(clip->szFormat, wide ? "awb" : "amr");
+            clip->nSampleRate = wide ? 16000 : 8000;
+            clip->nSamplesPerFrame = wide ? 320 : 160;
+            int block = Get_avBlockSize(buffer.get() + frame.nHeaderLen, frame.nFileType,
+                                        static_cast<size_t>(got) - frame.nHeaderLen, frame.nChannels);
+            if (block < 1) return MM_E_FAIL;
+            // 50 blocks of 20 ms make a second.
+            clip->nDuration = static_cast<uint32_t>(payload / static_cast<uint64_t>(block) / 50);
+            clip->nAudioBitrate = frame.nBitrate;
+            clip->nBitrate = frame.nBitrate;
+            clip->nBitsPerSample = 16;
+            clip->nChannels = frame.nChannels;
+            clip->bHasAudio = 1;
+            clip->bHasVideo = 0;
+            return MM_OK;
+        }
+        case INFO_AMR_AUDIO: {
+            int block = Get_avBlockSize(buffer.get() + frame.nHeaderLen, frame.nFileType,
+                                        static_cast<size_t>(got) - frame.nHeaderLen, frame.nChannels);
+            if (block < 1) return MM_E_FAIL;
+            _AMR_AudioInfo* info = static_cast<_AMR_AudioInfo*>(out);
+            info->nDuration = static_cast<uint32_t>(payload / static_cast<uint64_t>(block) / 50);
+            info->nFileType = frame.nFileType;
+            info->nFrameType = frame.nFrameType;
+            info->nHeaderLen = frame.nHeaderLen;
+            info->nFrameSize = frame.nFrameSize;
+            info->nChannels = frame.nChannels;
+            info->nBlockSize = static_cast<uint32_t>(block);
+            return MM_OK;
+        }
+        default:
+            return MM_E_FAIL;
+    }
+}
+
+int32_t GetAudioData_AMR(const char* path, int startSec, int endSec, unsigned char** data, int* size, int mode) {
+    if (startSec < 0 || path == nullptr || data == nullptr || size == nullptr || startSec >= endSec) {
+        return MM_E_INVALIDARG;
+    }
+    _AMR_AudioInfo info = {};
+    int32_t result = GetMediaInfo_AMR(path, &info, INFO_AMR_AUDIO);
+    if (result != MM_OK) return result;
+    if (static_cast<uint32_t>(startSec) > info.nDuration) return MM_E_INVALIDARG;
+    // Cuts fall on multiples of the average block, not on frame boundaries.
+    uint64_t bytesPerSecond = static_cast<uint64_t>(info.nBlockSize) * 50;
+    uint64_t last = static_cast<uint32_t>(endSec) < info.nDuration ? static_cast<uint32_t>(endSec) : info.nDuration;
+    uint64_t begin = static_cast<uint64_t>(startSec) * bytesPerSecond + info.nHeaderLen;
+    uint64_t end = last * bytesPerSecond + info.nHeaderLen;
+    uint64_t length = end - begin;
+    if (length > static_cast<uint64_t>(INT_MAX)) return MM_E_FAIL;
+    *size = static_cast<int>(length);
+
+    int source = MEx_fopen(path, "rb");
+    if (source == 0) return MM_E_FAIL;
+    FileCloser sourceCloser(source);
+
+    if (mode == kAmrToBuffer) {
+        if (!SeekTo(source, begin)) return MM_E_FAIL;
+        unsigned char* buffer = new (std::nothrow) unsigned char[length];
+        if (buffer == nullptr) return MM_E_FAIL;
+        *data = buffer;
+        // A short read leaves the buffer with the caller and fails.
+        if (MEx_fread(buffer, 1, static_cast<unsigned>(length), source) != static_cast<int>(length)) return MM_E_FAIL;
+        return MM_OK;
+    }
+    if (mode != kAmrToFile) return MM_E_FAIL;
+
+    const char* outPath = reinterpret_cast<const char*>(*data);
+    if (outPath == nullptr) return MM_E_INVALIDARG;
+    if (info.nFileType < 0 || info.nFileType > 3) return MM_E_UNSUPPORTED;
+    const char* magic = kAmrKinds[info.nFileType].magic;
+    int out = MEx_fopen(outPath, "wb");
+    if (out == 0) return MM_E_FAIL;
+    FileCloser outCloser(out);
+    size_t magicLength = std::strlen(magic);
+    if (MEx_fwrite(magic, 1, static_cast<unsigned>(magicLength), out) != static_cast<int>(magicLength)) {
+        return MM_E_FAIL;
+    }
+    std::unique_ptr<uint8_t[]> chunk(new (std::nothrow) uint8_t[kAmrCopyChunk]);
+    if (!chunk) return MM_E_FAIL;
+    if (!SeekTo(source, begin)) return MM_E_FAIL;
+    uint64_t left = length;
+    while (left > 0) {
+        size_t want = left < kAmrCopyChunk ? static_cast<size_t>(left) : kAmrCopyChunk;
+        int got = MEx_fread(chunk.get(), 1, static_cast<unsigned>(want), source);
+        if (got <= 0) break;
+        if (MEx_fwrite(chunk.get(), 1, static_cast<unsigned>(got), out) != got) return MM_E_FAIL;
+        left -= static_cast<uint64_t>(got);
+    }
+    return MM_OK;
+}
+
+int32_t AMR_GetClipInfo(const char* path, _MMClipInfo* clip) { return GetMediaInfo_AMR(path, clip, INFO_CLIPINFO); }
+
+int32_t AMR_GetMIMEType(const char* path, _MM_MIMETYPE* mime) { return GetMediaInfo_AMR(path, mime, INFO_MIMETYPE); }
+
+int32_t AMR_GetCodecType(const char* path, _MM_CODECTYPE* codec) {
+    return GetMediaInfo_AMR(path, codec, INFO_CODECTYPE);
+}
+
+int32_t AMR_GetTrackType(const char* /*path*/, int* mask) {
+    if (mask == nullptr) return MM_E_INVALIDARG;
+    *mask = TRACK_AUDIO;
+    return MM_OK;
+}
+
+int32_t AMR_GetAudioData2Buf(const char* path, int startSec, int endSec, unsigned char** data, int* size) {
+    return GetAudioData_AMR(path, startSec, endSec, data, size, kAmrToBuffer);
+}
+
+}  // namespace metainfo
+
+extern "C" int32_t AMR_GetAudioData2File(const char* path, int startSec, int endSec, const char* outPath) {
+    unsigned char* target = reinterpret_cast<unsigned char*>(const_cast<char*>(outPath));
+    int size = 0;
+    return metainfo::GetAudioData_AMR(path, startSec, endSec, &target, &size, metainfo::kAmrToFile);
+}
