@@ -11,6 +11,8 @@ if command -v dpkg >/dev/null 2>&1; then
   for pkg in cmake g++ make libgtest-dev ffmpeg; do
     have_pkg "$pkg" || need+=("$pkg")
   done
+  # The Java binding is built and tested in a real JVM when a JDK is there.
+  command -v javac >/dev/null 2>&1 || need+=(default-jdk-headless)
 fi
 if [ "${#need[@]}" -gt 0 ]; then
   if [ "$(id -u)" -eq 0 ] && command -v apt-get >/dev/null 2>&1; then
