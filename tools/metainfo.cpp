@@ -2,6 +2,7 @@
 //
 //   metainfo probe [--json] FILE...
 //   metainfo cut FILE START END OUT
+//   metainfo maker FILE [--thumbnail OUT]
 #include <cstdio>
 #include <cstring>
 #include <string>
@@ -9,6 +10,7 @@
 
 #include "metainfo/metainfo.h"
 #include "cut_command.h"
+#include "maker_command.h"
 #include "probe_format.h"
 
 namespace {
@@ -223,7 +225,8 @@ void PrintJson(const Report& r) {
 
 int Usage() {
     std::fprintf(stderr, "usage: metainfo probe [--json] FILE...\n"
-                         "       metainfo cut FILE START END OUT\n");
+                         "       metainfo cut FILE START END OUT\n"
+                         "       metainfo maker FILE [--thumbnail OUT]\n");
     return 2;
 }
 
@@ -258,5 +261,6 @@ int main(int argc, char** argv) {
     if (argc < 2) return Usage();
     if (std::strcmp(argv[1], "probe") == 0) return ProbeCommand(argc - 2, argv + 2);
     if (std::strcmp(argv[1], "cut") == 0) return probe::CutCommand(argc - 2, argv + 2);
+    if (std::strcmp(argv[1], "maker") == 0) return probe::MakerCommand(argc - 2, argv + 2);
     return Usage();
 }
