@@ -29,10 +29,20 @@ const ByteVec kImage = {0xFF, 0xD8, 0xFF, 0xE0, 1, 2, 3, 4, 5, 0xFF, 0xD9};
 
 std::string Str(const unsigned char* p, uint32_t n) { return p ? std::string(reinterpret_cast<const char*>(p), n) : ""; }
 
+// AnaMaker over the box at the start of path, as if the file were fileSize long.
+int32_t MakerAt(const std::string& path, uint32_t fileSize, _MAKERINFO* maker) {
+    int h = MEx_fopen(path.c_str(), "rb");
+    if (h == 0) return 1;
+    s_mp4FileSize = fileSize;
+    int32_t result = AnaMaker(h, maker);
+    MEx_fclose(h);
+    return result;
+}
+
 class Mp4Maker : public ::testing::Test {
 protected:
     TempDir dir;
-    _MAKERINFO maker;
+    _MAKERINFO maker{};
 
     std::string File(const ByteVec& mkr, bool topLevel = false) {
         ByteVec moov = Box("moov", Join({Mvhd(0, 1000, 1000), topLevel ? ByteVec{} : Box("udta", mkr)}));
@@ -89,15 +99,9 @@ TEST_F(Mp4Maker, UnknownChildSpoilsTheWholeBox) {
     // The box reader itself reports -9.
     ByteVec file = Join({Mkr(Join({Modl("PX"), Box("zzzz", ByteVec(4, 0))})), ByteVec(64, 0)});
     std::string raw = dir.Write("raw.bin", file);
-    int h = MEx_fopen(raw.c_str(), "rb");
-    ASSERT_NE(h, 0);
-    s_mp4FileSize = static_cast<uint32_t>(file.size());
-    EXPECT_EQ(AnaMaker(h, &maker), -9);
+    EXPECT_EQ(MakerAt(raw, static_cast<uint32_t>(file.size()), &maker), -9);
     EXPECT_EQ(maker.nValid, 0u);
-    MEx_fseek(h, 0, SEEK_SET);
-    s_mp4FileSize = static_cast<uint32_t>(file.size() - 64);
-    EXPECT_EQ(AnaMaker(h, &maker), -6) << "a box as long as the file";
-    MEx_fclose(h);
+    EXPECT_EQ(MakerAt(raw, static_cast<uint32_t>(file.size() - 64), &maker), -6) << "a box as long as the file";
 }
 
 TEST_F(Mp4Maker, ThumbnailLargerThanItsBoxIsRejected) {

@@ -24,7 +24,7 @@ std::string ItemText(const _MMMetaItem& item) { return std::string(reinterpret_c
 class Mp4Udta : public ::testing::Test {
 protected:
     TempDir dir;
-    _MMMetaInfo meta;
+    _MMMetaInfo meta{};
 
     int32_t Read(const ByteVec& moovChildren, const ByteVec& topLevel = {}) {
         ByteVec file = Join({Ftyp(), Box("moov", Join({Mvhd(0, 1000, 1000), moovChildren})), topLevel,
