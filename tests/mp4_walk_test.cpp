@@ -9,6 +9,7 @@
 #include "metainfo/metainfo.h"
 #include "metainfo/mp4.h"
 #include "mp4/mp4_file.h"
+#include "core/thread_state.h"
 #include "mp4/mp4_internal.h"
 #include "support/mp4_builder.h"
 
@@ -293,4 +294,43 @@ TEST_F(Mp4Walk, PublicInterfaceAnswersForMp4) {
     EXPECT_EQ(MM_MediaExtractor_GetMakerInfo(path.c_str(), &maker), MM_OK);
     EXPECT_EQ(maker.nValid, 0u);
     EXPECT_EQ(maker.pThumbnail, nullptr);
+}
+
+TEST(Mp4BoxHeader, HeaderLengthsFollowSizeAndType) {
+    _MP4BOX box;
+    ByteVec plain = Box("moov", ByteVec(4, 0));
+    EXPECT_EQ(AnaBox(plain.data(), plain.size(), &box), 8);
+    EXPECT_EQ(box.size, 12u);
+    ByteVec large = Box64("mdat", ByteVec(4, 0));
+    EXPECT_EQ(AnaBox(large.data(), large.size(), &box), 16);
+    EXPECT_EQ(box.size, 20u) << "the lower word of the 64-bit size";
+    ByteVec uuid = Box("uuid", ByteVec(20, 0x11));
+    EXPECT_EQ(AnaBox(uuid.data(), uuid.size(), &box), 12) << "the 16-byte user type counts as 4";
+    EXPECT_EQ(box.userType[15], 0x11);
+    ByteVec empty = Bytes().be32(0).str("free").data();
+    EXPECT_EQ(AnaBox(empty.data(), empty.size(), &box), 1);
+    EXPECT_EQ(box.type, 0u) << "nothing read after a size of 0";
+    EXPECT_EQ(AnaBox(plain.data(), 7, &box), 0) << "too short to hold a header";
+    _MP4FULLBOX full;
+    ByteVec fb = FullBox("mvhd", 1, 0x000203, ByteVec(4, 0));
+    EXPECT_EQ(AnaFullBox(fb.data(), fb.size(), &full), 12);
+    EXPECT_EQ(full.version, 1u);
+    EXPECT_EQ(full.flags, 0x203u);
+}
+
+TEST(Mp4BoxHeader, FileTypeBrandsAreBoundedByTheBox) {
+    s_mp4FileSize = 1000;
+    _FILETYPEBOX ftyp;
+    std::memset(&ftyp, 0, sizeof ftyp);
+    ByteVec box = Box("ftyp", Bytes().str("M4A ").be32(0).str("M4A ").str("mp42").str("is"));
+    EXPECT_EQ(AnaFileType(box.data(), box.size(), &ftyp), MM_OK);
+    EXPECT_EQ(ftyp.majorBrand, FourCC("M4A "));
+    EXPECT_EQ(ftyp.brandCount, 2u) << "a partial brand is not read";
+    ByteVec bare = Box("ftyp", Bytes().str("isom").be32(0));
+    EXPECT_EQ(AnaFileType(bare.data(), bare.size(), &ftyp), MM_E_FAIL) << "no room for brands";
+    // A size far beyond the bytes given.
+    ByteVec lying = Bytes().be32(900).str("ftyp").str("isom").be32(0).str("mp41").data();
+    EXPECT_EQ(AnaFileType(lying.data(), lying.size(), &ftyp), MM_OK);
+    EXPECT_EQ(ftyp.brandCount, 1u);
+    delete[] ftyp.compatibleBrands;
 }
