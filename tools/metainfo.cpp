@@ -3,6 +3,7 @@
 //   metainfo probe [--json] FILE...
 //   metainfo cut FILE START END OUT
 //   metainfo frames FILE [--stream N] [--seek MS]
+//   metainfo maker FILE [--thumbnail OUT]
 #include <cstdio>
 #include <cstring>
 #include <string>
@@ -11,6 +12,7 @@
 #include "metainfo/metainfo.h"
 #include "cut_command.h"
 #include "frames_command.h"
+#include "maker_command.h"
 #include "probe_format.h"
 
 namespace {
@@ -226,7 +228,8 @@ void PrintJson(const Report& r) {
 int Usage() {
     std::fprintf(stderr, "usage: metainfo probe [--json] FILE...\n"
                          "       metainfo cut FILE START END OUT\n"
-                         "       metainfo frames FILE [--stream N] [--seek MS]\n");
+                         "       metainfo frames FILE [--stream N] [--seek MS]\n"
+                         "       metainfo maker FILE [--thumbnail OUT]\n");
     return 2;
 }
 
@@ -262,5 +265,6 @@ int main(int argc, char** argv) {
     if (std::strcmp(argv[1], "probe") == 0) return ProbeCommand(argc - 2, argv + 2);
     if (std::strcmp(argv[1], "cut") == 0) return probe::CutCommand(argc - 2, argv + 2);
     if (std::strcmp(argv[1], "frames") == 0) return probe::FramesCommand(argc - 2, argv + 2);
+    if (std::strcmp(argv[1], "maker") == 0) return probe::MakerCommand(argc - 2, argv + 2);
     return Usage();
 }

@@ -5,9 +5,11 @@
 #include "aac/aac_clip.h"
 #include "asf/asf_header.h"
 #include "avi/avi_queries.h"
+#include "metainfo/mp4.h"
 #include "mp3/id3.h"
 #include "mp3/mp3_extract.h"
 #include "mp3/mp3_info.h"
+#include "mp4/mp4_file.h"
 #include "realmedia/rm_parser.h"
 #include "speech/amr.h"
 #include "speech/evrc.h"
@@ -16,7 +18,7 @@
 #include "speech/wave.h"
 
 namespace metainfo {
-const MakerInfoFn kMakerInfoReader = nullptr;
+const MakerInfoFn kMakerInfoReader = MP4_GetMakerInfo;
 }  // namespace metainfo
 
 using namespace metainfo;
@@ -27,7 +29,7 @@ const MM_TrackTypeFn MM_GetTrackType[MM_MEDIA_SLOTS] = {
     /* 0 */ nullptr,
     /* 1 MP3 */ MP3_GetTrackType,
     /* 2 RealMedia */ RM_GetTrackType,
-    /* 3 MP4 */ nullptr,
+    /* 3 MP4 */ MP4_GetTrackType,
     /* 4 ASF */ ASF_GetTrackType,
     /* 5 MIDI */ MIDI_GetTrackType,
     /* 6 AAC */ AAC_GetTrackType,
@@ -46,7 +48,7 @@ const MM_MetaInfoFn MM_GetMetaInfo[MM_MEDIA_SLOTS] = {
     /* 0 */ nullptr,
     /* 1 MP3 */ ID3_GetMetaInfo,
     /* 2 RealMedia */ RM_GetMetaInfo,
-    /* 3 MP4 */ nullptr,
+    /* 3 MP4 */ MP4_GetMetaInfo,
     /* 4 ASF */ ASF_GetMetaInfo,
     /* 5 MIDI */ MIDI_GetMetaInfo,
     /* 6 AAC */ ID3_GetMetaInfo,
@@ -65,7 +67,7 @@ const MM_ClipInfoFn MM_GetClipInfo[MM_MEDIA_SLOTS] = {
     /* 0 */ nullptr,
     /* 1 MP3 */ MP3_GetClipInfo,
     /* 2 RealMedia */ RM_GetClipInfo,
-    /* 3 MP4 */ nullptr,
+    /* 3 MP4 */ MP4_GetClipInfo,
     /* 4 ASF */ ASF_GetClipInfo,
     /* 5 MIDI */ MIDI_GetClipInfo,
     /* 6 AAC */ AAC_GetClipInfo,
@@ -124,7 +126,7 @@ const MM_CodecTypeFn MM_GetCodecType[MM_MEDIA_SLOTS] = {
     /* 0 */ nullptr,
     /* 1 MP3 */ MP3_GetCodecType,
     /* 2 RealMedia */ RM_GetCodecType,
-    /* 3 MP4 */ nullptr,
+    /* 3 MP4 */ MP4_GetCodecType,
     /* 4 ASF */ ASF_GetCodecType,
     /* 5 MIDI */ nullptr,
     /* 6 AAC */ AAC_GetCodecType,

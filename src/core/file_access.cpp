@@ -1,5 +1,7 @@
 #include "core/file_access.h"
 
+#include <unistd.h>
+
 #include <atomic>
 #include <cstdio>
 #include <cstring>
@@ -152,6 +154,30 @@ int MEx_fopen(const char* path, const char* mode) {
     if (h == 0) {
         if (handle->stream != nullptr) std::fclose(handle->stream);
         CloseProtected(handle);
+        delete handle;
+    }
+    return h;
+}
+
+int MEx_fdopen(int fd, const char* mode) {
+    if (fd < 0 || mode == nullptr) return 0;
+    int copy = ::dup(fd);
+    if (copy < 0) return 0;
+    FILE* stream = ::fdopen(copy, mode);
+    if (stream == nullptr) {
+        ::close(copy);
+        return 0;
+    }
+    MexHandle* handle = new (std::nothrow) MexHandle();
+    if (handle == nullptr) {
+        std::fclose(stream);
+        return 0;
+    }
+    handle->drmKind = 0;
+    handle->stream = stream;
+    int h = Register(handle);
+    if (h == 0) {
+        std::fclose(stream);
         delete handle;
     }
     return h;

@@ -22,6 +22,10 @@ long MEx_ftell(int h);
 int MEx_feof(int h);
 int MEx_fclose(int h);
 int MEx_stat(const char* path, struct stat* st);
+// A plain handle over a duplicate of the caller's descriptor: reads start at
+// the descriptor's current position, and closing the handle leaves the
+// caller's descriptor open.
+int MEx_fdopen(int fd, const char* mode);
 
 // Next four bytes as a 32-bit value; missing bytes of a short read count as 0.
 uint32_t GetUINT32(int h, bool bLittle);
