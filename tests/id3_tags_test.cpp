@@ -296,17 +296,17 @@ TEST(Id3Tags, V23ExtendedHeaderIsSkipped) {
 }
 
 TEST(Id3Tags, Version1FieldsAndTrack) {
-    Id3v1Spec spec;
-    spec.title = "Title  \t";
-    spec.artist = "Artist";
-    spec.album = "Album";
-    spec.year = "2001";
-    spec.comment = "Note";
-    spec.track = 200;
-    spec.genre = 17;
+    Id3v1Spec shape;
+    shape.title = "Title  \t";
+    shape.artist = "Artist";
+    shape.album = "Album";
+    shape.year = "2001";
+    shape.comment = "Note";
+    shape.track = 200;
+    shape.genre = 17;
     Meta m;
     Bytes file;
-    file.raw(Audio()).raw(Id3v1(spec));
+    file.raw(Audio()).raw(Id3v1(shape));
     Read(file.data(), &m);
     ASSERT_EQ(m.result, MM_OK);
     EXPECT_EQ(m.Text(META_TITLE), "Title");
@@ -318,21 +318,21 @@ TEST(Id3Tags, Version1FieldsAndTrack) {
     EXPECT_EQ(m.Text(META_GENRE), "Rock");
     EXPECT_EQ(m.meta.aItems[META_TITLE].nEncoding, 3u);
 
-    spec.track = 0;
-    spec.genre = 148;
+    shape.track = 0;
+    shape.genre = 148;
     Meta n;
     Bytes other;
-    other.raw(Audio()).raw(Id3v1(spec));
+    other.raw(Audio()).raw(Id3v1(shape));
     Read(other.data(), &n);
     EXPECT_EQ(n.meta.aItems[META_TRACKNUMBER].nLength, 0u);
     EXPECT_EQ(n.meta.aItems[META_GENRE].nLength, 0u);
 }
 
 TEST(Id3Tags, Version2WinsOverVersion1AndV1ReplacesAFailedV2) {
-    Id3v1Spec spec;
-    spec.title = "V1 title";
+    Id3v1Spec shape;
+    shape.title = "V1 title";
     Bytes both;
-    both.raw(Id3Tag(3, {Id3Frame(3, "TIT2", TextBody(0, "V2 title"))})).raw(Audio()).raw(Id3v1(spec));
+    both.raw(Id3Tag(3, {Id3Frame(3, "TIT2", TextBody(0, "V2 title"))})).raw(Audio()).raw(Id3v1(shape));
     Meta m;
     Read(both.data(), &m);
     EXPECT_EQ(m.Text(META_TITLE), "V2 title");
@@ -340,7 +340,7 @@ TEST(Id3Tags, Version2WinsOverVersion1AndV1ReplacesAFailedV2) {
     Bytes broken;  // the second frame overruns the tag
     broken.raw(Id3Tag(3, {Id3Frame(3, "TPE1", TextBody(0, "V2 artist")), Id3Frame(3, "TALB", TextBody(0, "long album name"))}, 0))
         .raw(Audio())
-        .raw(Id3v1(spec));
+        .raw(Id3v1(shape));
     Meta f;
     Read(broken.data(), &f);
     EXPECT_EQ(f.result, MM_OK);

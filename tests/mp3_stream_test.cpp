@@ -250,7 +250,7 @@ TEST(Mp3Stream, XingPositionFollowsVersionAndChannels) {
     Mp3FrameSpec lsfMono = lsf;
     lsfMono.channelMode = 3;
     const struct {
-        Mp3FrameSpec spec;
+        Mp3FrameSpec shape;
         uint32_t offset;
     } cases[] = {{mono, 21}, {lsf, 21}, {lsfMono, 13}};
     for (const auto& c : cases) {
@@ -258,7 +258,7 @@ TEST(Mp3Stream, XingPositionFollowsVersionAndChannels) {
         xing.flags = 1;
         xing.frames = 100;
         Bytes file;
-        file.raw(XingFrame(c.spec, xing)).raw(Mp3Frames(c.spec, 10));
+        file.raw(XingFrame(c.shape, xing)).raw(Mp3Frames(c.shape, 10));
         AudioInfo a;
         LoadAudioInfo(dir.Write("x.mp3", file.data()), &a);
         ASSERT_EQ(a.result, MM_OK);
@@ -306,12 +306,12 @@ TEST(Mp3Stream, SamplesPerFrameRuleOfMpeg25IsAsymmetric) {
         uint32_t channels, samples;
     } cases[] = {{0, 3, 1, 576}, {0, 0, 2, 288}, {2, 3, 1, 1152}, {2, 0, 2, 2304}, {3, 3, 1, 1152}};
     for (const auto& c : cases) {
-        Mp3FrameSpec spec;
-        spec.version = c.version;
-        spec.bitrateIndex = 8;
-        spec.channelMode = c.channelMode;
+        Mp3FrameSpec shape;
+        shape.version = c.version;
+        shape.bitrateIndex = 8;
+        shape.channelMode = c.channelMode;
         int32_t result = 0;
-        _MMClipInfo clip = ClipOf(dir.Write("s.mp3", Mp3Frames(spec, 12)), &result);
+        _MMClipInfo clip = ClipOf(dir.Write("s.mp3", Mp3Frames(shape, 12)), &result);
         ASSERT_EQ(result, MM_OK);
         EXPECT_EQ(clip.nChannels, c.channels);
         EXPECT_EQ(clip.nSamplesPerFrame, c.samples) << "version " << c.version;
@@ -321,11 +321,11 @@ TEST(Mp3Stream, SamplesPerFrameRuleOfMpeg25IsAsymmetric) {
 TEST(Mp3Stream, CodecAndMimeAnswers) {
     TempDir dir;
     for (int layer = 1; layer <= 3; ++layer) {
-        Mp3FrameSpec spec;
-        spec.layer = layer;
-        spec.crc = true;  // MPEG-1 Layer I without CRC starts FF FF, never a sync candidate
+        Mp3FrameSpec shape;
+        shape.layer = layer;
+        shape.crc = true;  // MPEG-1 Layer I without CRC starts FF FF, never a sync candidate
         _MM_CODECTYPE codec{};
-        ASSERT_EQ(MP3_GetCodecType(dir.Write("c.mp3", Mp3Frames(spec, 8)).c_str(), &codec), MM_OK);
+        ASSERT_EQ(MP3_GetCodecType(dir.Write("c.mp3", Mp3Frames(shape, 8)).c_str(), &codec), MM_OK);
         EXPECT_EQ(codec.nAudioCodec, 0x1000u + static_cast<uint32_t>(layer));
     }
     const std::string path = dir.Write("m.mp3", Mp3Frames(Mpeg1Layer3(), 8));

@@ -28,9 +28,9 @@ int32_t Verify(const std::vector<uint8_t>& bytes) {
     return result;
 }
 
-Bytes Frames(int count, const AdtsSpec& spec = {}) {
+Bytes Frames(int count, const AdtsSpec& shape = {}) {
     Bytes b;
-    for (int i = 0; i < count; ++i) b.raw(AdtsFrame(spec, testing_support::SilentAacBlock()));
+    for (int i = 0; i < count; ++i) b.raw(AdtsFrame(shape, testing_support::SilentAacBlock()));
     return b;
 }
 
@@ -57,10 +57,10 @@ TEST(AACGetFrameSize, ReadsLengthAndKindAndRejectsLongOrMissingFrames) {
     const uint8_t noSync[] = {0xFF, 0xE1, 0, 0, 0, 0};
     EXPECT_EQ(AACGetFrameSize(noSync, &kind), static_cast<uint32_t>(MM_E_FAIL));
 
-    AdtsSpec spec;
-    spec.profile = 2;
-    spec.mpegId = 1;
-    std::vector<uint8_t> frame = AdtsFrame(spec, std::vector<uint8_t>(100));
+    AdtsSpec shape;
+    shape.profile = 2;
+    shape.mpegId = 1;
+    std::vector<uint8_t> frame = AdtsFrame(shape, std::vector<uint8_t>(100));
     EXPECT_EQ(AACGetFrameSize(frame.data(), &kind), 107u);
     EXPECT_EQ(kind, (2u << 1) | 0x08u);
 

@@ -20,14 +20,14 @@ using testing_support::TempDir;
 
 namespace {
 
-int32_t FrameSize(const Mp3FrameSpec& spec, uint32_t* signature = nullptr, _FrameHeader_Info* info = nullptr) {
+int32_t FrameSize(const Mp3FrameSpec& shape, uint32_t* signature = nullptr, _FrameHeader_Info* info = nullptr) {
     uint32_t sig = 0;
-    return MP3GetFrameSize(Mp3Header(spec).data(), signature != nullptr ? signature : &sig, info);
+    return MP3GetFrameSize(Mp3Header(shape).data(), signature != nullptr ? signature : &sig, info);
 }
 
-Bytes Frames(int count, const Mp3FrameSpec& spec = {}) {
+Bytes Frames(int count, const Mp3FrameSpec& shape = {}) {
     Bytes b;
-    for (int i = 0; i < count; ++i) b.raw(Mp3Frame(spec));
+    for (int i = 0; i < count; ++i) b.raw(Mp3Frame(shape));
     return b;
 }
 
@@ -66,15 +66,15 @@ TEST(MP3GetFrameSize, ComputesSizesPerVersionAndLayer) {
 }
 
 TEST(MP3GetFrameSize, RecordsTheHeaderFieldsAndSignature) {
-    Mp3FrameSpec spec;
-    spec.version = 2;
-    spec.layer = 2;
-    spec.samplingIndex = 1;
-    spec.channelMode = 3;
-    spec.crc = true;
+    Mp3FrameSpec shape;
+    shape.version = 2;
+    shape.layer = 2;
+    shape.samplingIndex = 1;
+    shape.channelMode = 3;
+    shape.crc = true;
     _FrameHeader_Info info{};
     uint32_t signature = 0;
-    ASSERT_GT(FrameSize(spec, &signature, &info), 0);
+    ASSERT_GT(FrameSize(shape, &signature, &info), 0);
     EXPECT_EQ(info.versionId, 2);
     EXPECT_EQ(info.layerIndex, 1);
     EXPECT_EQ(info.channelMode, 3);

@@ -46,8 +46,8 @@ Bytes AviAudioFormat(uint16_t formatTag, uint16_t channels, uint32_t sampleRate,
     return RiffChunk("strf", body);
 }
 
-Bytes AviStrl(const AviStreamSpec& spec, const Bytes& strf) {
-    return RiffList("strl", {AviStreamHeader(spec), strf});
+Bytes AviStrl(const AviStreamSpec& shape, const Bytes& strf) {
+    return RiffList("strl", {AviStreamHeader(shape), strf});
 }
 
 Bytes AviHdrl(const AviMainSpec& main, const std::vector<Bytes>& lists) {

@@ -22,7 +22,7 @@ struct AviMainSpec {
     uint32_t height = 0;
     uint32_t flags = 0x10;  // has index
 };
-Bytes AviMainHeader(const AviMainSpec& spec);  // the "avih" chunk
+Bytes AviMainHeader(const AviMainSpec& shape);  // the "avih" chunk
 
 struct AviStreamSpec {
     std::string type = "vids";
@@ -32,11 +32,11 @@ struct AviStreamSpec {
     uint32_t length = 0;
     uint32_t sampleSize = 0;
 };
-Bytes AviStreamHeader(const AviStreamSpec& spec);  // the "strh" chunk
+Bytes AviStreamHeader(const AviStreamSpec& shape);  // the "strh" chunk
 Bytes AviVideoFormat(uint32_t width, uint32_t height, const std::string& compression, const Bytes& extra = Bytes());
 Bytes AviAudioFormat(uint16_t formatTag, uint16_t channels, uint32_t sampleRate, uint32_t avgBytesPerSec,
                      uint16_t blockAlign, uint16_t bits);
-Bytes AviStrl(const AviStreamSpec& spec, const Bytes& strf);
+Bytes AviStrl(const AviStreamSpec& shape, const Bytes& strf);
 Bytes AviHdrl(const AviMainSpec& main, const std::vector<Bytes>& lists);
 
 // One chunk of "movi": stream number, two-letter type ("dc", "wb"), data, and

@@ -27,7 +27,7 @@ struct Id3v1Spec {
     int track = -1;  // v1.1 track byte when >= 0
     uint8_t genre = 255;
 };
-std::vector<uint8_t> Id3v1(const Id3v1Spec& spec);
+std::vector<uint8_t> Id3v1(const Id3v1Spec& shape);
 
 // ID3 unsynchronisation: a 00 after every FF.
 std::vector<uint8_t> Unsynchronise(const std::vector<uint8_t>& data);

@@ -32,9 +32,9 @@ uint32_t Mp3FrameSize(const Mp3FrameSpec& s) {
     return static_cast<uint32_t>(coefficient * bitrate / rate + s.padding);
 }
 
-std::vector<uint8_t> Mp3Frame(const Mp3FrameSpec& spec) {
-    std::vector<uint8_t> frame = Mp3Header(spec);
-    frame.resize(Mp3FrameSize(spec), 0);
+std::vector<uint8_t> Mp3Frame(const Mp3FrameSpec& shape) {
+    std::vector<uint8_t> frame = Mp3Header(shape);
+    frame.resize(Mp3FrameSize(shape), 0);
     return frame;
 }
 

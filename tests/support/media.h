@@ -20,9 +20,9 @@ struct Mp3FrameSpec {
     int channelMode = 0;
     bool crc = false;
 };
-std::vector<uint8_t> Mp3Header(const Mp3FrameSpec& spec);
-std::vector<uint8_t> Mp3Frame(const Mp3FrameSpec& spec);
-uint32_t Mp3FrameSize(const Mp3FrameSpec& spec);
+std::vector<uint8_t> Mp3Header(const Mp3FrameSpec& shape);
+std::vector<uint8_t> Mp3Frame(const Mp3FrameSpec& shape);
+uint32_t Mp3FrameSize(const Mp3FrameSpec& shape);
 
 // An ID3v2 tag header (version 2..4) for a body of bodySize bytes, then the body.
 std::vector<uint8_t> Id3v2Tag(int version, const std::vector<uint8_t>& body, uint8_t flags = 0);
@@ -36,7 +36,7 @@ struct AdtsSpec {
     bool crc = false;
     int rawBlocks = 0;       // number_of_raw_data_blocks_in_frame
 };
-std::vector<uint8_t> AdtsFrame(const AdtsSpec& spec, const std::vector<uint8_t>& payload);
+std::vector<uint8_t> AdtsFrame(const AdtsSpec& shape, const std::vector<uint8_t>& payload);
 
 // A silent AAC raw data block: one SCE with no bands, then END (4 bytes).
 std::vector<uint8_t> SilentAacBlock();

@@ -4,21 +4,21 @@
 
 namespace testing_support {
 
-std::vector<uint8_t> Mp3Frames(const Mp3FrameSpec& spec, int count) {
+std::vector<uint8_t> Mp3Frames(const Mp3FrameSpec& shape, int count) {
     std::vector<uint8_t> out;
-    const std::vector<uint8_t> frame = Mp3Frame(spec);
+    const std::vector<uint8_t> frame = Mp3Frame(shape);
     for (int i = 0; i < count; ++i) out.insert(out.end(), frame.begin(), frame.end());
     return out;
 }
 
-uint32_t XingDistanceFor(const Mp3FrameSpec& spec) {
-    const bool mono = spec.channelMode == 3;
-    if (spec.version == 3) return mono ? 21 : 36;
+uint32_t XingDistanceFor(const Mp3FrameSpec& shape) {
+    const bool mono = shape.channelMode == 3;
+    if (shape.version == 3) return mono ? 21 : 36;
     return mono ? 13 : 21;
 }
 
-std::vector<uint8_t> XingFrame(const Mp3FrameSpec& spec, const XingSpec& xing) {
-    std::vector<uint8_t> frame = Mp3Frame(spec);
+std::vector<uint8_t> XingFrame(const Mp3FrameSpec& shape, const XingSpec& xing) {
+    std::vector<uint8_t> frame = Mp3Frame(shape);
     Bytes body;
     body.str(xing.tag).be32(xing.flags);
     if (xing.flags & 1) body.be32(xing.frames);
@@ -31,14 +31,14 @@ std::vector<uint8_t> XingFrame(const Mp3FrameSpec& spec, const XingSpec& xing) {
         }
     }
     if (xing.flags & 8) body.be32(xing.quality);
-    const uint32_t at = XingDistanceFor(spec);
+    const uint32_t at = XingDistanceFor(shape);
     if (frame.size() < at + body.size()) frame.resize(at + body.size(), 0);
     std::memcpy(frame.data() + at, body.data().data(), body.size());
     return frame;
 }
 
-std::vector<uint8_t> VbriFrame(const Mp3FrameSpec& spec, const VbriSpec& v) {
-    std::vector<uint8_t> frame = Mp3Frame(spec);
+std::vector<uint8_t> VbriFrame(const Mp3FrameSpec& shape, const VbriSpec& v) {
+    std::vector<uint8_t> frame = Mp3Frame(shape);
     Bytes body;
     body.str("VBRI").le16(v.version).le16(v.delay).le16(v.quality).be32(v.bytes).be32(v.frames);
     body.le16(v.entries).le16(v.scale).le16(v.entrySize).le16(v.framesPerEntry);

@@ -9,7 +9,7 @@
 namespace testing_support {
 
 // count frames of the same kind, payload zeroed.
-std::vector<uint8_t> Mp3Frames(const Mp3FrameSpec& spec, int count);
+std::vector<uint8_t> Mp3Frames(const Mp3FrameSpec& shape, int count);
 
 struct XingSpec {
     uint32_t flags = 0xF;
@@ -20,8 +20,8 @@ struct XingSpec {
     const char* tag = "Xing";
 };
 // A frame of the given kind's size, carrying a Xing header at the offset the reader expects.
-std::vector<uint8_t> XingFrame(const Mp3FrameSpec& spec, const XingSpec& xing);
-uint32_t XingDistanceFor(const Mp3FrameSpec& spec);
+std::vector<uint8_t> XingFrame(const Mp3FrameSpec& shape, const XingSpec& xing);
+uint32_t XingDistanceFor(const Mp3FrameSpec& shape);
 
 struct VbriSpec {
     uint16_t version = 1, delay = 0x0102, quality = 75;
@@ -29,6 +29,6 @@ struct VbriSpec {
     uint16_t entries = 0, scale = 1, entrySize = 2, framesPerEntry = 0;
 };
 // A frame with "VBRI" at byte 36 (16-bit fields written little-endian as read).
-std::vector<uint8_t> VbriFrame(const Mp3FrameSpec& spec, const VbriSpec& vbri);
+std::vector<uint8_t> VbriFrame(const Mp3FrameSpec& shape, const VbriSpec& vbri);
 
 }  // namespace testing_support
