@@ -11,60 +11,56 @@ std::vector<uint8_t> Id3Frame(int version, const std::string& id, const std::vec
     b.str(id);
     if (version == 4) b.syncsafe32(static_cast<uint32_t>(body.size()));
     else b.be32(static_cast<uint32_t>(body.size()));
-    b.u8(0).u8(flags2).raw(body);
-    return b.data();
+    return b.u8(0).u8(flags2).raw(body).data();
 }
 
 std::vector<uint8_t> Id3Frame22(const std::string& id, const std::vector<uint8_t>& body) {
-    Bytes b;
-    b.str(id).be24(static_cast<uint32_t>(body.size())).raw(body);
-    return b.data();
+    return Bytes().str(id).be24(static_cast<uint32_t>(body.size())).raw(body).data();
+}
+
+std::vector<uint8_t> ApicBody(const std::string& mime, const std::vector<uint8_t>& picture, const std::string& description) {
+    return Bytes().u8(0).str(mime).u8(0).u8(3).str(description).u8(0).raw(picture).data();
 }
 
 std::vector<uint8_t> TextBytes(uint8_t encoding, const std::vector<uint8_t>& text) {
-    Bytes b;
-    b.u8(encoding).raw(text);
-    return b.data();
+    return Bytes().u8(encoding).raw(text).data();
 }
 
-std::vector<uint8_t> TextBody(uint8_t encoding, const std::string& text) {
-    return TextBytes(encoding, std::vector<uint8_t>(text.begin(), text.end()));
-}
+std::vector<uint8_t> TextBody(uint8_t encoding, const std::string& text) { return Bytes().u8(encoding).str(text).data(); }
 
 std::vector<uint8_t> Id3Tag(int version, const std::vector<std::vector<uint8_t>>& frames, size_t padding,
                             uint8_t flags) {
     Bytes body;
     for (const auto& f : frames) body.raw(f);
-    body.zeros(padding);
-    return Id3v2Tag(version, body.data(), flags);
+    return Id3v2Tag(version, body.zeros(padding).data(), flags);
 }
 
 std::vector<uint8_t> Id3v1(const Id3v1Spec& s) {
     std::vector<uint8_t> tag(128, 0);
-    std::copy_n("TAG", 3, tag.begin());
     auto put = [&](size_t at, const std::string& text, size_t n) {
         std::copy_n(text.begin(), std::min(text.size(), n), tag.begin() + static_cast<long>(at));
     };
+    put(0, "TAG", 3);
     put(3, s.title, 30);
     put(33, s.artist, 30);
     put(63, s.album, 30);
     put(93, s.year, 4);
     put(97, s.comment, s.track >= 0 ? 28 : 30);
-    if (s.track >= 0) {
-        tag[125] = 0;
-        tag[126] = static_cast<uint8_t>(s.track);
-    }
+    if (s.track >= 0) tag[126] = static_cast<uint8_t>(s.track);
     tag[127] = s.genre;
     return tag;
 }
 
+std::vector<uint8_t> Id3v1Titled(const std::string& title) {
+    Id3v1Spec fields;
+    fields.title = title;
+    return Id3v1(fields);
+}
+
 std::vector<uint8_t> Unsynchronise(const std::vector<uint8_t>& data) {
-    std::vector<uint8_t> out;
-    for (uint8_t c : data) {
-        out.push_back(c);
-        if (c == 0xFF) out.push_back(0);
-    }
-    return out;
+    Bytes out;
+    for (uint8_t c : data) c == 0xFF ? out.u8(c).u8(0) : out.u8(c);
+    return out.data();
 }
 
 }  // namespace testing_support

@@ -14,6 +14,9 @@ std::vector<uint8_t> Id3Frame(int version, const std::string& id, const std::vec
                               uint8_t flags2 = 0);
 // A v2.2 frame: three-letter id, 24-bit size.
 std::vector<uint8_t> Id3Frame22(const std::string& id, const std::vector<uint8_t>& body);
+// An APIC body: Latin-1 encoding, MIME type, picture type 3, description, then the picture.
+std::vector<uint8_t> ApicBody(const std::string& mime, const std::vector<uint8_t>& picture,
+                              const std::string& description = "");
 // Encoding byte then text.
 std::vector<uint8_t> TextBytes(uint8_t encoding, const std::vector<uint8_t>& text);
 std::vector<uint8_t> TextBody(uint8_t encoding, const std::string& text);
@@ -28,6 +31,8 @@ struct Id3v1Spec {
     uint8_t genre = 255;
 };
 std::vector<uint8_t> Id3v1(const Id3v1Spec& shape);
+// A v1 tag with only a title.
+std::vector<uint8_t> Id3v1Titled(const std::string& title);
 
 // ID3 unsynchronisation: a 00 after every FF.
 std::vector<uint8_t> Unsynchronise(const std::vector<uint8_t>& data);

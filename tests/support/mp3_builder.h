@@ -8,27 +8,24 @@
 
 namespace testing_support {
 
-// count frames of the same kind, payload zeroed.
-std::vector<uint8_t> Mp3Frames(const Mp3FrameSpec& shape, int count);
+using Mp3Shape = Mp3FrameSpec;
 
-struct XingSpec {
-    uint32_t flags = 0xF;
-    uint32_t frames = 0;
-    uint32_t bytes = 0;
-    std::vector<uint8_t> toc;  // 100 entries when flag 4 is set (default 0, 2.56, ...)
-    uint32_t quality = 57;
+// count frames of the same kind, payload zeroed.
+std::vector<uint8_t> Mp3Frames(int count, const Mp3Shape& shape = {});
+
+struct XingFields {
+    uint32_t flags = 0xF, frames = 0, bytes = 0, quality = 57;  // TOC entries are i * 256 / 100
     const char* tag = "Xing";
 };
-// A frame of the given kind's size, carrying a Xing header at the offset the reader expects.
-std::vector<uint8_t> XingFrame(const Mp3FrameSpec& shape, const XingSpec& xing);
-uint32_t XingDistanceFor(const Mp3FrameSpec& shape);
+// A frame of the given kind's size, carrying a Xing header at the offset the reader expects
+// (36, or 21 for MPEG-1 mono and MPEG-2/2.5 stereo, or 13 for MPEG-2/2.5 mono).
+std::vector<uint8_t> XingFrame(const XingFields& xing, const Mp3Shape& shape = {});
 
-struct VbriSpec {
-    uint16_t version = 1, delay = 0x0102, quality = 75;
-    uint32_t bytes = 0, frames = 0;
-    uint16_t entries = 0, scale = 1, entrySize = 2, framesPerEntry = 0;
+struct VbriFields {
+    uint16_t delay = 0x0102, scale = 1, framesPerEntry = 0;
+    uint32_t bytes = 0, frames = 0;  // version 1, quality 75, 10 entries of 2 bytes
 };
-// A frame with "VBRI" at byte 36 (16-bit fields written little-endian as read).
-std::vector<uint8_t> VbriFrame(const Mp3FrameSpec& shape, const VbriSpec& vbri);
+// A frame with "VBRI" at byte 36 (16-bit fields little-endian, 32-bit ones big-endian).
+std::vector<uint8_t> VbriFrame(const VbriFields& vbri);
 
 }  // namespace testing_support
