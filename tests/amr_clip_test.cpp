@@ -2,194 +2,109 @@
 // block size and the queries answered from them.
 #include <gtest/gtest.h>
 
-#include <cstring>
-
 #include "metainfo/metainfo.h"
 #include "speech/amr.h"
-#include "support/bytes.h"
 #include "support/speech_builder.h"
 
 using namespace testing_support;
 
-namespace {
-
-int32_t Clip(const std::string& path, int type, _MMClipInfo* clip) {
-    return MM_MediaExtractor_GetClipInfo(path.c_str(), type, clip);
-}
-
-}  // namespace
-
-TEST(AmrClip, NarrowBand3000FramesAt122IsSixtySeconds) {
-    TempDir dir;
-    std::string path = dir.Write("speech.amr", AmrFile(false, 7, 3000));
-    _MMClipInfo clip;
-    ASSERT_EQ(Clip(path, MEDIA_TYPE_AMR_NB, &clip), MM_OK);
-    EXPECT_EQ(clip.nDuration, 60000u);
-    EXPECT_EQ(clip.nBitrate, 12200u);
-    EXPECT_EQ(clip.nAudioBitrate, 12200u);
-    EXPECT_EQ(clip.nFileSize, 96006u);
-    EXPECT_STREQ(clip.szFormat, "amr");
-    EXPECT_EQ(clip.nSampleRate, 8000u);
-    EXPECT_EQ(clip.nSamplesPerFrame, 160u);
-    EXPECT_EQ(clip.nBitsPerSample, 16u);
-    EXPECT_EQ(clip.nChannels, 1u);
-    EXPECT_EQ(clip.bHasAudio, 1u);
-    EXPECT_EQ(clip.bHasVideo, 0u);
-}
-
-TEST(AmrClip, WideBandReportsAwbAt16000) {
-    TempDir dir;
-    std::string path = dir.Write("speech.awb", AmrFile(true, 8, 500));
-    _MMClipInfo clip;
-    ASSERT_EQ(Clip(path, MEDIA_TYPE_AMR_WB, &clip), MM_OK);
-    EXPECT_EQ(clip.nDuration, 10000u);
-    EXPECT_EQ(clip.nBitrate, 23850u);
-    EXPECT_STREQ(clip.szFormat, "awb");
-    EXPECT_EQ(clip.nSampleRate, 16000u);
-    EXPECT_EQ(clip.nSamplesPerFrame, 320u);
-}
-
-TEST(AmrClip, MultiChannelReadsChannelCountAndFrameHeadersAfterDescription) {
-    // Magic, a 4-byte channel description ending in the count 2, then one
-    // frame per channel for each 20 ms.
-    Bytes b;
-    b.str("#!AMR_MC1.0\n").be32(2);
-    for (int i = 0; i < 100; ++i) b.raw(AmrFrame(false, 7));
-    TempDir dir;
-    std::string path = dir.Write("multi.amr", b.data());
-    _MMClipInfo clip{};
-    ASSERT_EQ(metainfo::AMR_GetClipInfo(path.c_str(), &clip), MM_OK);
-    EXPECT_EQ(clip.nChannels, 2u);
-    EXPECT_EQ(clip.nDuration, 1u);  // (3216 - 12) / 64 / 50
-    _MM_MIMETYPE mime{};
-    ASSERT_EQ(metainfo::AMR_GetMIMEType(path.c_str(), &mime), MM_OK);
-    EXPECT_STREQ(mime.pszMimeType, "audio/AMR");
-    MM_MediaExtractor_FreeBuffer(mime.pszMimeType);
-}
-
-TEST(AmrClip, NarrowBandCodecQueryIsUnsupported) {
-    TempDir dir;
-    std::string path = dir.Write("speech.amr", AmrFile(false, 7, 60));
-    _MM_CODECTYPE codec;
-    EXPECT_EQ(MM_MediaExtractor_GetCodecType(path.c_str(), MEDIA_TYPE_AMR_NB, &codec), MM_E_UNSUPPORTED);
-    EXPECT_EQ(codec.nAudioCodec, 0u);
-}
-
-TEST(AmrClip, WideBandSubTypeIsFrameTypePlusNineInTheCodeTable) {
-    TempDir dir;
+TEST(AmrClip, EachFileKindAnswersItsRatesMimeAndCodec) {
     const struct {
+        bool wideBand;
         int frameType;
-        uint32_t subType;
-    } cases[] = {{0, 0x1019}, {2, 0x101B}, {8, 0x1021}, {9, 0x1022}, {15, 0}};
+        uint32_t frames, channels, subType;
+        const char* clip;
+    } cases[] = {
+        // 3000 frames of 32 bytes: (96006 - 6) / 32 / 50 = 60 s.
+        {false, 7, 3000, 0, 0, "amr size=96006 dur=60000 bps=12200/12200 hz=8000 ch=1 bits=16 spf=160 av=1/0"},
+        {true, 8, 500, 0, 0x1021, "awb size=30509 dur=10000 bps=23850/23850 hz=16000 ch=1 bits=16 spf=320 av=1/0"},
+        // Wide-band 9 is a SID frame, 15 carries no data (and runs off the code table).
+        {true, 9, 250, 0, 0x1022, "awb size=1509 dur=5000 bps=1750/1750 hz=16000 ch=1 bits=16 spf=320 av=1/0"},
+        {true, 15, 200, 0, 0, "awb size=209 dur=4000 bps=40/40 hz=16000 ch=1 bits=16 spf=320 av=1/0"},
+        // Multi-channel: one frame per channel in each 20 ms block, the frame
+        // headers after the 4-byte channel description.
+        {false, 7, 200, 2, 0, "amr size=6416 dur=2000 bps=12200/12200 hz=8000 ch=2 bits=16 spf=160 av=1/0"},
+        {true, 0, 300, 3, 0x1019, "awb size=5419 dur=2000 bps=6600/6600 hz=16000 ch=3 bits=16 spf=320 av=1/0"},
+    };
+    _MM_MIMETYPE mime{};  // kept across files: each answer releases the one before
     for (const auto& c : cases) {
-        std::string path = dir.Write("speech.awb", AmrFile(true, c.frameType, 60));
+        SCOPED_TRACE(c.clip);
+        std::string path = SpeechFile("speech.amr", AmrFile(c.wideBand, c.frameType, c.frames, c.channels));
+        int type = c.wideBand ? MEDIA_TYPE_AMR_WB : MEDIA_TYPE_AMR_NB;
+        _MMClipInfo clip;
+        ASSERT_EQ(MM_MediaExtractor_GetClipInfo(path.c_str(), type, &clip), MM_OK);
+        EXPECT_EQ(AudioSummary(clip), c.clip);
+        ASSERT_EQ(metainfo::AMR_GetMIMEType(path.c_str(), &mime), MM_OK);
+        std::string expected = c.wideBand ? "audio/AMR-WB" : "audio/AMR";
+        EXPECT_EQ(mime.pszMimeType, expected);
+        EXPECT_EQ(mime.nMimeLength, expected.size());
+        // A narrow-band file has no codec answer.
         _MM_CODECTYPE codec;
-        ASSERT_EQ(MM_MediaExtractor_GetCodecType(path.c_str(), MEDIA_TYPE_AMR_WB, &codec), MM_OK) << c.frameType;
-        EXPECT_EQ(codec.nAudioCodec, 0x1020u);
-        EXPECT_EQ(codec.nAudioSubType, c.subType) << c.frameType;
+        EXPECT_EQ(MM_MediaExtractor_GetCodecType(path.c_str(), type, &codec), c.wideBand ? MM_OK : MM_E_UNSUPPORTED);
+        EXPECT_EQ(codec.nAudioCodec, c.wideBand ? 0x1020u : 0u);
+        EXPECT_EQ(codec.nAudioSubType, c.subType);
     }
-}
-
-TEST(AmrClip, MimeTypesByKindReplaceAStringAlreadyHeld) {
-    TempDir dir;
-    std::string nb = dir.Write("a.amr", AmrFile(false, 0, 60));
-    std::string wb = dir.Write("a.awb", AmrFile(true, 0, 60));
-    _MM_MIMETYPE mime{};
-    mime.pszMimeType = new char[4]{'o', 'l', 'd', 0};
-    ASSERT_EQ(metainfo::AMR_GetMIMEType(nb.c_str(), &mime), MM_OK);
-    EXPECT_STREQ(mime.pszMimeType, "audio/AMR");
-    EXPECT_EQ(mime.nMimeLength, 9u);
-    ASSERT_EQ(metainfo::AMR_GetMIMEType(wb.c_str(), &mime), MM_OK);
-    EXPECT_STREQ(mime.pszMimeType, "audio/AMR-WB");
-    EXPECT_EQ(mime.nMimeLength, 12u);
     MM_MediaExtractor_FreeBuffer(mime.pszMimeType);
 }
 
-TEST(AmrClip, FirstFrameHeaderChecksFailEveryQuery) {
-    TempDir dir;
-    std::vector<std::vector<uint8_t>> bad;
-    Bytes quality;  // quality bit 0
-    quality.str("#!AMR\n").raw(AmrFrame(false, 7, false)).raw(AmrFrame(false, 7));
-    bad.push_back(quality.data());
-    Bytes padding;  // low bits set
-    padding.str("#!AMR\n").u8(0x3D).zeros(40);
-    bad.push_back(padding.data());
-    Bytes top;  // bit 7 set
-    top.str("#!AMR\n").u8(0xBC).zeros(40);
-    bad.push_back(top.data());
-    bad.push_back(AmrFile(false, 9, 10));   // narrow-band 9..14 reserved
-    bad.push_back(AmrFile(false, 14, 10));
-    bad.push_back(AmrFile(true, 10, 10));   // wide-band 10..14 reserved
-    for (size_t i = 0; i < bad.size(); ++i) {
-        std::string path = dir.Write("bad.amr", bad[i]);
+TEST(AmrClip, BadMagicHeaderByteOrShortFileFailsEveryQuery) {
+    const struct {
+        const char* magic;
+        int header;  // first frame header byte, -1 for none
+        size_t bytes;
+        int32_t result;
+    } cases[] = {
+        {"#!AMR\n", 7 << 3, 40, MM_E_FAIL},             // quality bit 0
+        {"#!AMR\n", 7 << 3 | 5, 40, MM_E_FAIL},         // low bits set
+        {"#!AMR\n", 0x80 | 7 << 3 | 4, 40, MM_E_FAIL},  // bit 7 set
+        {"#!AMR\n", 9 << 3 | 4, 40, MM_E_FAIL},         // narrow-band 9..14 reserved
+        {"#!AMR\n", 14 << 3 | 4, 40, MM_E_FAIL},
+        {"#!AMR-WB\n", 10 << 3 | 4, 40, MM_E_FAIL},     // wide-band 10..14 reserved
+        {"#!AMR\n", 7 << 3 | 4, 8, MM_E_FAIL},          // 15 bytes in all
+        {"#!AMR-WB_MC1.0\n", -1, 1, MM_E_FAIL},         // first frame past a 16-byte file
+        {"#!AMR_X\n", -1, 40, MM_E_UNSUPPORTED},
+    };
+    for (const auto& c : cases) {
+        SCOPED_TRACE(testing::Message() << c.magic << c.header);
+        Bytes b;
+        b.str(c.magic);
+        if (c.header >= 0) b.u8(c.header);
+        std::string path = SpeechFile("bad.amr", b.zeros(c.bytes));
         _MMClipInfo clip{};
-        EXPECT_EQ(metainfo::AMR_GetClipInfo(path.c_str(), &clip), MM_E_FAIL) << i;
+        EXPECT_EQ(metainfo::AMR_GetClipInfo(path.c_str(), &clip), c.result);
         _MM_MIMETYPE mime{};
-        EXPECT_EQ(metainfo::AMR_GetMIMEType(path.c_str(), &mime), MM_E_FAIL) << i;
+        EXPECT_EQ(metainfo::AMR_GetMIMEType(path.c_str(), &mime), c.result);
         EXPECT_EQ(mime.pszMimeType, nullptr);
         _MM_CODECTYPE codec{};
-        EXPECT_EQ(metainfo::AMR_GetCodecType(path.c_str(), &codec), MM_E_FAIL) << i;
+        EXPECT_EQ(metainfo::AMR_GetCodecType(path.c_str(), &codec), c.result);
+        unsigned char* data = nullptr;
+        int size = 0;
+        EXPECT_EQ(metainfo::AMR_GetAudioData2Buf(path.c_str(), 0, 1, &data, &size), c.result);
+        EXPECT_EQ(data, nullptr);
     }
-}
-
-TEST(AmrClip, NoDataFramesAreAcceptedAsFirstFrame) {
-    TempDir dir;
-    std::string path = dir.Write("sid.amr", AmrFile(false, 15, 200));
     _MMClipInfo clip{};
-    ASSERT_EQ(metainfo::AMR_GetClipInfo(path.c_str(), &clip), MM_OK);
-    EXPECT_EQ(clip.nDuration, 4u);  // 200 one-byte frames
-    EXPECT_EQ(clip.nBitrate, 40u);
-}
-
-TEST(AmrClip, ShortOrUnknownFilesAreRefused) {
-    TempDir dir;
-    _MMClipInfo clip{};
-    std::string shortFile = dir.Write("short.amr", Bytes().str("#!AMR\n").raw(AmrFrame(false, 0)).data());
-    std::vector<uint8_t> fifteen = Bytes().str("#!AMR\n").u8(0x3C).zeros(8).data();
-    EXPECT_EQ(metainfo::AMR_GetClipInfo(dir.Write("15.amr", fifteen).c_str(), &clip), MM_E_FAIL);
-    std::vector<uint8_t> other = Bytes().str("#!AMR_X\n").zeros(40).data();
-    EXPECT_EQ(metainfo::AMR_GetClipInfo(dir.Write("x.amr", other).c_str(), &clip), MM_E_UNSUPPORTED);
-    // The wide-band multi-channel first frame lies past a 16-byte file.
-    std::vector<uint8_t> mc = Bytes().str("#!AMR-WB_MC1.0\n").u8(1).data();
-    EXPECT_EQ(metainfo::AMR_GetClipInfo(dir.Write("mc.awb", mc).c_str(), &clip), MM_E_FAIL);
-    EXPECT_EQ(metainfo::AMR_GetClipInfo(dir.PathOf("missing.amr").c_str(), &clip), MM_E_FAIL);
+    EXPECT_EQ(metainfo::AMR_GetClipInfo("/no/such/file.amr", &clip), MM_E_FAIL);
     EXPECT_EQ(metainfo::AMR_GetClipInfo(nullptr, &clip), MM_E_INVALIDARG);
-    EXPECT_EQ(metainfo::AMR_GetClipInfo(shortFile.c_str(), nullptr), MM_E_INVALIDARG);
+    EXPECT_EQ(metainfo::AMR_GetClipInfo(SpeechFile("bad.amr", {}).c_str(), nullptr), MM_E_INVALIDARG);
 }
 
 TEST(AmrBlockSize, DropsOneOutlierAtEachEnd) {
     Bytes b;
     b.raw(AmrFrame(false, 7)).raw(AmrFrame(false, 7)).raw(AmrFrame(false, 7)).raw(AmrFrame(false, 0));
     EXPECT_EQ(metainfo::Get_avBlockSize(b.data().data(), 0, b.size(), 1), 32);  // (109 - 32 - 13) / 2
-    Bytes two;
-    two.raw(AmrFrame(false, 7)).raw(AmrFrame(false, 0));
-    EXPECT_EQ(metainfo::Get_avBlockSize(two.data().data(), 0, two.size(), 1), 22);  // 45 / 2
+    EXPECT_EQ(metainfo::Get_avBlockSize(b.data().data() + 64, 0, 45, 1), 22);   // two blocks: 45 / 2
     EXPECT_EQ(metainfo::Get_avBlockSize(nullptr, 0, 100, 1), 0);
 }
 
-TEST(AmrBlockSize, ReservedFrameTypesStopAfter4096BlocksAndFailTheClip) {
-    // A valid first frame, then frames of size 0 that never advance the walk.
-    Bytes b;
-    b.str("#!AMR\n").raw(AmrFrame(false, 7)).u8(12 << 3 | 4).zeros(100);
-    EXPECT_EQ(metainfo::Get_avBlockSize(b.data().data() + 6, 0, b.size() - 6, 1), 0);
-    TempDir dir;
-    std::string path = dir.Write("stuck.amr", b.data());
-    _MMClipInfo clip{};
-    EXPECT_EQ(metainfo::AMR_GetClipInfo(path.c_str(), &clip), MM_E_FAIL);
-}
-
-TEST(AmrBlockSize, MultiChannelWithoutChannelsHasNoBlockSize) {
-    Bytes b;
-    b.str("#!AMR_MC1.0\n").be32(0);
-    for (int i = 0; i < 10; ++i) b.raw(AmrFrame(false, 7));
-    TempDir dir;
-    std::string path = dir.Write("none.amr", b.data());
-    _MMClipInfo clip{};
-    EXPECT_EQ(metainfo::AMR_GetClipInfo(path.c_str(), &clip), MM_E_FAIL);
-}
-
-TEST(AmrClip, TrackTypeIsAudioWithoutReadingTheFile) {
-    int mask = 0;
-    EXPECT_EQ(MM_MediaExtractor_GetTrackType("/no/such/file.amr", MEDIA_TYPE_AMR_NB, &mask), MM_OK);
-    EXPECT_EQ(mask, TRACK_AUDIO);
+TEST(AmrBlockSize, NoBlockSizeFailsTheClip) {
+    // Reserved frames of size 0 after a valid one never advance the walk,
+    // which stops after 4096 blocks; a multi-channel file of 0 channels has
+    // empty blocks.
+    Bytes stuck;
+    stuck.str("#!AMR\n").raw(AmrFrame(false, 7)).u8(12 << 3 | 4).zeros(100);
+    EXPECT_EQ(metainfo::Get_avBlockSize(stuck.data().data() + 6, 0, stuck.size() - 6, 1), 0);
+    for (const std::vector<uint8_t>& file : {stuck.data(), AmrFile(false, 7, 10, 0x10 /* low 4 bits 0 */)}) {
+        _MMClipInfo clip{};
+        EXPECT_EQ(metainfo::AMR_GetClipInfo(SpeechFile("none.amr", file).c_str(), &clip), MM_E_FAIL);
+    }
 }

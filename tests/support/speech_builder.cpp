@@ -1,5 +1,7 @@
 #include "support/speech_builder.h"
 
+#include <cstdio>
+
 namespace testing_support {
 namespace {
 
@@ -27,63 +29,51 @@ std::vector<uint8_t> RiffForm(const std::string& form, const std::vector<Bytes>&
     Bytes body;
     body.str(form);
     for (const Bytes& c : chunks) body.raw(c);
-    Bytes b;
-    b.str("RIFF").le32(static_cast<uint32_t>(body.size())).raw(body);
-    return b.data();
+    return SpeechChunk("RIFF", body).data();
 }
 
-Bytes WaveFmtBody(uint16_t tag, uint16_t channels, uint32_t rate, uint16_t bits, uint32_t avgBytesPerSec) {
+Bytes WaveFmtBody(uint16_t tag, uint16_t channels, uint32_t rate, uint16_t bits) {
     uint32_t blockAlign = channels * bits / 8;
-    if (avgBytesPerSec == 0) avgBytesPerSec = rate * blockAlign;
     Bytes b;
-    b.le16(tag).le16(channels).le32(rate).le32(avgBytesPerSec).le16(blockAlign).le16(bits);
+    b.le16(tag).le16(channels).le32(rate).le32(rate * blockAlign).le16(blockAlign).le16(bits);
     return b;
 }
 
 std::vector<uint8_t> CanonicalWave(uint16_t tag, uint16_t channels, uint32_t rate, uint16_t bits, uint32_t dataBytes) {
-    Bytes data;
-    data.fill(dataBytes, 0x80);
-    return RiffForm("WAVE", {SpeechChunk("fmt ", WaveFmtBody(tag, channels, rate, bits)), SpeechChunk("data", data)});
-}
-
-uint32_t AmrFrameBytes(bool wideBand, int frameType) {
-    return wideBand ? kWbFrameBytes[frameType & 15] : kNbFrameBytes[frameType & 15];
+    return RiffForm("WAVE", {SpeechChunk("fmt ", WaveFmtBody(tag, channels, rate, bits)),
+                             SpeechChunk("data", Bytes().fill(dataBytes, 0x80))});
 }
 
 Bytes AmrFrame(bool wideBand, int frameType, bool quality) {
     Bytes b;
     b.u8(((frameType & 15) << 3) | (quality ? 0x04 : 0));
-    uint32_t size = AmrFrameBytes(wideBand, frameType);
+    uint32_t size = wideBand ? kWbFrameBytes[frameType & 15] : kNbFrameBytes[frameType & 15];
     if (size > 1) b.zeros(size - 1);
     return b;
 }
 
-std::vector<uint8_t> AmrFile(bool wideBand, int frameType, uint32_t frames) {
+std::vector<uint8_t> AmrFile(bool wideBand, int frameType, uint32_t frames, uint32_t channels) {
     Bytes b;
-    b.str(wideBand ? "#!AMR-WB\n" : "#!AMR\n");
+    if (channels == 0) b.str(wideBand ? "#!AMR-WB\n" : "#!AMR\n");
+    else b.str(wideBand ? "#!AMR-WB_MC1.0\n" : "#!AMR_MC1.0\n").be32(channels);
     Bytes frame = AmrFrame(wideBand, frameType);
     for (uint32_t i = 0; i < frames; ++i) b.raw(frame);
     return b.data();
 }
 
-Bytes QcpFmtChunk(const std::vector<uint8_t>& guid, uint16_t avgBitrate, uint16_t blockSize, uint16_t samplingRate,
-                  uint16_t sampleSize) {
+Bytes QcpFmtChunk(const std::vector<uint8_t>& guid, uint16_t avgBitrate) {
     Bytes body;
     body.u8(1).u8(0).raw(guid).le16(1);
     std::string name = "speech";
     body.str(name).zeros(80 - name.size());
-    body.le16(avgBitrate).le16(35).le16(blockSize).le16(samplingRate).le16(sampleSize);
+    body.le16(avgBitrate).le16(35).le16(160).le16(8000).le16(16);
     body.le32(5);
     for (int i = 0; i < 8; ++i) body.u8(i < 5 ? 4 - i : 0).u8(i < 5 ? 4 - i : 0);
     body.zeros(20);
     return SpeechChunk("fmt ", body);
 }
 
-Bytes QcpVratChunk(uint32_t packets) {
-    Bytes body;
-    body.le32(1).le32(packets);
-    return SpeechChunk("vrat", body);
-}
+Bytes QcpVratChunk(uint32_t packets) { return SpeechChunk("vrat", Bytes().le32(1).le32(packets)); }
 
 Bytes SpeechPackets(uint8_t rate, uint32_t payloadBytes, uint32_t count) {
     Bytes b;
@@ -91,10 +81,34 @@ Bytes SpeechPackets(uint8_t rate, uint32_t payloadBytes, uint32_t count) {
     return b;
 }
 
-std::vector<uint8_t> EvrcFile(const Bytes& packets) {
-    Bytes b;
-    b.str("#!EVRC\n").raw(packets);
-    return b.data();
+std::vector<uint8_t> EvrcFile(const Bytes& packets) { return Bytes().str("#!EVRC\n").raw(packets).data(); }
+
+std::string SpeechFile(const std::string& name, const std::vector<uint8_t>& bytes) {
+    static TempDir dir;
+    return dir.Write(name, bytes);
+}
+
+std::string AudioSummary(const _MMClipInfo& c) {
+    char text[256];
+    std::snprintf(text, sizeof text, "%.127s size=%u dur=%u bps=%u/%u hz=%u ch=%u bits=%u spf=%u av=%u/%u", c.szFormat,
+                  c.nFileSize, c.nDuration, c.nBitrate, c.nAudioBitrate, c.nSampleRate, c.nChannels, c.nBitsPerSample,
+                  c.nSamplesPerFrame, c.bHasAudio, c.bHasVideo);
+    return text;
+}
+
+double FfprobePlayTime(const std::string& file) {
+    std::string cmd = "/usr/bin/ffprobe -v error -show_entries packet=pts_time,duration_time -of csv=p=0 '";
+    FILE* p = popen((cmd + file + "'").c_str(), "r");
+    if (p == nullptr) return -1;
+    char line[128];
+    double end = -1;
+    while (std::fgets(line, sizeof line, p) != nullptr) {
+        double pts = 0;
+        double duration = 0;
+        if (std::sscanf(line, "%lf,%lf", &pts, &duration) == 2) end = pts + duration;
+    }
+    pclose(p);
+    return end;
 }
 
 }  // namespace testing_support
