@@ -137,16 +137,6 @@ TEST(AviSeek, AudioSeeksToTheFirstEntryAtOrAfterTheTime) {
     EXPECT_EQ(actual, 750u);
 }
 
-TEST(AviSeek, BadArguments) {
-    Indexed f(AviVideoOnly(10, 5));
-    uint32_t actual = 0;
-    EXPECT_EQ(f->setMediaTime(0, 0, &actual), MM_E_INVALIDARG) << "nothing read yet";
-    ASSERT_EQ(f.Open(), MM_OK);
-    EXPECT_EQ(f->setMediaTime(0, 100, nullptr), MM_E_INVALIDARG);
-    EXPECT_EQ(f->setMediaTime(0, 401, &actual), MM_E_INVALIDARG) << "past the stream's end";
-    EXPECT_EQ(f->setMediaTime(1, 0, &actual), MM_E_INVALIDARG);
-}
-
 TEST(AviFrames, EveryFrameButTheStreamsLastIsDeliveredWithItsBytes) {
     Indexed f(Interleaved(6, 3));
     ASSERT_EQ(f.Open(), MM_OK);
@@ -165,13 +155,18 @@ TEST(AviFrames, EveryFrameButTheStreamsLastIsDeliveredWithItsBytes) {
     EXPECT_EQ(audio, 2);
 }
 
-TEST(AviFrames, ReadingNeedsMoviAndIndexAndAValidStream) {
-    Indexed f(AviVideoOnly(4, 1));
+TEST(AviFrames, SeekingAndReadingNeedTheIndexAndValidArguments) {
+    Indexed f(AviVideoOnly(10, 5));
+    uint32_t actual = 0;
     _FrameInfo frame{};
+    EXPECT_EQ(f->setMediaTime(0, 0, &actual), MM_E_INVALIDARG) << "nothing read yet";
+    EXPECT_EQ(f->getNextFrame(0, &frame), MM_E_FAIL);
     EXPECT_EQ(f->getNextFrame(0, nullptr), MM_E_INVALIDARG);
     EXPECT_EQ(f->init(nullptr, nullptr), MM_E_INVALIDARG);
-    EXPECT_EQ(f->getNextFrame(0, &frame), MM_E_FAIL);
     ASSERT_EQ(f.Open(), MM_OK);
+    EXPECT_EQ(f->setMediaTime(0, 100, nullptr), MM_E_INVALIDARG);
+    EXPECT_EQ(f->setMediaTime(0, 401, &actual), MM_E_INVALIDARG) << "past the stream's end";
+    EXPECT_EQ(f->setMediaTime(1, 0, &actual), MM_E_INVALIDARG);
     EXPECT_EQ(f->getNextFrame(1, &frame), MM_E_FAIL);
     EXPECT_EQ(f->locateChunk("strl"), MM_E_FAIL) << "only top-level chunks are located";
 }
