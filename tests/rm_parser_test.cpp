@@ -87,6 +87,7 @@ TEST_F(Rm, AudioAndVideoFieldsComeFromTheirFirstStreams) {
 TEST_F(Rm, TwoAudioStreamsAreCountedButTheFirstDescribesTheAudio) {
     RmStream second = AudioStream("sipr", 8000, 1);
     second.number = 1;
+    second.mime = "audio/x-second";
     std::string path = Write(RmFile(Props(2), {RmMdpr(AudioStream()), RmMdpr(second)}));
     ASSERT_EQ(metainfo::RM_GetClipInfo(path.c_str(), &clip), 0);
     EXPECT_EQ(clip.bHasAudio, 2u);
@@ -94,6 +95,10 @@ TEST_F(Rm, TwoAudioStreamsAreCountedButTheFirstDescribesTheAudio) {
     _MM_CODECTYPE codec{};
     EXPECT_EQ(metainfo::RM_GetCodecType(path.c_str(), &codec), 0);
     EXPECT_EQ(codec.nAudioCodec, 0x3002u) << "cook";
+    _MM_MIMETYPE mime{};
+    EXPECT_EQ(metainfo::RM_GetMIMEType(path.c_str(), &mime), 0);
+    EXPECT_STREQ(mime.pszMimeType, "audio/x-pn-realaudio");
+    MM_MediaExtractor_FreeBuffer(mime.pszMimeType);
 }
 
 TEST_F(Rm, LogicalStreamsAndLowerCaseNamesAreNotAudioOrVideo) {

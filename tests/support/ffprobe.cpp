@@ -4,7 +4,8 @@
 
 namespace testing_support {
 
-std::string RunShell(const std::string& command) {
+// Output of a shell command, or "" when it failed.
+static std::string RunShell(const std::string& command) {
     std::string out;
     FILE* p = popen(command.c_str(), "r");
     if (p == nullptr) return out;
