@@ -20,9 +20,8 @@ namespace {
 // The tool is built beside the test directory; "" when it is not there.
 std::string ToolPath() {
     char self[PATH_MAX] = {};
-    ssize_t n = readlink("/proc/self/exe", self, sizeof self - 1);
-    if (n <= 0) return "";
-    std::string dir(self, static_cast<size_t>(n));
+    if (readlink("/proc/self/exe", self, sizeof self - 1) <= 0) return "";
+    std::string dir(self);
     dir = dir.substr(0, dir.rfind('/'));
     std::string tool = dir.substr(0, dir.rfind('/')) + "/metainfo";
     return access(tool.c_str(), X_OK) == 0 ? tool : "";
@@ -51,12 +50,9 @@ TEST(MetainfoTool, FramesListsEntriesAndReadsFramesFromTheSeekPoint) {
     EXPECT_NE(out.find("time 400 ms, size 7, key"), std::string::npos) << out;
     EXPECT_NE(out.find("9 frame(s)"), std::string::npos) << out << "frames 10..18; the last entry stays";
 
-    out.clear();
-    EXPECT_EQ(RunTool("frames '" + path + "' --stream 3", &out), 1) << out;
-    out.clear();
+    EXPECT_EQ(RunTool("frames '" + path + "' --stream 3", &out), 1);
     EXPECT_EQ(RunTool("frames", &out), 2);
     std::string rm = dir.Write("clip.rm", RmFile(RmProps(), {RmMdpr(RmStream())}));
-    out.clear();
     EXPECT_EQ(RunTool("frames '" + rm + "'", &out), 1) << "not an AVI file";
 }
 
@@ -65,7 +61,7 @@ TEST(MetainfoTool, ProbeShowsAviAndRealMedia) {
     TempDir dir;
     std::string avi = dir.Write("clip.avi", AviVideoOnly(50, 10));
     RmStream audio;
-    audio.typeSpecific = RaHeaderV4(22050, 16, 1, "cook");
+    audio.typeData = RaHeaderV4(22050, 16, 1, "cook");
     std::string rm = dir.Write("clip.rm", RmFile(RmProps(), {RmCont("Song", "", "", ""), RmMdpr(audio)}));
     std::string out;
     ASSERT_EQ(RunTool("probe '" + avi + "' '" + rm + "'", &out), 0) << out;

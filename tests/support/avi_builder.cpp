@@ -18,18 +18,36 @@ Bytes RiffList(const std::string& type, const std::vector<Bytes>& children, cons
     return Bytes().str(id).le32(static_cast<uint32_t>(body.size())).raw(body);
 }
 
-Bytes AviMainHeader(const AviMainSpec& s) {
+static Bytes AviMainHeader(const AviMainFields& s) {
     Bytes body;
     body.le32(s.microSecPerFrame).le32(0).le32(0).le32(s.flags).le32(s.totalFrames).le32(0).le32(s.streams)
         .le32(0).le32(s.width).le32(s.height).zeros(16);
     return RiffChunk("avih", body);
 }
 
-Bytes AviStreamHeader(const AviStreamSpec& s) {
+static Bytes AviStreamHeader(const AviStreamFields& s) {
     Bytes body;
     body.str(s.type).str(s.handler).le32(0).le32(0).le32(0).le32(s.scale).le32(s.rate).le32(0).le32(s.length)
         .le32(0).le32(0xFFFFFFFF).le32(s.sampleSize).zeros(8);
     return RiffChunk("strh", body);
+}
+
+AviStreamFields AviVideoStream(uint32_t scale, uint32_t rate, uint32_t length) {
+    AviStreamFields s;
+    s.scale = scale;
+    s.rate = rate;
+    s.length = length;
+    return s;
+}
+
+AviStreamFields AviAudioStream(uint32_t avgBytesPerSec, uint32_t length) {
+    AviStreamFields s;
+    s.type = "auds";
+    s.handler = std::string("\0\0\0\0", 4);
+    s.rate = avgBytesPerSec;
+    s.length = length;
+    s.sampleSize = 1;
+    return s;
 }
 
 Bytes AviVideoFormat(uint32_t width, uint32_t height, const std::string& compression, const Bytes& extra) {
@@ -46,17 +64,17 @@ Bytes AviAudioFormat(uint16_t formatTag, uint16_t channels, uint32_t sampleRate,
     return RiffChunk("strf", body);
 }
 
-Bytes AviStrl(const AviStreamSpec& shape, const Bytes& strf) {
+Bytes AviStrl(const AviStreamFields& shape, const Bytes& strf) {
     return RiffList("strl", {AviStreamHeader(shape), strf});
 }
 
-Bytes AviHdrl(const AviMainSpec& main, const std::vector<Bytes>& lists) {
+Bytes AviHdrl(const AviMainFields& main, const std::vector<Bytes>& lists) {
     std::vector<Bytes> children{AviMainHeader(main)};
     children.insert(children.end(), lists.begin(), lists.end());
     return RiffList("hdrl", children);
 }
 
-std::string AviChunkId(uint32_t stream, const std::string& type) {
+static std::string AviChunkId(uint32_t stream, const std::string& type) {
     char id[8];
     std::snprintf(id, sizeof id, "%02u", stream % 100);
     return std::string(id) + type;
@@ -79,13 +97,9 @@ std::vector<uint8_t> AviFile(const Bytes& hdrl, const std::vector<AviFrame>& fra
 }
 
 std::vector<uint8_t> AviVideoOnly(uint32_t n, uint32_t keyEvery, uint32_t scale, uint32_t rate) {
-    AviMainSpec main;
+    AviMainFields main;
     main.totalFrames = n;
-    AviStreamSpec video;
-    video.scale = scale;
-    video.rate = rate;
-    video.length = n;
-    Bytes hdrl = AviHdrl(main, {AviStrl(video, AviVideoFormat(16, 16, "FMP4"))});
+    Bytes hdrl = AviHdrl(main, {AviStrl(AviVideoStream(scale, rate, n), AviVideoFormat(16, 16, "FMP4"))});
     std::vector<AviFrame> frames;
     for (uint32_t i = 0; i < n; ++i) {
         Bytes data;
@@ -93,6 +107,18 @@ std::vector<uint8_t> AviVideoOnly(uint32_t n, uint32_t keyEvery, uint32_t scale,
         frames.push_back({0, "dc", data, keyEvery != 0 && i % keyEvery == 0 ? 0x10u : 0u});
     }
     return AviFile(hdrl, frames);
+}
+
+AviParserHandle::AviParserHandle() { CreateAVIParserObject(&p_); }
+AviParserHandle::~AviParserHandle() { FreeAVIParserObject(p_); }
+
+int32_t AviParserHandle::OpenIndexed(const std::string& path) {
+    int32_t r = p_->init(path.c_str(), nullptr);
+    if (r == MM_OK) r = p_->locateChunk("movi");
+    if (r == MM_OK) r = p_->parseMovi(p_->getFileHandle());
+    if (r == MM_OK) r = p_->locateChunk("idx1");
+    if (r == MM_OK) r = p_->parseIdx1(p_->getFileHandle());
+    return r;
 }
 
 }  // namespace testing_support

@@ -1,5 +1,7 @@
 #include "support/mp4_builder.h"
 
+#include <cstring>
+
 namespace testing_support {
 
 ByteVec Join(std::initializer_list<ByteVec> parts) {
@@ -10,10 +12,6 @@ ByteVec Join(std::initializer_list<ByteVec> parts) {
 
 ByteVec Box(const std::string& type, const ByteVec& body) {
     return Bytes().be32(static_cast<uint32_t>(8 + body.size())).str(type).raw(body).data();
-}
-
-ByteVec Box64(const std::string& type, const ByteVec& body) {
-    return Bytes().be32(1).str(type).be64(16 + body.size()).raw(body).data();
 }
 
 ByteVec FullBox(const std::string& type, uint8_t version, uint32_t flags, const ByteVec& body) {
@@ -45,7 +43,7 @@ ByteVec Mdhd(uint8_t version, uint32_t timescale, uint64_t duration, uint64_t cr
     return TimeHeader("mdhd", version, timescale, duration, creation, 4);
 }
 
-ByteVec Tkhd(uint8_t version, uint32_t width, uint32_t height) {
+static ByteVec Tkhd(uint8_t version, uint32_t width, uint32_t height) {
     Bytes b;
     b.zeros(version == 1 ? 32 : 20);  // times, track ID, reserved, duration
     b.zeros(8 + 8 + 36);              // reserved, layer/group/volume, matrix
@@ -81,9 +79,9 @@ static Bytes Descriptor(uint8_t tag, const Bytes& body) {
     return d;
 }
 
-ByteVec Esds(uint8_t objectType, uint32_t avgBitrate, const ByteVec& decoderSpecific) {
+ByteVec Esds(uint8_t objectType, uint32_t avgBitrate, const ByteVec& decoderInfo) {
     Bytes dsi;
-    if (!decoderSpecific.empty()) dsi = Descriptor(0x05, Bytes(decoderSpecific));
+    if (!decoderInfo.empty()) dsi = Descriptor(0x05, Bytes(decoderInfo));
     Bytes config;
     config.u8(objectType).u8(0x15).be24(0).be32(avgBitrate + 1000).be32(avgBitrate).raw(dsi);
     Bytes es;
@@ -119,6 +117,28 @@ ByteVec TextBox(const std::string& type, const std::string& text) {
 
 ByteVec IlstItem(const std::string& type, uint32_t dataType, const ByteVec& value) {
     return Box(type, Box("data", Bytes().be32(dataType).be32(0).raw(value)));
+}
+
+ByteVec Movie(const ByteVec& moovChildren, const ByteVec& after) {
+    return Join({Ftyp(), Box("moov", moovChildren), after});
+}
+
+Mp4ClipWalk WalkClip(const std::string& path, bool refine) {
+    metainfo::_ME_ClipInfoEx info;
+    std::memset(&info, 0, sizeof info);
+    Mp4ClipWalk walk;
+    walk.result = metainfo::MP4_GetMediaInfo(path.c_str(), metainfo::kModeClip, &info);
+    if (refine) metainfo::RefineClipInfo(&info);
+    walk.clip = info.clip;
+    if (info.tracks != nullptr) {
+        metainfo::ListNode* n = &info.tracks->link;
+        do {
+            walk.nodes.push_back(*reinterpret_cast<metainfo::MP4TrackNode*>(n));
+            n = n->next;
+        } while (n != &info.tracks->link);
+    }
+    metainfo::FreeTrackList(&info);
+    return walk;
 }
 
 }  // namespace testing_support

@@ -6,11 +6,7 @@ Bytes RmChunk(const std::string& id, const Bytes& body) {
     return Bytes().str(id).be32(static_cast<uint32_t>(body.size() + 8)).raw(body);
 }
 
-Bytes RmFileHeader(uint32_t headerCount, uint16_t fileVersion) {
-    return RmChunk(".RMF", Bytes().be16(fileVersion).be32(0).be32(headerCount));
-}
-
-Bytes RmProp(const RmProps& p) {
+static Bytes RmProp(const RmProps& p) {
     Bytes body;
     body.be16(p.version).be32(p.maxBitRate).be32(p.avgBitRate).be32(1400).be32(700).be32(100).be32(p.durationMs)
         .be32(2000).be32(0).be32(0).be16(p.numStreams).be16(0);
@@ -21,8 +17,8 @@ Bytes RmMdpr(const RmStream& s) {
     Bytes body;
     body.be16(s.version).be16(s.number).be32(s.maxBitRate).be32(s.avgBitRate).be32(1400).be32(700).be32(0)
         .be32(3000).be32(s.durationMs).u8(static_cast<uint32_t>(s.name.size())).str(s.name)
-        .u8(static_cast<uint32_t>(s.mime.size())).str(s.mime).be32(static_cast<uint32_t>(s.typeSpecific.size()))
-        .raw(s.typeSpecific);
+        .u8(static_cast<uint32_t>(s.mime.size())).str(s.mime).be32(static_cast<uint32_t>(s.typeData.size()))
+        .raw(s.typeData);
     return RmChunk("MDPR", body);
 }
 
@@ -74,7 +70,7 @@ Bytes RmMulti(uint16_t rules, const Bytes& substream) {
 
 std::vector<uint8_t> RmFile(const RmProps& props, const std::vector<Bytes>& chunks, size_t dataBytes) {
     Bytes out;
-    out.raw(RmFileHeader(static_cast<uint32_t>(chunks.size() + 3))).raw(RmProp(props));
+    out.raw(RmChunk(".RMF", Bytes().be16(0).be32(0).be32(static_cast<uint32_t>(chunks.size() + 3)))).raw(RmProp(props));
     for (const Bytes& c : chunks) out.raw(c);
     out.raw(RmChunk("DATA", Bytes().be16(0).be32(0).be32(0).zeros(dataBytes)));
     return out.data();
