@@ -50,11 +50,10 @@ BufResult CutToBuffer(const std::string& path, int start, int end) {
 
 }  // namespace
 
-// --- File variant --------------------------------------------------------
-
-// Before the audio come the 20 bytes after the first 128: byte 5 of an ADTS
-// header has the bit that the leading-tag copy tests without looking for "ID3".
-TEST(AacExtractFile, CopiesFromTheFirstSyncAtOrAfterEachOffsetWithTheEndClamped) {
+// Before the file variant's audio come the 20 bytes after the first 128: byte
+// 5 of an ADTS header has the bit that the leading-tag copy tests without
+// looking for "ID3". The buffer variant drops the frame the range end cuts.
+TEST(AacExtract, CutsAtTheFirstSyncAtOrAfterEachOffsetWithTheEndClamped) {
     TempDir dir;
     const std::vector<uint8_t> input = HundredByteFrames(100);
     const std::string path = dir.Write("in.aac", input);
@@ -62,6 +61,10 @@ TEST(AacExtractFile, CopiesFromTheFirstSyncAtOrAfterEachOffsetWithTheEndClamped)
     // 1 s -> byte 833 -> sync at 900; 4 s -> byte 3333 -> sync at 3400.
     ASSERT_EQ(MM_OK, AAC_GetAuidoData_File(path.c_str(), 1, 4, out.c_str()));
     EXPECT_EQ(Join(Slice(input, 128, 148), Slice(input, 900, 3400)), ReadFileBytes(out));
+    const BufResult r = CutToBuffer(path, 1, 4);
+    ASSERT_EQ(MM_OK, r.result);
+    EXPECT_EQ(Slice(input, 900, 3300), r.data);
+    EXPECT_TRUE(r.terminated);
     ASSERT_EQ(MM_OK, AAC_GetAuidoData_File(path.c_str(), 6, 1000, out.c_str()));
     EXPECT_EQ(Join(Slice(input, 128, 148), Slice(input, 5000, input.size())), ReadFileBytes(out));
 }
@@ -101,19 +104,6 @@ TEST(AacExtractFile, AdifFileIsCutAsRawBytes) {
     EXPECT_EQ(1, CutToBuffer(path, 1, 3).result);
 }
 
-// --- Buffer variant ------------------------------------------------------
-
-TEST(AacExtractBuf, TrimsToWholeFramesAndDropsTheLastOne) {
-    TempDir dir;
-    const std::vector<uint8_t> input = HundredByteFrames(100);
-    const BufResult r = CutToBuffer(dir.Write("in.aac", input), 1, 4);
-    ASSERT_EQ(MM_OK, r.result);
-    // Bytes 833..3333: from the sync at 900 to the last sync (3300), which
-    // starts a frame the range cuts.
-    EXPECT_EQ(Slice(input, 900, 3300), r.data);
-    EXPECT_TRUE(r.terminated);
-}
-
 // 30 small frames set the bit rate (8000 bit/s); large frames follow, so that
 // one second of bytes is shorter than a frame.
 TEST(AacExtractBuf, RangeWithOneSyncGivesNothingAndWithoutSyncIsRejected) {
@@ -142,8 +132,6 @@ TEST(AacExtractBuf, RangeOfAHundredBytesOrLessIsNotFrontTrimmed) {
     // Bytes 133..200: kept from 133 (inside a frame) up to the last sync at 192.
     EXPECT_EQ(Slice(input, 133, 192), r.data);
 }
-
-// --- Rejected ranges and handles -----------------------------------------
 
 // Handles are closed on the rejected paths as on the successful ones.
 TEST(AacExtract, RejectedRangesAnswerOneAndCloseTheirFiles) {

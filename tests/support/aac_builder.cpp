@@ -100,6 +100,8 @@ std::vector<uint8_t> AacBlock(bool stereo, int sbrExtension, size_t bytes) {
     throw std::invalid_argument("block size not reachable");
 }
 
+namespace {
+
 void PutPce(BitWriter& w, const PceLayout& p) {
     w.put(0, 4).put(static_cast<uint32_t>(p.objectType), 2).put(static_cast<uint32_t>(p.samplingIndex), 4);
     w.put(static_cast<uint32_t>(p.front.size()), 4).put(static_cast<uint32_t>(p.side.size()), 4);
@@ -117,6 +119,8 @@ void PutPce(BitWriter& w, const PceLayout& p) {
     w.put(static_cast<uint32_t>(p.comment.size()), 8);
     for (char c : p.comment) w.put(static_cast<uint8_t>(c), 8);
 }
+
+}  // namespace
 
 std::vector<uint8_t> AdifFile(const AdifLayout& s, const std::vector<uint8_t>& firstBlock) {
     BitWriter w;

@@ -53,7 +53,6 @@ struct PceLayout {
     bool monoMixdown = false;
     std::string comment;
 };
-void PutPce(BitWriter& w, const PceLayout& pce);
 
 struct AdifLayout {
     bool copyright = false;
