@@ -16,52 +16,22 @@ using metainfo::kHuffLeaf;
 
 namespace {
 
-struct TableData {
-    // book -> index -> (length, code)
-    std::map<int, std::map<int, std::pair<int, uint32_t>>> codes;
-    std::map<int, std::vector<int>> books;  // dimension, lav, signed, escape
-    std::map<int, std::vector<int>> swbLong, swbShort;
-    std::map<int, int> predSfbMax;
-};
+const std::string kTablePath = std::string(METAINFO_CORPUS_DIR) + "/../data/aac_tables.tsv";
 
-std::string TablePath() {
-#ifdef METAINFO_CORPUS_DIR
-    return std::string(METAINFO_CORPUS_DIR) + "/../data/aac_tables.tsv";
-#else
-    return "";
-#endif
-}
-
-bool LoadTables(TableData* t) {
-    std::ifstream in(TablePath());
-    if (!in) return false;
+// Each line of the data file as a kind and its numbers; codewords are hex.
+bool LoadTables(std::map<std::string, std::vector<std::vector<long>>>* rows) {
+    std::ifstream in(kTablePath);
     std::string line;
     while (std::getline(in, line)) {
         if (line.empty() || line[0] == '#') continue;
         std::istringstream cols(line);
-        std::string kind;
+        std::string kind, field;
         cols >> kind;
-        if (kind == "huffman") {
-            int book, index, length;
-            std::string hex;
-            cols >> book >> index >> length >> hex;
-            t->codes[book][index] = {length, static_cast<uint32_t>(std::stoul(hex, nullptr, 16))};
-        } else if (kind == "books") {
-            int book, v;
-            cols >> book;
-            while (cols >> v) t->books[book].push_back(v);
-        } else if (kind == "swb_long" || kind == "swb_short") {
-            int sf, num, v;
-            cols >> sf >> num;
-            auto& list = (kind == "swb_long" ? t->swbLong : t->swbShort)[sf];
-            while (cols >> v) list.push_back(v);
-        } else if (kind == "pred_sfb_max") {
-            int sf, v;
-            cols >> sf >> v;
-            t->predSfbMax[sf] = v;
-        }
+        std::vector<long> values;
+        while (cols >> field) values.push_back(std::stol(field, nullptr, kind == "huffman" && values.size() == 3 ? 16 : 10));
+        (*rows)[kind].push_back(values);
     }
-    return true;
+    return !rows->empty();
 }
 
 // Every leaf of a tree with the bits that lead to it.
@@ -82,10 +52,14 @@ void CollectLeaves(const HuffNode* tree, int nodes, int at, int length, uint32_t
 
 }  // namespace
 
-TEST(AacTables, HuffmanTreesHoldExactlyTheCodebooksOfTheTableData) {
-    TableData t;
-    if (!LoadTables(&t)) GTEST_SKIP() << "no table data at " << TablePath();
-    ASSERT_EQ(12u, t.codes.size());
+// The Huffman trees hold exactly the codebooks; book shapes, band offsets and
+// prediction limits are the listed ones.
+TEST(AacTables, CompiledTablesAreThoseOfTheTableData) {
+    std::map<std::string, std::vector<std::vector<long>>> rows;
+    if (!LoadTables(&rows)) GTEST_SKIP() << "no table data at " << kTablePath;
+    std::map<int, std::map<int, std::pair<int, uint32_t>>> codes;
+    for (const auto& r : rows["huffman"]) codes[r[0]][r[1]] = {r[2], static_cast<uint32_t>(r[3])};
+    ASSERT_EQ(12u, codes.size());
     for (int book = 0; book < 12; ++book) {
         const HuffNode* tree = book == 0 ? metainfo::hcb_sf : metainfo::hcb_table[book].tree;
         const int nodes = book == 0 ? metainfo::kScaleFactorNodes : metainfo::hcb_table[book].nodes;
@@ -93,36 +67,27 @@ TEST(AacTables, HuffmanTreesHoldExactlyTheCodebooksOfTheTableData) {
         int visited = 0;
         CollectLeaves(tree, nodes, 0, 0, 0, &leaves, &visited);
         EXPECT_EQ(nodes, visited) << "book " << book << ": every node is reached once";
-        EXPECT_EQ(t.codes[book], leaves) << "book " << book;
+        EXPECT_EQ(codes[book], leaves) << "book " << book;
     }
-}
-
-TEST(AacTables, SpectralBookShapesMatchTheTableData) {
-    TableData t;
-    if (!LoadTables(&t)) GTEST_SKIP() << "no table data at " << TablePath();
-    for (int book = 1; book <= 11; ++book) {
-        const metainfo::SpectralBook& b = metainfo::hcb_table[book];
-        const std::vector<int> expected = t.books[book];
-        ASSERT_EQ(4u, expected.size()) << book;
-        EXPECT_EQ(expected[0], b.dimension) << book;
-        EXPECT_EQ(expected[1], b.lav) << book;
-        EXPECT_EQ(expected[2] != 0, b.isSigned) << book;
-        EXPECT_EQ(expected[3] != 0, b.escape) << book;
+    ASSERT_EQ(11u, rows["books"].size());
+    for (const auto& r : rows["books"]) {
+        const metainfo::SpectralBook& b = metainfo::hcb_table[r[0]];
+        EXPECT_EQ(std::vector<long>(r.begin() + 1, r.end()),
+                  (std::vector<long>{b.dimension, b.lav, b.isSigned ? 1 : 0, b.escape ? 1 : 0}))
+            << "book " << r[0];
     }
-}
-
-TEST(AacTables, BandOffsetsAndPredictionLimitsMatchTheTableData) {
-    TableData t;
-    if (!LoadTables(&t)) GTEST_SKIP() << "no table data at " << TablePath();
-    for (int sf = 0; sf < metainfo::kSamplingIndexCount; ++sf) {
-        const int numLong = metainfo::num_swb_long_window[sf];
-        const int numShort = metainfo::num_swb_short_window[sf];
-        EXPECT_EQ(t.swbLong[sf], std::vector<int>(metainfo::swb_offset_long_window[sf],
-                                                  metainfo::swb_offset_long_window[sf] + numLong + 1))
-            << sf;
-        EXPECT_EQ(t.swbShort[sf], std::vector<int>(metainfo::swb_offset_short_window[sf],
-                                                   metainfo::swb_offset_short_window[sf] + numShort + 1))
-            << sf;
-        EXPECT_EQ(t.predSfbMax[sf], metainfo::pred_sfb_max[sf]) << sf;
+    ASSERT_EQ(static_cast<size_t>(metainfo::kSamplingIndexCount), rows["pred_sfb_max"].size());
+    for (const auto& r : rows["pred_sfb_max"]) EXPECT_EQ(r[1], metainfo::pred_sfb_max[r[0]]) << r[0];
+    for (const bool isLong : {true, false}) {
+        const auto& table = rows[isLong ? "swb_long" : "swb_short"];
+        ASSERT_EQ(static_cast<size_t>(metainfo::kSamplingIndexCount), table.size());
+        for (const auto& r : table) {
+            const int sf = static_cast<int>(r[0]);
+            const int num = isLong ? metainfo::num_swb_long_window[sf] : metainfo::num_swb_short_window[sf];
+            const uint16_t* offsets = isLong ? metainfo::swb_offset_long_window[sf] : metainfo::swb_offset_short_window[sf];
+            std::vector<long> compiled{num};
+            compiled.insert(compiled.end(), offsets, offsets + num + 1);
+            EXPECT_EQ(std::vector<long>(r.begin() + 1, r.end()), compiled) << sf << (isLong ? " long" : " short");
+        }
     }
 }

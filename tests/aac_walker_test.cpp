@@ -20,13 +20,7 @@ using metainfo::RawDataStream;
 
 namespace {
 
-struct Frame {
-    size_t offset;
-    size_t length;
-    int samplingIndex;
-    int headerSize;
-    int rawBlocks;
-};
+struct Frame { size_t offset, length; int samplingIndex, headerSize, rawBlocks; };
 
 std::vector<Frame> AdtsFramesOf(const std::vector<uint8_t>& data) {
     std::vector<Frame> frames;
@@ -71,105 +65,61 @@ std::string WalkEveryFrame(const std::vector<uint8_t>& data, size_t* walked, siz
     return failures;
 }
 
+// Walks one raw data block from its first byte.
+AacBitReader Walk(const std::vector<uint8_t>& block, int samplingIndex, uint32_t* state) {
+    AacBitReader r = MakeAacBitReader(block.data(), static_cast<int>(block.size()), 0);
+    *state = metainfo::kWalkPlain;
+    EXPECT_EQ(1, RawDataStream(&r, state, samplingIndex));
+    return r;
+}
+
 }  // namespace
 
 TEST(AacWalker, EndElementFirstReadsNothingElse) {
-    const std::vector<uint8_t> block = {0xE0, 0xFF, 0xFF};
-    AacBitReader r = MakeAacBitReader(block.data(), 3, 0);
-    uint32_t state = metainfo::kWalkPlain;
-    EXPECT_EQ(1, RawDataStream(&r, &state, 4));
+    uint32_t state;
+    const AacBitReader r = Walk({0xE0, 0xFF, 0xFF}, 4, &state);
     EXPECT_EQ(1, r.bytePos);
     EXPECT_EQ(8, r.bitCount);
     EXPECT_EQ(metainfo::kWalkPlain, state);
 }
 
-TEST(AacWalker, SbrFillElementAfterSceOrCpeSetsState) {
-    for (int ext : {13, 14}) {
-        for (bool stereo : {false, true}) {
-            const std::vector<uint8_t> block = AacBlock(stereo, ext);
-            AacBitReader r = MakeAacBitReader(block.data(), static_cast<int>(block.size()), 0);
-            uint32_t state = metainfo::kWalkPlain;
-            RawDataStream(&r, &state, 3);
-            EXPECT_EQ(metainfo::kWalkSbrFound, state) << "extension " << ext << " stereo " << stereo;
-            EXPECT_EQ(static_cast<int>(block.size()), r.bytePos);
+// After an SCE, an LFE, or a CPE with or without a common window (then two
+// independent channel streams), and a data stream element (escaped count or
+// not, aligned or not), only fill extensions 13 and 14 set the state.
+TEST(AacWalker, OnlySbrFillExtensionsSetTheState) {
+    const char* const elements[] = {"SCE", "LFE", "CPE", "CPE without common window"};
+    for (int ext : {0, 1, 11, 12, 13, 14, 15}) {
+        for (int e = 0; e < 4; ++e) {
+            BitWriter w;
+            if (e < 2) {
+                PutSilentSce(w, e == 0 ? 0 : 3);
+            } else {
+                PutSilentCpe(w, e == 2);
+            }
+            PutDataStream(w, e >= 2 ? 260 : 2, e != 1);
+            PutFill(w, ext, 3);
+            PutEnd(w);
+            uint32_t state;
+            const AacBitReader r = Walk(w.bytes(), 3, &state);
+            const bool sbr = ext == 13 || ext == 14;
+            EXPECT_EQ(sbr ? metainfo::kWalkSbrFound : metainfo::kWalkPlain, state) << ext << " " << elements[e];
+            EXPECT_EQ(static_cast<int>(w.bytes().size()), r.bytePos) << ext << " " << elements[e];
+            EXPECT_FALSE(r.exhausted);
         }
     }
 }
 
-TEST(AacWalker, OtherFillExtensionsLeaveStatePlain) {
-    for (int ext : {0, 1, 11, 12, 15}) {
-        BitWriter w;
-        PutSilentSce(w);
-        PutFill(w, ext, 3);
-        PutDataStream(w, 2, true);
-        PutEnd(w);
-        AacBitReader r = MakeAacBitReader(w.bytes().data(), static_cast<int>(w.bytes().size()), 0);
-        uint32_t state = metainfo::kWalkPlain;
-        RawDataStream(&r, &state, 4);
-        EXPECT_EQ(metainfo::kWalkPlain, state) << ext;
-        EXPECT_EQ(static_cast<int>(w.bytes().size()), r.bytePos) << ext;
-    }
-}
-
-TEST(AacWalker, PairWithoutCommonWindowWalksTwoChannelStreams) {
-    BitWriter w;
-    PutSilentCpe(w, false);
-    PutFill(w, 13, 2);
-    PutEnd(w);
-    AacBitReader r = MakeAacBitReader(w.bytes().data(), static_cast<int>(w.bytes().size()), 0);
-    uint32_t state = metainfo::kWalkPlain;
-    RawDataStream(&r, &state, 4);
-    EXPECT_EQ(metainfo::kWalkSbrFound, state);
-    EXPECT_EQ(static_cast<int>(w.bytes().size()), r.bytePos);
-    EXPECT_FALSE(r.exhausted);
-}
-
 TEST(AacWalker, MaxSfbAboveBandCountStopsElementAndWalkGoesOn) {
     BitWriter w;
-    w.put(0, 3).put(0, 4).put(100, 8);        // SCE, tag, global_gain
+    w.put(0, 3).put(0, 4).put(100, 8);           // SCE, tag, global_gain
     w.put(0, 1).put(0, 2).put(0, 1).put(63, 6);  // long window, max_sfb 63 > 49 bands at 44.1 kHz
-    PutFill(w, 13, 1);                         // read as the next element
+    PutFill(w, 13, 1);                           // read as the next element
     PutEnd(w);
-    AacBitReader r = MakeAacBitReader(w.bytes().data(), static_cast<int>(w.bytes().size()), 0);
-    metainfo::ReadBits(&r, 3);  // the element id
+    AacBitReader r = MakeAacBitReader(w.bytes().data(), static_cast<int>(w.bytes().size()), 0, 5);
     EXPECT_EQ(metainfo::kWalkMaxSfb, metainfo::single_lfe_channel_element(&r, 4));
-    r = MakeAacBitReader(w.bytes().data(), static_cast<int>(w.bytes().size()), 0);
-    uint32_t state = metainfo::kWalkPlain;
-    RawDataStream(&r, &state, 4);
+    uint32_t state;
+    Walk(w.bytes(), 4, &state);
     EXPECT_EQ(metainfo::kWalkSbrFound, state);
-}
-
-TEST(AacWalker, ReservedSamplingIndexStopsElementWithoutFault) {
-    const std::vector<uint8_t> block = AacBlock(true, 13);
-    for (int sf : {12, 13, 15}) {
-        AacBitReader r = MakeAacBitReader(block.data(), static_cast<int>(block.size()), 0);
-        uint32_t state = metainfo::kWalkPlain;
-        EXPECT_EQ(1, RawDataStream(&r, &state, sf));
-        EXPECT_LE(r.bytePos, static_cast<int>(block.size()));
-    }
-}
-
-TEST(AacWalker, ProgramConfigElementCountsPairsTwice) {
-    PceSpec pce;
-    pce.front = {false, true};  // C, L/R
-    pce.side = {true};
-    pce.back = {false};
-    pce.lfe = 1;
-    pce.assocData = 1;
-    pce.validCc = 2;
-    pce.monoMixdown = true;
-    pce.comment = "abc";
-    pce.objectType = 2;
-    BitWriter w;
-    PutPce(w, pce);
-    w.put(0xAB, 8);
-    AacBitReader r = MakeAacBitReader(w.bytes().data(), static_cast<int>(w.bytes().size()), 0);
-    uint32_t channels = 0;
-    uint32_t objectType = 0;
-    EXPECT_EQ(0, metainfo::program_config_element(&r, &channels, &objectType));
-    EXPECT_EQ(7u, channels);
-    EXPECT_EQ(2u, objectType);
-    EXPECT_EQ(static_cast<int>(w.bytes().size()) - 1, r.bytePos);
 }
 
 // A corrupt or truncated stream ends the walk at the end of the data: the
@@ -194,11 +144,9 @@ TEST(AacWalker, CorruptStreamsNeverReadPastTheData) {
 TEST(AacWalker, TruncatedRealBlocksEndAtTheCut) {
     const std::vector<uint8_t> full = AacBlock(true, 13, 40);
     for (size_t cut = 1; cut < full.size(); ++cut) {
-        std::vector<uint8_t> data(full.begin(), full.begin() + static_cast<long>(cut));
-        AacBitReader r = MakeAacBitReader(data.data(), static_cast<int>(cut), 0);
-        uint32_t state = metainfo::kWalkPlain;
-        RawDataStream(&r, &state, 4);
-        EXPECT_TRUE(r.exhausted) << cut;
+        uint32_t state;
+        EXPECT_TRUE(Walk(std::vector<uint8_t>(full.begin(), full.begin() + static_cast<long>(cut)), 4, &state).exhausted)
+            << cut;
     }
 }
 
@@ -220,11 +168,7 @@ TEST(AacWalker, CorpusStreamsWalkToEveryFrameEnd) {
 TEST(AacWalker, FfmpegStreamsWalkToEveryFrameEnd) {
     if (!HaveFfmpeg()) GTEST_SKIP() << "ffmpeg not installed";
     TempDir dir;
-    struct Case {
-        const char* name;
-        std::string input;
-        const char* options;
-    };
+    struct Case { const char* name; std::string input; const char* options; };
     const std::string clicks =
         "aevalsrc=if(lt(mod(t\\,0.25)\\,0.004)\\,0.9*sin(2*PI*3000*t)\\,0.02*random(0))"
         "|0.5*sin(2*PI*440*t)+0.3*random(1):d=2:s=";
@@ -268,9 +212,8 @@ TEST(AacWalker, ShortWindowTnsCoefficientsAreOneBitShorter) {
     for (int win = 1; win < 8; ++win) w.put(0, 1);           // no filters in the other windows
     w.put(0, 1);                                             // no gain control
     PutEnd(w);
-    AacBitReader r = MakeAacBitReader(w.bytes().data(), static_cast<int>(w.bytes().size()), 0);
-    uint32_t state = metainfo::kWalkPlain;
-    RawDataStream(&r, &state, 4);
+    uint32_t state;
+    const AacBitReader r = Walk(w.bytes(), 4, &state);
     EXPECT_TRUE(r.shortWindowTns);
     EXPECT_FALSE(r.exhausted);
     EXPECT_EQ(static_cast<int>(w.bytes().size()), r.bytePos);

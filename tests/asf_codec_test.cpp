@@ -28,21 +28,11 @@ _MM_CODECTYPE CodecOf(const std::vector<Bytes>& streams) {
 }
 
 Bytes Wma(uint16_t tag, uint32_t rate, uint32_t bitsPerSecond, int stream = 1) {
-    AsfAudio a;
-    a.formatTag = tag;
-    a.sampleRate = rate;
-    a.avgBytesPerSec = bitsPerSecond / 8;
-    a.extra = {0, 0, 0, 0, 0, 0, 0, 0, 0, 0};
-    return AsfAudioStream(stream, a);
+    return AsfAudioStream(stream, tag, rate, 2, bitsPerSecond);
 }
 
-Bytes Wmv(const std::string& fourcc, uint32_t w, uint32_t h, std::vector<uint8_t> data, int stream = 2) {
-    AsfVideo v;
-    v.width = w;
-    v.height = h;
-    v.compression = fourcc;
-    v.codecData = std::move(data);
-    return AsfVideoStream(stream, v);
+Bytes Wmv(const std::string& fourcc, uint32_t w, uint32_t h, const std::vector<uint8_t>& data, int stream = 2) {
+    return AsfVideoStream(stream, fourcc, w, h, data);
 }
 
 // STRUCT_C's first two bytes: profile, FRMRTQ_POSTPROC, BITRTQ_POSTPROC, interlace.
@@ -56,36 +46,19 @@ std::vector<uint8_t> SequenceHeader(int profile, int fps, int kbps, bool interla
 
 }  // namespace
 
-TEST(AsfAudioCodec, Wma2At44kHzAnd128kbitIsBaseline) {
-    _MM_CODECTYPE c = CodecOf({Wma(0x0161, 44100, 128000)});
-    EXPECT_EQ(c.nAudioCodec, 0x6001u);
-    EXPECT_EQ(c.nAudioProfile, 0x6010u);
-    EXPECT_EQ(c.nAudioSubType, 0u);  // cleared, never set
-    EXPECT_EQ(c.nVideoCodec, 0u);
-}
-
-TEST(AsfAudioCodec, At48kHzAnd320kbitIsFull) {
-    _MM_CODECTYPE c = CodecOf({Wma(0x0161, 48000, 320000)});
-    EXPECT_EQ(c.nAudioCodec, 0x6001u);
-    EXPECT_EQ(c.nAudioProfile, 0x6011u);
-}
-
-TEST(AsfAudioCodec, AboveSampleRateOrBitrateBoundsHasNoProfile) {
-    _MM_CODECTYPE c = CodecOf({Wma(0x0161, 49153, 128000)});
-    EXPECT_EQ(c.nAudioCodec, 0x6001u);
-    EXPECT_EQ(c.nAudioProfile, 0u);
-    EXPECT_EQ(CodecOf({Wma(0x0161, 49152, 128000)}).nAudioProfile, 0x6010u);
-    EXPECT_EQ(CodecOf({Wma(0x0161, 44100, 394240)}).nAudioProfile, 0x6011u);
-    EXPECT_EQ(CodecOf({Wma(0x0161, 44100, 394248)}).nAudioProfile, 0u);
-    EXPECT_EQ(CodecOf({Wma(0x0161, 44100, 192992)}).nAudioProfile, 0x6010u);
-    EXPECT_EQ(CodecOf({Wma(0x0161, 44100, 193000)}).nAudioProfile, 0x6011u);
-}
-
-TEST(AsfAudioCodec, Wma3AndUnknownTags) {
-    EXPECT_EQ(CodecOf({Wma(0x0162, 44100, 128000)}).nAudioCodec, 0x6002u);
-    _MM_CODECTYPE unknown = CodecOf({Wma(0x0163, 44100, 128000)});
-    EXPECT_EQ(unknown.nAudioCodec, 0u);
-    EXPECT_EQ(unknown.nAudioProfile, 0u);
+TEST(AsfAudioCodec, FormatTagGivesTheCodecAndRateAndBitrateTheProfile) {
+    struct Case { uint16_t tag; uint32_t rate, bitsPerSecond, codec, profile; };
+    for (const Case& c : {Case{0x0161, 44100, 128000, 0x6001, 0x6010}, Case{0x0161, 48000, 320000, 0x6001, 0x6011},
+                          Case{0x0161, 49153, 128000, 0x6001, 0}, Case{0x0161, 49152, 128000, 0x6001, 0x6010},
+                          Case{0x0161, 44100, 192992, 0x6001, 0x6010}, Case{0x0161, 44100, 193000, 0x6001, 0x6011},
+                          Case{0x0161, 44100, 394240, 0x6001, 0x6011}, Case{0x0161, 44100, 394248, 0x6001, 0},
+                          Case{0x0162, 44100, 128000, 0x6002, 0x6010}, Case{0x0163, 44100, 128000, 0, 0}}) {
+        const _MM_CODECTYPE codec = CodecOf({Wma(c.tag, c.rate, c.bitsPerSecond)});
+        EXPECT_EQ(codec.nAudioCodec, c.codec) << c.tag << " " << c.rate << " " << c.bitsPerSecond;
+        EXPECT_EQ(codec.nAudioProfile, c.profile) << c.tag << " " << c.rate << " " << c.bitsPerSecond;
+        EXPECT_EQ(codec.nAudioSubType, 0u);  // cleared, never set
+        EXPECT_EQ(codec.nVideoCodec, 0u);
+    }
 }
 
 TEST(AsfAudioCodec, FirstCodecStaysAndLaterStreamsOverwriteTheProfile) {
@@ -98,53 +71,31 @@ TEST(AsfAudioCodec, FirstCodecStaysAndLaterStreamsOverwriteTheProfile) {
     EXPECT_EQ(c.nAudioProfile, 0x6010u);
 }
 
-TEST(AsfVideoCodec, Wmv3SimpleProfileLevels) {
-    // 14 fps, 96 kbps: LOW at 176x144, MEDIUM at 320x240.
-    _MM_CODECTYPE c = CodecOf({Wmv("WMV3", 176, 144, SequenceHeader(0, 14, 96, false))});
-    EXPECT_EQ(c.nVideoCodec, 0x5003u);
-    EXPECT_EQ(c.nVideoProfile, 0x5010u);
-    EXPECT_EQ(c.nVideoLevel, kLow);
-    c = CodecOf({Wmv("WMV3", 320, 240, SequenceHeader(0, 14, 96, false))});
-    EXPECT_EQ(c.nVideoLevel, kMedium);
+// Profile 2 is forbidden: only the codec is set. The sequence header has no
+// 24 fps; 22 fps is just as slow.
+TEST(AsfVideoCodec, Wmv3SequenceHeaderGivesProfileAndLevel) {
+    struct Case { int profile, fps, kbps; bool interlaced; uint32_t w, h, videoProfile, level; };
+    for (const Case& c : {Case{0, 14, 96, false, 176, 144, 0x5010, kLow}, Case{0, 14, 96, false, 320, 240, 0x5010, kMedium},
+                          Case{1, 30, 2016, false, 1280, 720, 0x5011, kHigh}, Case{1, 30, 2016, true, 1280, 720, 0x5011, 0},
+                          Case{3, 30, 1000, false, 1920, 1080, 0x5012, kL4}, Case{3, 22, 1000, false, 1920, 1080, 0x5012, kL3},
+                          Case{2, 14, 96, false, 176, 144, 0, 0}}) {
+        const _MM_CODECTYPE codec = CodecOf({Wmv("WMV3", c.w, c.h, SequenceHeader(c.profile, c.fps, c.kbps, c.interlaced))});
+        EXPECT_EQ(codec.nVideoCodec, 0x5003u);
+        EXPECT_EQ(codec.nVideoProfile, c.videoProfile) << c.profile << " " << c.w;
+        EXPECT_EQ(codec.nVideoLevel, c.level) << c.profile << " " << c.w << " " << c.fps << " " << c.interlaced;
+    }
 }
 
-TEST(AsfVideoCodec, Wmv3MainProfileLevels) {
-    _MM_CODECTYPE c = CodecOf({Wmv("WMV3", 1280, 720, SequenceHeader(1, 30, 2016, false))});
-    EXPECT_EQ(c.nVideoProfile, 0x5011u);
-    EXPECT_EQ(c.nVideoLevel, kHigh);
-    c = CodecOf({Wmv("WMV3", 1280, 720, SequenceHeader(1, 30, 2016, true))});
-    EXPECT_EQ(c.nVideoProfile, 0x5011u);
-    EXPECT_EQ(c.nVideoLevel, 0u);
-}
-
-TEST(AsfVideoCodec, Wmv3AdvancedProfileLevels) {
-    _MM_CODECTYPE c = CodecOf({Wmv("WMV3", 1920, 1080, SequenceHeader(3, 30, 1000, false))});
-    EXPECT_EQ(c.nVideoProfile, 0x5012u);
-    EXPECT_EQ(c.nVideoLevel, kL4);
-    // The sequence header has no 24 fps; 22 fps is just as slow.
-    c = CodecOf({Wmv("WMV3", 1920, 1080, SequenceHeader(3, 22, 1000, false))});
-    EXPECT_EQ(c.nVideoLevel, kL3);
-}
-
-TEST(AsfVideoCodec, Wmv3ForbiddenProfileSetsOnlyTheCodec) {
-    _MM_CODECTYPE c = CodecOf({Wmv("WMV3", 176, 144, SequenceHeader(2, 14, 96, false))});
-    EXPECT_EQ(c.nVideoCodec, 0x5003u);
-    EXPECT_EQ(c.nVideoProfile, 0u);
-    EXPECT_EQ(c.nVideoLevel, 0u);
-}
-
-TEST(AsfVideoCodec, Wmv1IsOnlyRecognisedWithoutCodecData) {
-    EXPECT_EQ(CodecOf({Wmv("WMV1", 176, 144, {})}).nVideoCodec, 0x5001u);
-    EXPECT_EQ(CodecOf({Wmv("WMV1", 176, 144, {0})}).nVideoCodec, 0x5001u);
-    EXPECT_EQ(CodecOf({Wmv("WMV1", 176, 144, {1, 2, 3, 4})}).nVideoCodec, 0u);
-}
-
-TEST(AsfVideoCodec, OtherCompressionCodes) {
+// WMV1, MP42 and MP43 are recognised only without codec data, WMV2 only with it.
+TEST(AsfVideoCodec, CompressionCodesAndCodecDataLength) {
+    const std::pair<const char*, std::vector<uint8_t>> none[] = {{"WMV1", {}}, {"WMV1", {0}}, {"WMV2", {}},
+                                                                 {"MP42", {}}, {"MP43", {}}, {"WVC1", {}}};
+    const uint32_t noneCodes[] = {0x5001, 0x5001, 0xFFFF, 0x4001, 0x4001, 0xFFFF};
+    for (size_t i = 0; i < 6; ++i) {
+        EXPECT_EQ(CodecOf({Wmv(none[i].first, 176, 144, none[i].second)}).nVideoCodec, noneCodes[i]) << none[i].first;
+    }
     EXPECT_EQ(CodecOf({Wmv("WMV2", 176, 144, {0x10, 0, 0, 0})}).nVideoCodec, 0x5002u);
-    EXPECT_EQ(CodecOf({Wmv("WMV2", 176, 144, {})}).nVideoCodec, 0xFFFFu);
-    EXPECT_EQ(CodecOf({Wmv("MP42", 176, 144, {})}).nVideoCodec, 0x4001u);
-    EXPECT_EQ(CodecOf({Wmv("MP43", 176, 144, {})}).nVideoCodec, 0x4001u);
-    EXPECT_EQ(CodecOf({Wmv("WVC1", 176, 144, {})}).nVideoCodec, 0xFFFFu);
+    EXPECT_EQ(CodecOf({Wmv("WMV1", 176, 144, {1, 2, 3, 4})}).nVideoCodec, 0u);
     EXPECT_EQ(CodecOf({Wmv("WVC1", 176, 144, {0x25, 0, 0, 1, 0x0F})}).nVideoCodec, 0u);
 }
 
@@ -157,12 +108,6 @@ TEST(AsfVideoCodec, FirstWmvStreamDecidesButALaterStreamWithoutDataOverwritesThe
     EXPECT_EQ(c.nVideoCodec, 0x4001u);
     EXPECT_EQ(c.nVideoProfile, 0x5010u);
     EXPECT_EQ(c.nVideoLevel, kLow);
-}
-
-TEST(AsfVideoCodec, AudioAndVideoStreamsTogether) {
-    _MM_CODECTYPE c = CodecOf({Wma(0x0161, 44100, 128000, 1), Wmv("WMV2", 176, 144, {0, 0, 0, 0}, 2)});
-    EXPECT_EQ(c.nAudioCodec, 0x6001u);
-    EXPECT_EQ(c.nVideoCodec, 0x5002u);
 }
 
 TEST(AsfVideoCodec, OtherStreamTypesLandThirtyEightBytesPastTheirEnd) {

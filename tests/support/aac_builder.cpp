@@ -100,7 +100,9 @@ std::vector<uint8_t> AacBlock(bool stereo, int sbrExtension, size_t bytes) {
     throw std::invalid_argument("block size not reachable");
 }
 
-void PutPce(BitWriter& w, const PceSpec& p) {
+namespace {
+
+void PutPce(BitWriter& w, const PceLayout& p) {
     w.put(0, 4).put(static_cast<uint32_t>(p.objectType), 2).put(static_cast<uint32_t>(p.samplingIndex), 4);
     w.put(static_cast<uint32_t>(p.front.size()), 4).put(static_cast<uint32_t>(p.side.size()), 4);
     w.put(static_cast<uint32_t>(p.back.size()), 4).put(static_cast<uint32_t>(p.lfe), 2);
@@ -118,7 +120,9 @@ void PutPce(BitWriter& w, const PceSpec& p) {
     for (char c : p.comment) w.put(static_cast<uint8_t>(c), 8);
 }
 
-std::vector<uint8_t> AdifFile(const AdifSpec& s, const std::vector<uint8_t>& firstBlock) {
+}  // namespace
+
+std::vector<uint8_t> AdifFile(const AdifLayout& s, const std::vector<uint8_t>& firstBlock) {
     BitWriter w;
     for (char c : std::string("ADIF")) w.put(static_cast<uint8_t>(c), 8);
     w.put(s.copyright ? 1 : 0, 1);
@@ -129,7 +133,7 @@ std::vector<uint8_t> AdifFile(const AdifSpec& s, const std::vector<uint8_t>& fir
     w.put(s.variableRate ? 1 : 0, 1);
     w.put(s.bitrate, 23);
     w.put(static_cast<uint32_t>(s.pces.size() - 1), 4);
-    for (const PceSpec& pce : s.pces) {
+    for (const PceLayout& pce : s.pces) {
         if (!s.variableRate) w.put(s.bufferFullness, 20);
         PutPce(w, pce);
     }
@@ -148,6 +152,19 @@ std::vector<uint8_t> AdtsFrames(const AdtsSpec& layout, const std::vector<size_t
         out.insert(out.end(), frame.begin(), frame.end());
     }
     return out;
+}
+
+AdtsSpec AdtsLayout(int samplingIndex, int channelConfig, int profile) {
+    AdtsSpec s;
+    s.samplingIndex = samplingIndex;
+    s.channelConfig = channelConfig;
+    s.profile = profile;
+    return s;
+}
+
+std::vector<uint8_t> Join(std::vector<uint8_t> a, const std::vector<uint8_t>& b) {
+    a.insert(a.end(), b.begin(), b.end());
+    return a;
 }
 
 }  // namespace testing_support

@@ -41,7 +41,7 @@ void PutEnd(BitWriter& w);
 std::vector<uint8_t> AacBlock(bool stereo, int sbrExtension = 0, size_t bytes = 0);
 
 // One program_config_element.
-struct PceSpec {
+struct PceLayout {
     int objectType = 1;
     int samplingIndex = 4;
     std::vector<bool> front;  // is_cpe of each front element
@@ -53,19 +53,21 @@ struct PceSpec {
     bool monoMixdown = false;
     std::string comment;
 };
-void PutPce(BitWriter& w, const PceSpec& pce);
 
-struct AdifSpec {
+struct AdifLayout {
     bool copyright = false;
     bool variableRate = false;
     uint32_t bitrate = 128000;  // 23 bits
     uint32_t bufferFullness = 0;
-    std::vector<PceSpec> pces{PceSpec{}};
+    std::vector<PceLayout> pces{PceLayout{}};
 };
 // The ADIF header, its program configuration elements and the first raw data block.
-std::vector<uint8_t> AdifFile(const AdifSpec& layout, const std::vector<uint8_t>& firstBlock);
+std::vector<uint8_t> AdifFile(const AdifLayout& layout, const std::vector<uint8_t>& firstBlock);
 
 // ADTS frames, one per entry of sizes (each at least 18 bytes: 7 header + 11 block).
 std::vector<uint8_t> AdtsFrames(const AdtsSpec& layout, const std::vector<size_t>& sizes, int sbrExtension = 0);
+AdtsSpec AdtsLayout(int samplingIndex, int channelConfig, int profile = 1);
+
+std::vector<uint8_t> Join(std::vector<uint8_t> a, const std::vector<uint8_t>& b);
 
 }  // namespace testing_support

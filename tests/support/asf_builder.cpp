@@ -5,28 +5,6 @@
 
 namespace testing_support {
 
-namespace asf_guid {
-const char* const kHeader = "75B22630-668E-11CF-A6D9-00AA0062CE6C";
-const char* const kFileProperties = "8CABDCA1-A947-11CF-8EE4-00C00C205365";
-const char* const kStreamProperties = "B7DC0791-A9B7-11CF-8EE6-00C00C205365";
-const char* const kHeaderExtension = "5FBF03B5-A92E-11CF-8EE3-00C00C205365";
-const char* const kContentDescription = "75B22633-668E-11CF-A6D9-00AA0062CE6C";
-const char* const kExtContentDescription = "D2D0A440-E307-11D2-97F0-00A0C95EA850";
-const char* const kContentBranding = "2211B3FA-BD23-11D2-B4B7-00A0C955FC6E";
-const char* const kStreamBitrate = "7BF875CE-468D-11D1-8D82-006097C9A2B2";
-const char* const kExtStreamProperties = "14E6A5CB-C672-4332-8399-A96952065B5A";
-const char* const kMetadata = "C5F8CBEA-5BAF-4877-8467-AA8C44FA4CCA";
-const char* const kMetadataLibrary = "44231C94-9498-49D1-A141-1D134E457054";
-const char* const kPadding = "1806D474-CADF-4509-A4BA-9AABCB96AAE8";
-const char* const kAudio = "F8699E40-5B4D-11CF-A8FD-00805F5C442B";
-const char* const kVideo = "BC19EFC0-5B4D-11CF-A8FD-00805F5C442B";
-const char* const kCommand = "59DACFC0-59E6-11D0-A3AC-00A0C90348F6";
-const char* const kJfif = "B61BE100-5B4E-11CF-A8FD-00805F5C442B";
-const char* const kDegradableJpeg = "35907DE0-E415-11CF-A917-00805F5C442B";
-const char* const kFileTransfer = "91BD222C-F21C-497A-8B6D-5AA86BFC0185";
-const char* const kBinary = "3AFB65E2-47EF-40F2-AC2C-70A90D71D343";
-}  // namespace asf_guid
-
 Bytes AsfGuid(const char* text) {
     std::string hex;
     for (const char* p = text; *p != '\0'; ++p) {
@@ -82,23 +60,23 @@ Bytes AsfStreamProperties(const char* typeGuid, int streamNumber, const Bytes& t
     return AsfObject(asf_guid::kStreamProperties, b);
 }
 
-Bytes AsfAudioStream(int streamNumber, const AsfAudio& a) {
+Bytes AsfAudioStream(int streamNumber, uint16_t formatTag, uint32_t sampleRate, uint16_t channels,
+                     uint32_t bitsPerSecond, uint16_t bitsPerSample) {
     Bytes w;
-    w.le16(a.formatTag).le16(a.channels).le32(a.sampleRate).le32(a.avgBytesPerSec);
-    w.le16(a.blockAlign).le16(a.bitsPerSample).le16(static_cast<uint32_t>(a.extra.size()));
-    w.raw(a.extra);
+    w.le16(formatTag).le16(channels).le32(sampleRate).le32(bitsPerSecond / 8);
+    w.le16(2973).le16(bitsPerSample).le16(10).zeros(10);
     return AsfStreamProperties(asf_guid::kAudio, streamNumber, w);
 }
 
-Bytes AsfVideoStream(int streamNumber, const AsfVideo& v) {
+Bytes AsfVideoStream(int streamNumber, const std::string& compression, uint32_t width, uint32_t height,
+                     const std::vector<uint8_t>& codecData) {
+    const uint32_t formatSize = static_cast<uint32_t>(40 + codecData.size());
     Bytes t;
-    t.le32(v.width).le32(v.height).u8(2);
-    t.le16(static_cast<uint32_t>(40 + v.codecData.size()));
-    t.le32(static_cast<uint32_t>(40 + v.codecData.size()));  // BITMAPINFOHEADER size
-    t.le32(v.width).le32(v.height).le16(1).le16(24);
-    t.str(v.compression.substr(0, 4));
-    t.le32(v.width * v.height * 3).le32(0).le32(0).le32(0).le32(0);
-    t.raw(v.codecData);
+    t.le32(width).le32(height).u8(2).le16(formatSize);
+    t.le32(formatSize).le32(width).le32(height).le16(1).le16(24);  // BITMAPINFOHEADER
+    t.str(compression.substr(0, 4));
+    t.le32(width * height * 3).le32(0).le32(0).le32(0).le32(0);
+    t.raw(codecData);
     return AsfStreamProperties(asf_guid::kVideo, streamNumber, t);
 }
 

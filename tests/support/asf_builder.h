@@ -11,25 +11,25 @@ namespace testing_support {
 
 // GUIDs as the ASF standard writes them.
 namespace asf_guid {
-extern const char* const kHeader;
-extern const char* const kFileProperties;
-extern const char* const kStreamProperties;
-extern const char* const kHeaderExtension;
-extern const char* const kContentDescription;
-extern const char* const kExtContentDescription;
-extern const char* const kContentBranding;
-extern const char* const kStreamBitrate;
-extern const char* const kExtStreamProperties;
-extern const char* const kMetadata;
-extern const char* const kMetadataLibrary;
-extern const char* const kPadding;
-extern const char* const kAudio;
-extern const char* const kVideo;
-extern const char* const kCommand;
-extern const char* const kJfif;
-extern const char* const kDegradableJpeg;
-extern const char* const kFileTransfer;
-extern const char* const kBinary;
+inline constexpr const char* kHeader = "75B22630-668E-11CF-A6D9-00AA0062CE6C";
+inline constexpr const char* kFileProperties = "8CABDCA1-A947-11CF-8EE4-00C00C205365";
+inline constexpr const char* kStreamProperties = "B7DC0791-A9B7-11CF-8EE6-00C00C205365";
+inline constexpr const char* kHeaderExtension = "5FBF03B5-A92E-11CF-8EE3-00C00C205365";
+inline constexpr const char* kContentDescription = "75B22633-668E-11CF-A6D9-00AA0062CE6C";
+inline constexpr const char* kExtContentDescription = "D2D0A440-E307-11D2-97F0-00A0C95EA850";
+inline constexpr const char* kContentBranding = "2211B3FA-BD23-11D2-B4B7-00A0C955FC6E";
+inline constexpr const char* kStreamBitrate = "7BF875CE-468D-11D1-8D82-006097C9A2B2";
+inline constexpr const char* kExtStreamProperties = "14E6A5CB-C672-4332-8399-A96952065B5A";
+inline constexpr const char* kMetadata = "C5F8CBEA-5BAF-4877-8467-AA8C44FA4CCA";
+inline constexpr const char* kMetadataLibrary = "44231C94-9498-49D1-A141-1D134E457054";
+inline constexpr const char* kPadding = "1806D474-CADF-4509-A4BA-9AABCB96AAE8";
+inline constexpr const char* kAudio = "F8699E40-5B4D-11CF-A8FD-00805F5C442B";
+inline constexpr const char* kVideo = "BC19EFC0-5B4D-11CF-A8FD-00805F5C442B";
+inline constexpr const char* kCommand = "59DACFC0-59E6-11D0-A3AC-00A0C90348F6";
+inline constexpr const char* kJfif = "B61BE100-5B4E-11CF-A8FD-00805F5C442B";
+inline constexpr const char* kDegradableJpeg = "35907DE0-E415-11CF-A917-00805F5C442B";
+inline constexpr const char* kFileTransfer = "91BD222C-F21C-497A-8B6D-5AA86BFC0185";
+inline constexpr const char* kBinary = "3AFB65E2-47EF-40F2-AC2C-70A90D71D343";
 }  // namespace asf_guid
 
 // The 16 bytes of a GUID given as text ("75B22630-668E-11CF-A6D9-00AA0062CE6C").
@@ -43,24 +43,13 @@ Bytes AsfHeader(const std::vector<Bytes>& objects, int64_t count = -1);
 // Durations in 100-ns units, preroll in milliseconds.
 Bytes AsfFileProperties(uint64_t fileSize, uint64_t playDuration, uint64_t preroll, uint32_t maxBitrate);
 
-struct AsfAudio {
-    uint16_t formatTag = 0x0161;
-    uint16_t channels = 2;
-    uint32_t sampleRate = 44100;
-    uint32_t avgBytesPerSec = 16000;
-    uint16_t blockAlign = 2973;
-    uint16_t bitsPerSample = 16;
-    std::vector<uint8_t> extra;  // codec-specific bytes after the WAVEFORMATEX
-};
-struct AsfVideo {
-    uint32_t width = 176;
-    uint32_t height = 144;
-    std::string compression = "WMV3";
-    std::vector<uint8_t> codecData;
-};
 Bytes AsfStreamProperties(const char* typeGuid, int streamNumber, const Bytes& typeSpecific);
-Bytes AsfAudioStream(int streamNumber, const AsfAudio& audio);
-Bytes AsfVideoStream(int streamNumber, const AsfVideo& video);
+// WAVEFORMATEX with 10 bytes of codec-specific data.
+Bytes AsfAudioStream(int streamNumber, uint16_t formatTag, uint32_t sampleRate, uint16_t channels,
+                     uint32_t bitsPerSecond, uint16_t bitsPerSample = 16);
+// BITMAPINFOHEADER and the codec-specific data.
+Bytes AsfVideoStream(int streamNumber, const std::string& compression, uint32_t width, uint32_t height,
+                     const std::vector<uint8_t>& codecData = {0, 0, 0, 0});
 Bytes AsfStreamBitrates(const std::vector<std::pair<int, uint32_t>>& rates);
 Bytes AsfHeaderExtension(const std::vector<Bytes>& inner, int64_t dataSize = -1);
 Bytes AsfExtStreamProperties(int streamNumber, uint64_t avgTimePerFrame);
