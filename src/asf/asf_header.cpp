@@ -313,11 +313,7 @@ int32_t ASF_ParseExtStreamPropertyObj(int h, _MMClipInfo* clip, uint32_t videoSt
 int32_t ASF_GetClipInfo(const char* path, _MMClipInfo* clip) {
     int32_t result = ASF_GetMediaInfo(path, kAsfModeClip, clip, 0);
     if (result != 0) return result;
-    char ext[12] = {};
-    if (GetFileExtension(path, ext) != 0) return MM_E_FAIL;
-    // The record was zeroed by the walk, so the copy stays terminated.
-    std::strncpy(clip->szFormat, ext + 1, sizeof clip->szFormat - 1);
-    return 0;
+    return CopyExtensionAsFormat(path, clip->szFormat);
 }
 
 int32_t ASF_GetTrackType(const char* path, int* mask) {

@@ -174,13 +174,7 @@ int32_t CAVIParser::init(const char* path, _MMClipInfo* clip) {
         clip->nHeight = pVideoFormat->biHeight;
         if (seconds != 0) clip->nFrameRate = mainHeader.dwTotalFrames / seconds;
     }
-    char ext[10] = {};
-    if (GetFileExtension(path, ext) != 0) return MM_E_FAIL;
-    size_t len = strnlen(ext, sizeof ext);
-    size_t copy = len > 0 ? len - 1 : 0;
-    if (copy > sizeof clip->szFormat - 1) copy = sizeof clip->szFormat - 1;
-    std::memcpy(clip->szFormat, ext + 1, copy);
-    clip->szFormat[copy] = '\0';
+    if (CopyExtensionAsFormat(path, clip->szFormat) != MM_OK) return MM_E_FAIL;
     return result;
 }
 

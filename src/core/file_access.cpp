@@ -10,6 +10,7 @@
 #include "core/byte_reader.h"
 #include "core/drm.h"
 #include "core/log.h"
+#include "metainfo/records.h"
 
 namespace metainfo {
 namespace {
@@ -266,6 +267,15 @@ int GetFileExtension(const char* path, char* ext) {
     if (dot == nullptr) return 1;
     std::memcpy(ext, dot, strnlen(dot, 9));
     return 0;
+}
+
+int32_t CopyExtensionAsFormat(const char* path, char* szFormat) {
+    char ext[10] = {0};
+    if (GetFileExtension(path, ext) != 0) return MM_E_FAIL;
+    const size_t n = strnlen(ext + 1, sizeof ext - 1);
+    std::memcpy(szFormat, ext + 1, n);
+    szFormat[n] = '\0';
+    return MM_OK;
 }
 
 }  // namespace metainfo

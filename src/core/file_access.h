@@ -35,6 +35,10 @@ uint32_t GetUINT32(int h, bool bLittle);
 // 0 when found, 1 when the path has no dot.
 int GetFileExtension(const char* path, char* ext);
 
+// Writes the path's extension without its dot, terminated, as a clip's
+// container name (szFormat, 128 bytes). 0, or MM_E_FAIL without an extension.
+int32_t CopyExtensionAsFormat(const char* path, char* szFormat);
+
 // Closes a handle when the scope ends.
 class FileCloser {
 public:

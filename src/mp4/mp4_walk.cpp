@@ -326,15 +326,7 @@ int32_t MP4_GetClipInfo(const char* path, _MMClipInfo* clip) {
     if (result == MM_OK) {
         RefineClipInfo(&info);
         std::memcpy(clip, &info.clip, sizeof *clip);
-        char ext[10] = {0};
-        if (GetFileExtension(path, ext) == 0) {
-            std::memset(clip->szFormat, 0, sizeof clip->szFormat);
-            size_t n = std::strlen(ext + 1);
-            if (n > sizeof clip->szFormat - 1) n = sizeof clip->szFormat - 1;
-            std::memcpy(clip->szFormat, ext + 1, n);
-        } else {
-            result = MM_E_FAIL;
-        }
+        result = CopyExtensionAsFormat(path, clip->szFormat);
     }
     FreeTrackList(&info);
     return result;

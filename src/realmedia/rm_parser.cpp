@@ -263,14 +263,7 @@ int32_t RM_GetClipInfo(const char* path, _MMClipInfo* clip) {
     if (r != 0) return r;
     struct stat st;
     if (MEx_stat(path, &st) == 0) clip->nFileSize = static_cast<uint32_t>(st.st_size);
-    char ext[10] = {};
-    if (GetFileExtension(path, ext) != 0) return MM_E_FAIL;
-    size_t len = strnlen(ext, sizeof ext);
-    size_t copy = len > 0 ? len - 1 : 0;
-    if (copy > sizeof clip->szFormat - 1) copy = sizeof clip->szFormat - 1;
-    std::memcpy(clip->szFormat, ext + 1, copy);
-    clip->szFormat[copy] = '\0';
-    return 0;
+    return CopyExtensionAsFormat(path, clip->szFormat);
 }
 
 }  // namespace metainfo

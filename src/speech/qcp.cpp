@@ -101,14 +101,6 @@ int32_t parseData(int h, _MMClipInfo* clip, uint64_t chunkStart, uint64_t fileSi
 
 }  // namespace
 
-int32_t CopyExtensionAsFormat(const char* path, char* szFormat) {
-    char ext[10] = {};
-    if (GetFileExtension(path, ext) != 0) return MM_E_FAIL;
-    std::strncpy(szFormat, ext + 1, 127);
-    szFormat[127] = '\0';
-    return MM_OK;
-}
-
 int32_t QCP_GetMediaInfo(const char* path, int request, void* out) {
     if (path == nullptr || out == nullptr) return MM_E_INVALIDARG;
     if (request != INFO_CLIPINFO && request != INFO_CODECTYPE) return MM_E_FAIL;

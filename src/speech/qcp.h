@@ -15,8 +15,5 @@ int32_t QCP_GetClipInfo(const char* path, _MMClipInfo* clip);
 int32_t QCP_GetCodecType(const char* path, _MM_CODECTYPE* codec);
 int32_t QCP_GetTrackType(const char* path, int* mask);
 
-// Writes the path's extension without its dot into szFormat (128 bytes).
-// 0, or 0x80004005 when the path has no extension.
-int32_t CopyExtensionAsFormat(const char* path, char* szFormat);
 
 }  // namespace metainfo
