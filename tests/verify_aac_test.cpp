@@ -11,7 +11,7 @@
 
 using namespace metainfo;
 using testing_support::AdtsFrame;
-using testing_support::AdtsSpec;
+using testing_support::AdtsFields;
 using testing_support::Bytes;
 using testing_support::TempDir;
 
@@ -28,7 +28,7 @@ int32_t Verify(const std::vector<uint8_t>& bytes) {
     return result;
 }
 
-Bytes Frames(int count, const AdtsSpec& shape = {}) {
+Bytes Frames(int count, const AdtsFields& shape = {}) {
     Bytes b;
     for (int i = 0; i < count; ++i) b.raw(AdtsFrame(shape, testing_support::SilentAacBlock()));
     return b;
@@ -57,7 +57,7 @@ TEST(AACGetFrameSize, ReadsLengthAndKindAndRejectsLongOrMissingFrames) {
     const uint8_t noSync[] = {0xFF, 0xE1, 0, 0, 0, 0};
     EXPECT_EQ(AACGetFrameSize(noSync, &kind), static_cast<uint32_t>(MM_E_FAIL));
 
-    AdtsSpec shape;
+    AdtsFields shape;
     shape.profile = 2;
     shape.mpegId = 1;
     std::vector<uint8_t> frame = AdtsFrame(shape, std::vector<uint8_t>(100));
@@ -73,10 +73,10 @@ TEST(VerifyAAC, NeedsTwoMatchingAdtsHeadersOrAnAdifSignature) {
     EXPECT_EQ(Verify(Bytes().zeros(50).raw(Frames(3))), MM_OK);
     EXPECT_EQ(Verify(Bytes().zeros(30).str("ADIF").zeros(30)), MM_OK) << "ADIF is accepted where it is met";
 
-    AdtsSpec main;
+    AdtsFields main;
     main.profile = 0;
     EXPECT_EQ(Verify(Bytes().raw(Frames(1)).raw(Frames(2, main))), MM_E_UNSUPPORTED);
-    AdtsSpec mpeg2;
+    AdtsFields mpeg2;
     mpeg2.mpegId = 1;
     EXPECT_EQ(Verify(Bytes().raw(Frames(1)).raw(Frames(2, mpeg2))), MM_E_UNSUPPORTED);
     EXPECT_EQ(Verify(Bytes().zeros(200)), MM_E_UNSUPPORTED);

@@ -14,18 +14,18 @@ using namespace metainfo;
 using testing_support::Bytes;
 using testing_support::Id3v2Tag;
 using testing_support::Mp3Frame;
-using testing_support::Mp3FrameSpec;
+using testing_support::Mp3FrameLayout;
 using testing_support::Mp3Header;
 using testing_support::TempDir;
 
 namespace {
 
-int32_t FrameSize(const Mp3FrameSpec& shape, uint32_t* signature = nullptr, _FrameHeader_Info* info = nullptr) {
+int32_t FrameSize(const Mp3FrameLayout& shape, uint32_t* signature = nullptr, _FrameHeader_Info* info = nullptr) {
     uint32_t sig = 0;
     return MP3GetFrameSize(Mp3Header(shape).data(), signature != nullptr ? signature : &sig, info);
 }
 
-Bytes Frames(int count, const Mp3FrameSpec& shape = {}) {
+Bytes Frames(int count, const Mp3FrameLayout& shape = {}) {
     Bytes b;
     for (int i = 0; i < count; ++i) b.raw(Mp3Frame(shape));
     return b;
@@ -45,20 +45,20 @@ void WithFile(const std::vector<uint8_t>& bytes, F f) {
 
 TEST(MP3GetFrameSize, ComputesSizesPerVersionAndLayer) {
     EXPECT_EQ(FrameSize({}), 417);  // MPEG-1 Layer III 128 kbit/s 44.1 kHz
-    Mp3FrameSpec padded;
+    Mp3FrameLayout padded;
     padded.padding = 1;
     EXPECT_EQ(FrameSize(padded), 418);
-    Mp3FrameSpec layer1;
+    Mp3FrameLayout layer1;
     layer1.layer = 1;
     layer1.bitrateIndex = 1;  // 32 kbit/s
     layer1.samplingIndex = 1; // 48 kHz
     layer1.padding = 1;
     EXPECT_EQ(FrameSize(layer1), (32000 * 12 / 48000 + 1) * 4);
-    Mp3FrameSpec mpeg2;
+    Mp3FrameLayout mpeg2;
     mpeg2.version = 2;
     mpeg2.bitrateIndex = 8;   // 64 kbit/s
     EXPECT_EQ(FrameSize(mpeg2), 64000 * 72 / 22050);
-    Mp3FrameSpec mpeg25;
+    Mp3FrameLayout mpeg25;
     mpeg25.version = 0;
     mpeg25.bitrateIndex = 1;  // 8 kbit/s
     mpeg25.samplingIndex = 2; // 8 kHz
@@ -66,7 +66,7 @@ TEST(MP3GetFrameSize, ComputesSizesPerVersionAndLayer) {
 }
 
 TEST(MP3GetFrameSize, RecordsTheHeaderFieldsAndSignature) {
-    Mp3FrameSpec shape;
+    Mp3FrameLayout shape;
     shape.version = 2;
     shape.layer = 2;
     shape.samplingIndex = 1;
@@ -144,7 +144,7 @@ TEST(VerifyMP3, AcceptsTwoConsecutiveFramesAndReportsTheFirst) {
 }
 
 TEST(VerifyMP3, AFirstPairWithDifferentSamplingRatesRejectsTheFile) {
-    Mp3FrameSpec other;
+    Mp3FrameLayout other;
     other.samplingIndex = 1;
     Bytes file = Bytes().raw(Mp3Frame({})).raw(Mp3Frame(other)).raw(Frames(3));
     WithFile(file, [](int h) { EXPECT_EQ(VerifyMP3(h, nullptr, nullptr), MM_E_UNSUPPORTED); });

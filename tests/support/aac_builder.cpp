@@ -143,7 +143,7 @@ std::vector<uint8_t> AdifFile(const AdifLayout& s, const std::vector<uint8_t>& f
     return out;
 }
 
-std::vector<uint8_t> AdtsFrames(const AdtsSpec& layout, const std::vector<size_t>& sizes, int sbrExtension) {
+std::vector<uint8_t> AdtsFrames(const AdtsFields& layout, const std::vector<size_t>& sizes, int sbrExtension) {
     std::vector<uint8_t> out;
     const size_t header = layout.crc ? 9 : 7;
     for (size_t size : sizes) {
@@ -154,8 +154,8 @@ std::vector<uint8_t> AdtsFrames(const AdtsSpec& layout, const std::vector<size_t
     return out;
 }
 
-AdtsSpec AdtsLayout(int samplingIndex, int channelConfig, int profile) {
-    AdtsSpec s;
+AdtsFields AdtsLayout(int samplingIndex, int channelConfig, int profile) {
+    AdtsFields s;
     s.samplingIndex = samplingIndex;
     s.channelConfig = channelConfig;
     s.profile = profile;

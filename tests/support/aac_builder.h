@@ -65,8 +65,8 @@ struct AdifLayout {
 std::vector<uint8_t> AdifFile(const AdifLayout& layout, const std::vector<uint8_t>& firstBlock);
 
 // ADTS frames, one per entry of sizes (each at least 18 bytes: 7 header + 11 block).
-std::vector<uint8_t> AdtsFrames(const AdtsSpec& layout, const std::vector<size_t>& sizes, int sbrExtension = 0);
-AdtsSpec AdtsLayout(int samplingIndex, int channelConfig, int profile = 1);
+std::vector<uint8_t> AdtsFrames(const AdtsFields& layout, const std::vector<size_t>& sizes, int sbrExtension = 0);
+AdtsFields AdtsLayout(int samplingIndex, int channelConfig, int profile = 1);
 
 std::vector<uint8_t> Join(std::vector<uint8_t> a, const std::vector<uint8_t>& b);
 

@@ -35,7 +35,7 @@ std::vector<uint8_t> Id3Tag(int version, const std::vector<std::vector<uint8_t>>
     return Id3v2Tag(version, body.zeros(padding).data(), flags);
 }
 
-std::vector<uint8_t> Id3v1(const Id3v1Spec& s) {
+std::vector<uint8_t> Id3v1(const Id3v1Fields& s) {
     std::vector<uint8_t> tag(128, 0);
     auto put = [&](size_t at, const std::string& text, size_t n) {
         std::copy_n(text.begin(), std::min(text.size(), n), tag.begin() + static_cast<long>(at));
@@ -52,7 +52,7 @@ std::vector<uint8_t> Id3v1(const Id3v1Spec& s) {
 }
 
 std::vector<uint8_t> Id3v1Titled(const std::string& title) {
-    Id3v1Spec fields;
+    Id3v1Fields fields;
     fields.title = title;
     return Id3v1(fields);
 }

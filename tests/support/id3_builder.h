@@ -25,12 +25,12 @@ std::vector<uint8_t> TextBody(uint8_t encoding, const std::string& text);
 std::vector<uint8_t> Id3Tag(int version, const std::vector<std::vector<uint8_t>>& frames, size_t padding = 16,
                             uint8_t flags = 0);
 
-struct Id3v1Spec {
+struct Id3v1Fields {
     std::string title, artist, album, year, comment;
     int track = -1;  // v1.1 track byte when >= 0
     uint8_t genre = 255;
 };
-std::vector<uint8_t> Id3v1(const Id3v1Spec& shape);
+std::vector<uint8_t> Id3v1(const Id3v1Fields& shape);
 // A v1 tag with only a title.
 std::vector<uint8_t> Id3v1Titled(const std::string& title);
 

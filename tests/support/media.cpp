@@ -15,14 +15,14 @@ const int kRates[3][3] = {{44100, 48000, 32000}, {22050, 24000, 16000}, {11025, 
 
 }  // namespace
 
-std::vector<uint8_t> Mp3Header(const Mp3FrameSpec& s) {
+std::vector<uint8_t> Mp3Header(const Mp3FrameLayout& s) {
     uint8_t layerBits = static_cast<uint8_t>(4 - s.layer);  // Layer I = 3, III = 1
     return {0xFF, static_cast<uint8_t>(0xE0 | s.version << 3 | layerBits << 1 | (s.crc ? 0 : 1)),
             static_cast<uint8_t>(s.bitrateIndex << 4 | s.samplingIndex << 2 | s.padding << 1),
             static_cast<uint8_t>(s.channelMode << 6)};
 }
 
-uint32_t Mp3FrameSize(const Mp3FrameSpec& s) {
+uint32_t Mp3FrameSize(const Mp3FrameLayout& s) {
     int lsf = s.version == 3 ? 0 : 1;
     int row = s.version == 3 ? 0 : (s.version == 2 ? 1 : 2);
     int bitrate = kBitrates[lsf][s.layer - 1][s.bitrateIndex] * 1000;
@@ -32,7 +32,7 @@ uint32_t Mp3FrameSize(const Mp3FrameSpec& s) {
     return static_cast<uint32_t>(coefficient * bitrate / rate + s.padding);
 }
 
-std::vector<uint8_t> Mp3Frame(const Mp3FrameSpec& shape) {
+std::vector<uint8_t> Mp3Frame(const Mp3FrameLayout& shape) {
     std::vector<uint8_t> frame = Mp3Header(shape);
     frame.resize(Mp3FrameSize(shape), 0);
     return frame;
@@ -44,7 +44,7 @@ std::vector<uint8_t> Id3v2Tag(int version, const std::vector<uint8_t>& body, uin
     return b.data();
 }
 
-std::vector<uint8_t> AdtsFrame(const AdtsSpec& s, const std::vector<uint8_t>& payload) {
+std::vector<uint8_t> AdtsFrame(const AdtsFields& s, const std::vector<uint8_t>& payload) {
     uint32_t headerSize = s.crc ? 9 : 7;
     uint32_t length = headerSize + static_cast<uint32_t>(payload.size());
     std::vector<uint8_t> h(headerSize, 0);

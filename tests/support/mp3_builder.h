@@ -8,7 +8,7 @@
 
 namespace testing_support {
 
-using Mp3Shape = Mp3FrameSpec;
+using Mp3Shape = Mp3FrameLayout;
 
 // count frames of the same kind, payload zeroed.
 std::vector<uint8_t> Mp3Frames(int count, const Mp3Shape& shape = {});
