@@ -21,11 +21,14 @@ def syncsafe(n):
     return bytes([(n >> 21) & 0x7F, (n >> 14) & 0x7F, (n >> 7) & 0x7F, n & 0x7F])
 
 
-def id3v23(frames):
+def id3v23(frames, padding=64):
     body = b""
     for fid, text in frames:
         payload = b"\x00" + text.encode("latin-1")
         body += fid.encode() + struct.pack(">I", len(payload)) + b"\x00\x00" + payload
+    # Padding after the frames, as taggers write it: readers count the header
+    # inside the tag size, so a tag that ends right at its last frame loses it.
+    body += bytes(padding)
     return b"ID3\x03\x00\x00" + syncsafe(len(body)) + body
 
 
@@ -55,6 +58,54 @@ def adts_silence(frames=16):
     return (bytes(hdr) + payload) * frames
 
 
+def box(kind, body=b""):
+    return struct.pack(">I", 8 + len(body)) + kind + body
+
+
+def full_box(kind, version=0, flags=0, body=b""):
+    return box(kind, struct.pack(">I", version << 24 | flags) + body)
+
+
+def descriptor(tag, body):
+    return bytes([tag, len(body)]) + body
+
+
+def mp4_aac(frames=16):
+    # AAC LC 16 kHz mono in an MP4 file: the same silent raw data blocks as the
+    # ADTS sample, one per sample, with the sample tables that locate them.
+    block = bytes([0x00, 0xC8, 0x00, 0x07])
+    ftyp = box(b"ftyp", b"M4A " + struct.pack(">I", 0) + b"M4A isom")
+    mdat = box(b"mdat", block * frames)
+    matrix = struct.pack(">9I", 0x10000, 0, 0, 0, 0x10000, 0, 0, 0, 0x40000000)
+    duration_ms = frames * 1024 * 1000 // 16000
+    mvhd = full_box(b"mvhd", body=struct.pack(">IIIIIH", 0, 0, 1000, duration_ms, 0x10000, 0x0100)
+                    + bytes(10) + matrix + bytes(24) + struct.pack(">I", 2))
+    tkhd = full_box(b"tkhd", flags=7, body=struct.pack(">IIIII", 0, 0, 1, 0, duration_ms) + bytes(8)
+                    + struct.pack(">hhhH", 0, 0, 0x0100, 0) + matrix + struct.pack(">II", 0, 0))
+    mdhd = full_box(b"mdhd", body=struct.pack(">IIIIHH", 0, 0, 16000, frames * 1024, 0x55C4, 0))
+    hdlr = full_box(b"hdlr", body=struct.pack(">I", 0) + b"soun" + bytes(12) + b"Sound\0")
+    audio_config = bytes([0x14, 0x08])  # AAC LC, 16 kHz, one channel
+    decoder = descriptor(0x04, bytes([0x40, 0x15]) + bytes(3) + struct.pack(">II", 8000, 8000)
+                         + descriptor(0x05, audio_config))
+    esds = full_box(b"esds", body=descriptor(0x03, struct.pack(">HB", 1, 0) + decoder + descriptor(0x06, b"\x02")))
+    mp4a = box(b"mp4a", bytes(6) + struct.pack(">H", 1) + bytes(8) + struct.pack(">HHHHI", 1, 16, 0, 0, 16000 << 16)
+               + esds)
+    stbl = box(b"stbl", full_box(b"stsd", body=struct.pack(">I", 1) + mp4a)
+               + full_box(b"stts", body=struct.pack(">III", 1, frames, 1024))
+               + full_box(b"stsc", body=struct.pack(">IIII", 1, 1, frames, 1))
+               + full_box(b"stsz", body=struct.pack(">II", len(block), frames))
+               + full_box(b"stco", body=struct.pack(">II", 1, len(ftyp) + 8)))
+    dinf = box(b"dinf", full_box(b"dref", body=struct.pack(">I", 1) + full_box(b"url ", flags=1)))
+    minf = box(b"minf", full_box(b"smhd", body=bytes(4)) + dinf + stbl)
+    trak = box(b"trak", tkhd + box(b"mdia", mdhd + hdlr + minf))
+    return ftyp + mdat + box(b"moov", mvhd + trak)
+
+
+def evrc(packets=50):
+    # EVRC storage file: eighth-rate packets (rate octet 1, two payload bytes).
+    return b"#!EVRC\n" + (bytes([0x01]) + bytes(2)) * packets
+
+
 def amr_nb(frames=50):
     # 12.2 kbit/s frames (frame type 7, quality bit set): 1 + 31 bytes each.
     return b"#!AMR\n" + (bytes([0x3C]) + bytes(31)) * frames
@@ -77,6 +128,8 @@ SAMPLES = {
     "silence.amr": amr_nb,
     "silence.awb": amr_wb,
     "note.mid": midi,
+    "silence.m4a": mp4_aac,
+    "silence.evc": evrc,
 }
 
 
