@@ -40,6 +40,17 @@ bool ReadBoxBuffer(int h, uint32_t size, BoxBuffer* out) {
     return true;
 }
 
+int32_t ReadWholeBox(int h, uint32_t type, int32_t badBox, int32_t noMemory, BoxBuffer* buf, uint32_t* size) {
+    const int64_t start = Tell(h);
+    _BOXHEADER header{};
+    getBoxHeader(h, &header);
+    if (header.type != type || BadBoxSize(header.size)) return badBox;
+    SeekTo(h, start);
+    if (!ReadBoxBuffer(h, header.size, buf)) return noMemory;
+    *size = header.size;
+    return MM_OK;
+}
+
 int getBoxHeader(int h, _BOXHEADER* header) {
     header->size = GetUINT32(h, false);
     header->type = GetUINT32(h, false);

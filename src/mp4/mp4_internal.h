@@ -92,6 +92,10 @@ struct BoxBuffer {
 // Reads size bytes from the current position. Returns false when the buffer
 // cannot be allocated; out->size tells how many bytes the file gave.
 bool ReadBoxBuffer(int h, uint32_t size, BoxBuffer* out);
+// Reads the box at the current position whole when it has the expected type
+// and a size below the file's. Each reader answers its own codes for a wrong
+// box (badBox) and a buffer it cannot have (noMemory). *size: the box's size.
+int32_t ReadWholeBox(int h, uint32_t type, int32_t badBox, int32_t noMemory, BoxBuffer* buf, uint32_t* size);
 
 // Box headers.
 int getBoxHeader(int h, _BOXHEADER* header);

@@ -51,14 +51,9 @@ struct _SMARTALBUM {
 // Reads the child box at the current position whole; its full-box header
 // length goes to *at.
 int32_t ReadMakerChild(int h, uint32_t type, BoxBuffer* buf, _MP4FULLBOX* full, int* at, uint32_t* size) {
-    const int64_t start = Tell(h);
-    _BOXHEADER header{};
-    getBoxHeader(h, &header);
-    if (header.type != type || BadBoxSize(header.size)) return kMp4BadIlst;
-    SeekTo(h, start);
-    if (!ReadBoxBuffer(h, header.size, buf)) return MM_E_OUTOFMEMORY;
+    const int32_t result = ReadWholeBox(h, type, kMp4BadIlst, MM_E_OUTOFMEMORY, buf, size);
+    if (result != MM_OK) return result;
     *at = AnaFullBox(buf->data, buf->size, full);
-    *size = header.size;
     return *at == 0 ? MM_E_FAIL : MM_OK;
 }
 

@@ -325,13 +325,10 @@ int32_t AnaESDBox(const uint8_t* esds, size_t avail, int kind, _ME_ClipInfoEx* i
 }
 
 int32_t AnaStsd(int h, uint32_t /*handlerType*/, _ME_ClipInfoEx* info) {
-    const int64_t start = Tell(h);
-    _BOXHEADER header{};
-    getBoxHeader(h, &header);
-    if (header.type != FourCC("stsd") || BadBoxSize(header.size)) return kMp4BadContainer;
-    SeekTo(h, start);
     BoxBuffer buf;
-    if (!ReadBoxBuffer(h, header.size, &buf)) return MM_E_OUTOFMEMORY;
+    uint32_t size = 0;
+    const int32_t result = ReadWholeBox(h, FourCC("stsd"), kMp4BadContainer, MM_E_OUTOFMEMORY, &buf, &size);
+    if (result != MM_OK) return result;
     MP4TrackNode* node = CurrentTrack(info);
     if (node == nullptr) return MM_E_FAIL;
     _MP4FULLBOX full;
@@ -362,14 +359,11 @@ int32_t AnaStsd(int h, uint32_t /*handlerType*/, _ME_ClipInfoEx* info) {
 }
 
 int32_t AnaStsz(int h, uint32_t handlerType, _ME_ClipInfoEx* info) {
-    const int64_t start = Tell(h);
-    _BOXHEADER header{};
-    getBoxHeader(h, &header);
-    // Error codes the other way round from the other readers, as callers know them.
-    if (header.type != FourCC("stsz") || BadBoxSize(header.size)) return kMp4BadEntry;
-    SeekTo(h, start);
     BoxBuffer buf;
-    if (!ReadBoxBuffer(h, header.size, &buf)) return kMp4BadContainer;
+    uint32_t size = 0;
+    // Error codes the other way round from the other readers, as callers know them.
+    const int32_t result = ReadWholeBox(h, FourCC("stsz"), kMp4BadEntry, kMp4BadContainer, &buf, &size);
+    if (result != MM_OK) return result;
     if (buf.size < 20) return MM_E_FAIL;
     const uint32_t sampleSize = ReadBE32(buf.data + 12);
     const uint32_t sampleCount = ReadBE32(buf.data + 16);

@@ -120,20 +120,17 @@ struct _DATA {
 };
 
 int32_t AnaData(int h, _DATA* data) {
-    const int64_t start = Tell(h);
-    _BOXHEADER header{};
-    getBoxHeader(h, &header);
-    if (header.type != FourCC("data") || BadBoxSize(header.size)) return kMp4BadIlst;
-    SeekTo(h, start);
     BoxBuffer buf;
-    if (!ReadBoxBuffer(h, header.size, &buf)) return MM_E_OUTOFMEMORY;
+    uint32_t size = 0;
+    const int32_t result = ReadWholeBox(h, FourCC("data"), kMp4BadIlst, MM_E_OUTOFMEMORY, &buf, &size);
+    if (result != MM_OK) return result;
     _MP4FULLBOX full;
     const int at = AnaFullBox(buf.data, buf.size, &full);
-    if (at == 0 || header.size < 16) return MM_E_FAIL;
+    if (at == 0 || size < 16) return MM_E_FAIL;
     // The value follows the full-box header and the 4-byte locale word.
     const size_t offset = static_cast<size_t>(at) + 4;
     if (buf.size < offset) return MM_E_FAIL;
-    uint64_t length = header.size - 16;
+    uint64_t length = size - 16;
     if (length > buf.size - offset) length = buf.size - offset;
     data->value = new (std::nothrow) uint8_t[length != 0 ? length : 1];
     if (data->value == nullptr) return MM_E_OUTOFMEMORY;
