@@ -60,19 +60,19 @@ void SetBitrate(_MMClipInfo* clip, int32_t bitrate) {
 
 uint32_t AdtsCode(uint32_t walkerState) {
     switch (walkerState) {
-        case 1: return kCodecAacAdts;
-        case 2: return kCodecAacPlusV1Adts;
-        case 3: return kCodecAacPlusV2Adts;
-        default: return kCodecAacUnknown;
+        case 1: return CODEC_AAC_ADTS;
+        case 2: return CODEC_AAC_PLUS_V1_ADTS;
+        case 3: return CODEC_AAC_PLUS_V2_ADTS;
+        default: return CODEC_NODEFINE;
     }
 }
 
 uint32_t AdifCode(uint32_t walkerState) {
     switch (walkerState) {
-        case 1: return kCodecAacAdif;
-        case 2: return kCodecAacPlusV1Adif;
-        case 3: return kCodecAacPlusV2Adif;
-        default: return kCodecAacUnknown;
+        case 1: return CODEC_AAC_ADIF;
+        case 2: return CODEC_AAC_PLUS_V1_ADIF;
+        case 3: return CODEC_AAC_PLUS_V2_ADIF;
+        default: return CODEC_NODEFINE;
     }
 }
 
@@ -283,7 +283,7 @@ int32_t AAC_GetClipInfo(const char* path, _MMClipInfo* clip) {
     uint32_t profile = 0;
     const int32_t result = ParseClipInfo(h, clip, skipped, &codec, &profile);
     // The header's rate is the AAC core's; SBR doubles it.
-    if (codec != kCodecAacAdts && codec != kCodecAacAdif) clip->nSampleRate *= 2;
+    if (codec != CODEC_AAC_ADTS && codec != CODEC_AAC_ADIF) clip->nSampleRate *= 2;
     return result;
 }
 
@@ -301,7 +301,7 @@ int32_t AAC_GetCodecType(const char* path, _MM_CODECTYPE* codecType) {
     const int32_t result = ParseClipInfo(h, &clip, skipped, &codec, &profile);
     codecType->nAudioCodec = codec;
     // The profile goes into the subtype field; other values leave it as it is.
-    if (profile <= 2) codecType->nAudioSubType = kProfileAacMain + profile;
+    if (profile <= 2) codecType->nAudioSubType = PROFILE_AAC_MAIN + profile;
     return result;
 }
 

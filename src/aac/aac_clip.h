@@ -3,6 +3,7 @@
 
 #include <cstdint>
 
+#include "core/codes.h"
 #include "metainfo/records.h"
 
 namespace metainfo {
@@ -11,16 +12,6 @@ namespace metainfo {
 extern const uint32_t g_uSamplingFrequencyTable[16];
 // Indexed by ADTS channel_configuration; configuration 0 gives 0xFFFFFFFF.
 extern const uint32_t channelMapTab[8];
-
-// Codec codes written for raw AAC.
-constexpr uint32_t kCodecAacAdif = 0x2001;
-constexpr uint32_t kCodecAacPlusV1Adif = 0x2002;
-constexpr uint32_t kCodecAacPlusV2Adif = 0x2003;
-constexpr uint32_t kCodecAacAdts = 0x2011;
-constexpr uint32_t kCodecAacPlusV1Adts = 0x2012;
-constexpr uint32_t kCodecAacPlusV2Adts = 0x2013;
-constexpr uint32_t kCodecAacUnknown = 0xFFFF;
-constexpr uint32_t kProfileAacMain = 0x2101;
 
 // The slot functions of the dispatch tables.
 int32_t AAC_GetTrackType(const char* path, int* mask);

@@ -3,6 +3,7 @@
 #include "asf/asf_guids.h"
 #include "asf/asf_io.h"
 #include "core/byte_reader.h"
+#include "core/codes.h"
 #include "core/file_access.h"
 #include "core/log.h"
 
@@ -12,26 +13,6 @@ using namespace asf;
 
 namespace {
 
-constexpr uint32_t kWmAudio2 = 0x6001;
-constexpr uint32_t kWmAudio3 = 0x6002;
-constexpr uint32_t kWmAudioBaseline = 0x6010;
-constexpr uint32_t kWmAudioFull = 0x6011;
-constexpr uint32_t kWmv1 = 0x5001;
-constexpr uint32_t kWmv2 = 0x5002;
-constexpr uint32_t kWmv3 = 0x5003;
-constexpr uint32_t kMp4Video = 0x4001;
-constexpr uint32_t kNoDefine = 0xFFFF;
-constexpr uint32_t kProfileSimple = 0x5010;
-constexpr uint32_t kProfileMain = 0x5011;
-constexpr uint32_t kProfileAdvanced = 0x5012;
-constexpr uint32_t kLevelLow = 0x5020;
-constexpr uint32_t kLevelMedium = 0x5021;
-constexpr uint32_t kLevelHigh = 0x5022;
-constexpr uint32_t kLevelL0 = 0x5023;
-constexpr uint32_t kLevelL1 = 0x5024;
-constexpr uint32_t kLevelL2 = 0x5025;
-constexpr uint32_t kLevelL3 = 0x5026;
-constexpr uint32_t kLevelL4 = 0x5027;
 
 constexpr uint16_t kTagWma2 = 0x0161;
 constexpr uint16_t kTagWma3 = 0x0162;
@@ -60,23 +41,23 @@ void AudioStream(int h, uint32_t size, _MM_CODECTYPE* codec) {
     SeekBy(h, static_cast<int64_t>(size) - kAudioEnd);
 
     if (formatTag == kTagWma2) {
-        if (codec->nAudioCodec == 0) codec->nAudioCodec = kWmAudio2;
+        if (codec->nAudioCodec == 0) codec->nAudioCodec = CODEC_WMAUDIO2;
     } else if (formatTag == kTagWma3) {
-        if (codec->nAudioCodec == 0) codec->nAudioCodec = kWmAudio3;
+        if (codec->nAudioCodec == 0) codec->nAudioCodec = CODEC_WMAUDIO3;
     } else if (codec->nAudioCodec == 0) {
         return;
     }
     // A later audio stream overwrites the profile of an earlier one.
     if (sampleRate > 49152) return;
     if (bitrate < 193000) {
-        codec->nAudioProfile = kWmAudioBaseline;
+        codec->nAudioProfile = CODEC_WMAUDIO_PROFILE_BASELINE;
     } else if (bitrate <= 0x60400) {
-        codec->nAudioProfile = kWmAudioFull;
+        codec->nAudioProfile = CODEC_WMAUDIO_PROFILE_FULL;
     }
 }
 
 void Wmv3Stream(uint8_t b0, uint8_t b1, int32_t w, int32_t h, _MM_CODECTYPE* codec) {
-    codec->nVideoCodec = kWmv3;
+    codec->nVideoCodec = CODEC_ASFVIDEO_WMV3;
     // STRUCT_C of the sequence header (SMPTE 421M, Annex J).
     uint32_t profile = b0 >> 6;
     bool interlaced = (b0 & 0x10) != 0;
@@ -89,15 +70,15 @@ void Wmv3Stream(uint8_t b0, uint8_t b1, int32_t w, int32_t h, _MM_CODECTYPE* cod
     uint32_t level = 0;
     switch (profile) {
         case 0:
-            codec->nVideoProfile = kProfileSimple;
+            codec->nVideoProfile = CODEC_WMV9_PEOFILE_SIMPLE;
             level = ASF_SimpleProfileLevel(kbps, fps, w, h);
             break;
         case 1:
-            codec->nVideoProfile = kProfileMain;
+            codec->nVideoProfile = CODEC_WMV9_PEOFILE_MAIN;
             level = ASF_MainProfileLevel(kbps, fps, interlaced, w, h);
             break;
         case 3:
-            codec->nVideoProfile = kProfileAdvanced;
+            codec->nVideoProfile = CODEC_WMV9_PEOFILE_ADVANCED;
             level = ASF_AdvancedProfileLevel(fps, interlaced, w, h);
             break;
         default:
@@ -129,11 +110,11 @@ void VideoStream(int h, uint32_t size, _MM_CODECTYPE* codec) {
     if (codecDataLength < 2) {
         // These overwrite a codec that an earlier stream set.
         if (compression == FourCC("WMV1")) {
-            codec->nVideoCodec = kWmv1;
+            codec->nVideoCodec = CODEC_ASFVIDEO_WMV1;
         } else if (compression == FourCC("MP42") || compression == FourCC("MP43")) {
-            codec->nVideoCodec = kMp4Video;
+            codec->nVideoCodec = CODEC_MP4VIDEO_MP4V;
         } else {
-            codec->nVideoCodec = kNoDefine;
+            codec->nVideoCodec = CODEC_NODEFINE;
             LogPrint(kVerbose, kLogTag, "undefined codec type: iCompression = 0x%x\n", compression);
         }
     } else {
@@ -143,7 +124,7 @@ void VideoStream(int h, uint32_t size, _MM_CODECTYPE* codec) {
         if (compression == FourCC("WMV3") && codec->nVideoCodec == 0) {
             Wmv3Stream(seq[0], seq[1], width, height, codec);
         } else if (compression == FourCC("WMV2") && codec->nVideoCodec == 0) {
-            codec->nVideoCodec = kWmv2;
+            codec->nVideoCodec = CODEC_ASFVIDEO_WMV2;
             LogPrint(kVerbose, kLogTag, "in WMV2 type \n");
         } else {
             LogPrint(kVerbose, kLogTag, "non WMV3, WMV2. iCompression = 0x%x\n", compression);
@@ -156,36 +137,36 @@ void VideoStream(int h, uint32_t size, _MM_CODECTYPE* codec) {
 
 uint32_t ASF_SimpleProfileLevel(uint32_t kbps, uint32_t fps, int32_t w, int32_t h) {
     bool lowRate = kbps < 97 && fps < 16;
-    if (lowRate && w <= 176 && h <= 144) return kLevelLow;
+    if (lowRate && w <= 176 && h <= 144) return CODEC_WMV9_LEVEL_LOW;
     if (!lowRate && kbps > 384) return 0;
-    if ((w < 241 && h < 177) || (fps < 16 && w <= 352 && h <= 288)) return kLevelMedium;
+    if ((w < 241 && h < 177) || (fps < 16 && w <= 352 && h <= 288)) return CODEC_WMV9_LEVEL_MEDIUM;
     return 0;
 }
 
 uint32_t ASF_MainProfileLevel(uint32_t /*kbps*/, uint32_t fps, bool interlaced, int32_t w, int32_t h) {
-    if (fps < 25 && w < 321 && h < 241) return kLevelLow;
+    if (fps < 25 && w < 321 && h < 241) return CODEC_WMV9_LEVEL_LOW;
     if (interlaced) return 0;
-    if ((w < 721 && h < 481) || (fps < 27 && w < 721 && h < 577)) return kLevelMedium;
-    if (w <= 1920 && h <= 1080) return kLevelHigh;
+    if ((w < 721 && h < 481) || (fps < 27 && w < 721 && h < 577)) return CODEC_WMV9_LEVEL_MEDIUM;
+    if (w <= 1920 && h <= 1080) return CODEC_WMV9_LEVEL_HIGH;
     return 0;
 }
 
 uint32_t ASF_AdvancedProfileLevel(uint32_t fps, bool interlaced, int32_t w, int32_t h) {
     bool slow = fps < 25;
-    if (w <= 352 && h < 289) return kLevelL0;
-    if ((w < 721 && h < 481) || (fps < 27 && w < 721 && h < 577)) return kLevelL1;
-    if (!interlaced && w < 1281 && h < 721) return kLevelL2;
+    if (w <= 352 && h < 289) return CODEC_WMV9_LEVEL_L0;
+    if ((w < 721 && h < 481) || (fps < 27 && w < 721 && h < 577)) return CODEC_WMV9_LEVEL_L1;
+    if (!interlaced && w < 1281 && h < 721) return CODEC_WMV9_LEVEL_L2;
     if (!interlaced && !slow) {
-        if (w <= 1280 && h < 721) return kLevelL3;
-        if (w <= 1920 && h <= 1080) return kLevelL4;
+        if (w <= 1280 && h < 721) return CODEC_WMV9_LEVEL_L3;
+        if (w <= 1920 && h <= 1080) return CODEC_WMV9_LEVEL_L4;
     } else {
-        if (w < 1921 && h < 1081) return kLevelL3;
+        if (w < 1921 && h < 1081) return CODEC_WMV9_LEVEL_L3;
         if (!interlaced) {
-            if (w <= 1280 && h < 721) return kLevelL3;
-            if (w <= 1920 && h < 1081) return kLevelL4;
+            if (w <= 1280 && h < 721) return CODEC_WMV9_LEVEL_L3;
+            if (w <= 1920 && h < 1081) return CODEC_WMV9_LEVEL_L4;
         }
     }
-    if (slow && w <= 2048 && h <= 1536) return kLevelL4;
+    if (slow && w <= 2048 && h <= 1536) return CODEC_WMV9_LEVEL_L4;
     return 0;
 }
 

@@ -7,6 +7,7 @@
 #include <new>
 
 #include "core/byte_reader.h"
+#include "core/codes.h"
 #include "core/file_access.h"
 #include "mp3/mp3_tables.h"
 
@@ -93,7 +94,7 @@ int32_t FillMimeType(_MM_MIMETYPE* mime) {
 }
 
 int32_t FillCodecType(_MM_CODECTYPE* codec, const _FrameHeader_Info& header) {
-    static const uint32_t kLayerCodecs[3] = {0x1001, 0x1002, 0x1003};
+    static const uint32_t kLayerCodecs[3] = {CODEC_MP3_LAYER1, CODEC_MP3_LAYER2, CODEC_MP3_LAYER3};
     if (header.layerIndex > 2) return MM_E_FAIL;
     codec->nAudioCodec = kLayerCodecs[header.layerIndex];
     return MM_OK;

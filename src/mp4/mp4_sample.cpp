@@ -7,25 +7,12 @@
 #include "core/file_access.h"
 #include "core/thread_state.h"
 #include "mp4/mp4_internal.h"
+#include "core/codes.h"
 #include "mp4/mp4_qcp_bridge.h"
 
 namespace metainfo {
 namespace {
 
-constexpr uint32_t CODEC_MP4VIDEO_MP4V = 0x4001;
-constexpr uint32_t CODEC_MP4VIDEO_S263 = 0x4003;
-constexpr uint32_t CODEC_MP4VIDEO_S264 = 0x4004;
-constexpr uint32_t CODEC_MP4AUDIO_SAMR = 0x4005;
-constexpr uint32_t CODEC_MP4AUDIO_SAWB = 0x4006;
-constexpr uint32_t CODEC_MP4AUDIO_SAWP = 0x4007;
-constexpr uint32_t CODEC_MP4AUDIO_MP4A_AAC = 0x4008;
-constexpr uint32_t CODEC_MP4AUDIO_MP4A_AAC_PLUS_V1 = 0x4009;
-constexpr uint32_t CODEC_QCELP = 0x7001;
-constexpr uint32_t CODEC_EVRC = 0x8001;
-constexpr uint32_t PROFILE_AAC_MAIN = 0x2101;
-constexpr uint32_t PROFILE_AAC_LC = 0x2102;
-constexpr uint32_t PROFILE_AAC_SSR = 0x2103;
-constexpr uint32_t CODEC_NODEFINE = 0xFFFF;
 
 constexpr int kAudio = 1;
 constexpr int kVideo = 16;

@@ -3,6 +3,7 @@
 #include <new>
 
 #include "core/byte_reader.h"
+#include "core/codes.h"
 #include "realmedia/rm_parser.h"
 
 namespace metainfo {
@@ -47,8 +48,8 @@ struct CodecRow {
 };
 
 const CodecRow kRmCodecs[] = {
-    {"sipr", 0x3001}, {"cook", 0x3002}, {"atrc", 0x3003}, {"raac", 0x3004},
-    {"RV10", 0x3010}, {"RV20", 0x3020}, {"RV30", 0x3030}, {"RV40", 0x3040},
+    {"sipr", CODEC_RMAUDIO_SIPR}, {"cook", CODEC_RMAUDIO_COOK}, {"atrc", CODEC_RMAUDIO_ATRC}, {"raac", CODEC_RMAUDIO_RAAC},
+    {"RV10", CODEC_RMVIDEO_RV10}, {"RV20", CODEC_RMVIDEO_RV20}, {"RV30", CODEC_RMVIDEO_RV30}, {"RV40", CODEC_RMVIDEO_RV40},
 };
 
 }  // namespace

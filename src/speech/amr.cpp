@@ -5,6 +5,7 @@
 #include <memory>
 #include <new>
 
+#include "core/codes.h"
 #include "core/file_access.h"
 #include "metainfo/extract.h"
 
@@ -160,7 +161,7 @@ int32_t GetMediaInfo_AMR(const char* path, void* out, int request) {
             // A narrow-band file has no codec answer.
             if (!IsWideBand(frame.nFileType)) return MM_E_UNSUPPORTED;
             _MM_CODECTYPE* codec = static_cast<_MM_CODECTYPE*>(out);
-            codec->nAudioCodec = 0x1020;  // CODEC_AMR_WB
+            codec->nAudioCodec = CODEC_AMR_WB;
             int entry = frame.nFrameType + 9;
             // A first frame without data (15) has no sub-code.
             codec->nAudioSubType = entry < 20 ? kAmrSubCodes[entry] : 0;

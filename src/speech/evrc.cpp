@@ -4,6 +4,7 @@
 
 #include <cstring>
 
+#include "core/codes.h"
 #include "core/file_access.h"
 #include "speech/qcp.h"
 #include "speech/qcp_format.h"
@@ -46,7 +47,7 @@ int32_t EVRC_GetClipInfo(const char* path, _MMClipInfo* clip) {
 int32_t EVRC_GetCodecType(const char* path, _MM_CODECTYPE* codec) {
     if (path == nullptr || codec == nullptr) return MM_E_INVALIDARG;
     std::memset(codec, 0, sizeof *codec);
-    codec->nAudioCodec = 0x8001;  // CODEC_EVRC
+    codec->nAudioCodec = CODEC_EVRC;
     return MM_OK;
 }
 

@@ -4,6 +4,7 @@
 #include <cstring>
 
 #include "core/byte_reader.h"
+#include "core/codes.h"
 #include "core/file_access.h"
 #include "metainfo/records.h"
 
@@ -62,9 +63,9 @@ QcpCodec CodecOfGuid(const uint8_t guid[16]) {
 
 uint32_t CodecCodeOf(QcpCodec codec) {
     switch (codec) {
-        case QcpCodec::kQcelp: return 0x7001;
-        case QcpCodec::kEvrc: return 0x8001;
-        case QcpCodec::kSmv: return 0x9001;
+        case QcpCodec::kQcelp: return CODEC_QCELP;
+        case QcpCodec::kEvrc: return CODEC_EVRC;
+        case QcpCodec::kSmv: return CODEC_SMV;
         case QcpCodec::kUnknown: break;
     }
     return 0xFFFF;

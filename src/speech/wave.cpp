@@ -6,6 +6,7 @@
 #include <new>
 
 #include "core/byte_reader.h"
+#include "core/codes.h"
 #include "core/file_access.h"
 #include "metainfo/extract.h"
 
@@ -77,10 +78,10 @@ int32_t SetMimeType(_MM_MIMETYPE* mime, const _FormatChunk& fmt) {
 
 uint32_t CodecOfTag(uint16_t tag) {
     switch (tag) {
-        case 1: return 0x1030;  // CODEC_WAVE_PCM
-        case 2: return 0x1031;  // CODEC_WAVE_ADPCM
-        case 6: return 0x1032;  // CODEC_WAVE_ALAW
-        case 7: return 0x1033;  // CODEC_WAVE_MULAW
+        case 1: return CODEC_WAVE_PCM;
+        case 2: return CODEC_WAVE_ADPCM;
+        case 6: return CODEC_WAVE_ALAW;
+        case 7: return CODEC_WAVE_MULAW;
         default: return 0;
     }
 }
