@@ -164,8 +164,9 @@ public:
     const _AVIAudioFormat* getAudioFormat() const { return pAudioFormat; }
 
 private:
-    friend int32_t ::CreateAVIParserObject(CAVIParser** out);
-    friend int32_t ::FreeAVIParserObject(CAVIParser* p);
+    // Parenthesised so that no compiler reads int32_t:: as a qualifier.
+    friend int32_t(::CreateAVIParserObject)(CAVIParser** out);
+    friend int32_t(::FreeAVIParserObject)(CAVIParser* p);
 
     struct StreamSlot {
         _AVIStreamHeader header;
