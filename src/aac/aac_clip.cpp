@@ -84,10 +84,10 @@ int32_t OpenPastTags(const char* path, _MMClipInfo* clip, int* handle, uint32_t*
     const int h = MEx_fopen(path, "rb");
     if (h == 0) return 1;
     MEx_fseek(h, 0, SEEK_END);
-    clip->nFileSize = static_cast<uint32_t>(MEx_ftell(h));
+    clip->nFileSize = PositionToU32(MEx_ftell(h));
 
     uint8_t tail[3] = {};
-    if (MEx_fseek(h, -static_cast<long>(kTrailingTagSize), SEEK_END) == 0) MEx_fread(tail, 1, sizeof tail, h);
+    if (MEx_fseek(h, -static_cast<int64_t>(kTrailingTagSize), SEEK_END) == 0) MEx_fread(tail, 1, sizeof tail, h);
     const uint32_t trailing = BytesEqual(tail, "TAG", 3) ? kTrailingTagSize : 0;
 
     uint8_t probe[128] = {};
@@ -96,7 +96,7 @@ int32_t OpenPastTags(const char* path, _MMClipInfo* clip, int* handle, uint32_t*
         return MM_E_FAIL;
     }
     const uint32_t tagSize = BytesEqual(probe, "ID3", 3) ? ReadSyncsafe32(probe + 6) : 0;
-    MEx_fseek(h, static_cast<long>(AACLeadingTagSkip(probe)), SEEK_SET);
+    MEx_fseek(h, static_cast<int64_t>(AACLeadingTagSkip(probe)), SEEK_SET);
     *skipped = tagSize + trailing;
     *handle = h;
     return MM_OK;

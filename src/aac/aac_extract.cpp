@@ -16,7 +16,7 @@ namespace {
 constexpr int kChunkSize = 8192;
 // A sync word is looked for only this far before the end of what was read.
 constexpr int kSyncMargin = 100;
-constexpr long kTrailingTagSize = 128;
+constexpr int64_t kTrailingTagSize = 128;
 
 // value x fileSize / duration. The product is a signed 32-bit value, wrapped
 // explicitly as the offsets have always been computed; the division is done
@@ -55,7 +55,7 @@ int SyncShift(const uint8_t* buf, int n) {
 
 // Reads from offset and gives the distance to the next sync word as SyncShift does.
 int32_t ShiftAt(int in, int64_t offset, uint8_t* buf, int* shift) {
-    if (offset < 0 || MEx_fseek(in, static_cast<long>(offset), SEEK_SET) != 0) return MM_E_FAIL;
+    if (offset < 0 || MEx_fseek(in, static_cast<int64_t>(offset), SEEK_SET) != 0) return MM_E_FAIL;
     const int n = MEx_fread(buf, 1, kChunkSize, in);
     *shift = SyncShift(buf, n);
     return MM_OK;
@@ -91,7 +91,7 @@ int32_t WriteRange(int in, int out, int32_t startOffset, int32_t endOffset, uint
     if (ShiftAt(in, endOffset, buf, &endShift) != MM_OK) return MM_E_FAIL;
     const int64_t from = static_cast<int64_t>(startOffset) + startShift;
     const int64_t to = static_cast<int64_t>(endOffset) + endShift;
-    if (MEx_fseek(in, static_cast<long>(from), SEEK_SET) != 0) return MM_E_FAIL;
+    if (MEx_fseek(in, static_cast<int64_t>(from), SEEK_SET) != 0) return MM_E_FAIL;
     CopyBytes(in, out, to - from, buf);
 
     uint8_t tail[kTrailingTagSize] = {};

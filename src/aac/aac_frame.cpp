@@ -31,7 +31,7 @@ uint32_t AACLeadingTagSkip(const uint8_t* probe) {
 
 int32_t VerifyAAC(int h, const uint8_t* probe) {
     if (probe == nullptr) return MM_E_INVALIDARG;
-    MEx_fseek(h, static_cast<long>(AACLeadingTagSkip(probe)), SEEK_SET);
+    MEx_fseek(h, static_cast<int64_t>(AACLeadingTagSkip(probe)), SEEK_SET);
     std::unique_ptr<uint8_t[]> buf(new (std::nothrow) uint8_t[kVerifyWindow]);
     if (!buf) return MM_E_FAIL;
     const int n = MEx_fread(buf.get(), 1, kVerifyWindow, h);

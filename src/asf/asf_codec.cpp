@@ -89,7 +89,7 @@ void Wmv3Stream(uint8_t b0, uint8_t b1, int32_t w, int32_t h, _MM_CODECTYPE* cod
 }
 
 void VideoStream(int h, uint32_t size, _MM_CODECTYPE* codec) {
-    long typeSpecific = MEx_ftell(h);
+    const int64_t typeSpecific = MEx_ftell(h);
     // Encoded width and height, reserved flags, format data size, then the
     // BITMAPINFOHEADER.
     uint8_t v[4 + 4 + 1 + 2 + 40];

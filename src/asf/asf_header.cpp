@@ -1,6 +1,5 @@
 #include "asf/asf_header.h"
 
-#include <sys/stat.h>
 
 #include <cstring>
 
@@ -26,7 +25,6 @@ constexpr int32_t kWalkFailed = -1;
 // Stream Properties layout, counted from the object's start.
 constexpr uint32_t kStreamTypeEnd = 40;       // GUID, size, Stream Type
 constexpr uint32_t kStreamFlagsOffset = 72;   // after the error correction fields
-constexpr uint32_t kTypeSpecificOffset = 78;  // after Flags and Reserved
 
 struct TrackBit {
     const uint8_t* type;
@@ -58,7 +56,7 @@ bool SkipObject(int h) {
 }
 
 // Where the walk stands just after a GUID; -1 when it cannot tell.
-long Here(int h) { return MEx_ftell(h); }
+int64_t Here(int h) { return MEx_ftell(h); }
 
 bool PrepareOutput(uint16_t mode, void* out) {
     switch (mode) {
@@ -84,9 +82,9 @@ bool PrepareOutput(uint16_t mode, void* out) {
 // Positions just after the GUIDs of the objects whose parsing waits for the
 // end of the walk; -1 while not met.
 struct Deferred {
-    long extContent = -1;
-    long headerExtension = -1;
-    long bitrate = -1;
+    int64_t extContent = -1;
+    int64_t headerExtension = -1;
+    int64_t bitrate = -1;
 };
 
 int32_t WalkObject(int h, const uint8_t* guid, uint16_t mode, void* out, uint32_t allowance,
@@ -96,7 +94,7 @@ int32_t WalkObject(int h, const uint8_t* guid, uint16_t mode, void* out, uint32_
     }
     if (SameGuid(guid, ASF_Stream_Properties_Object)) {
         if (mode == kAsfModeClip) {
-            long start = Here(h);
+            const int64_t start = Here(h);
             ASF_GetVideoIndex(h, videoStream);
             if (!SeekTo(h, start)) return kWalkFailed;
             return ASF_ParseStreamPropertyObj(h, static_cast<_MMClipInfo*>(out));
@@ -167,8 +165,8 @@ int32_t RunDeferred(int h, uint16_t mode, void* out, uint32_t allowance, uint32_
 
 int32_t ASF_GetMediaInfo(const char* path, uint16_t mode, void* out, int32_t flag) {
     uint32_t videoStream = kNoVideoStream;
-    struct stat st;
-    s_asfFileSize = MEx_stat(path, &st) == 0 ? static_cast<uint32_t>(st.st_size) : 0;
+    uint64_t fileSize = 0;
+    s_asfFileSize = MEx_fsize(path, &fileSize) ? SaturateU32(fileSize) : 0;
     if (!PrepareOutput(mode, out)) return kWalkFailed;
 
     int h = MEx_fopen(path, "rb");
@@ -214,11 +212,14 @@ int32_t ASF_ParseFilePropertyObj(int h, _MMClipInfo* clip) {
 
 int32_t ASF_GetVideoIndex(int h, uint32_t* videoStream) {
     // The caller returns to where it called from, so the object's end is not sought.
-    uint8_t b[kStreamFlagsOffset + 2 - 16];
-    ReadOrZero(h, b, kStreamTypeEnd - 16);
+    // Offsets in b count from the end of the object's GUID.
+    constexpr uint32_t kTypeEnd = kStreamTypeEnd - 16;
+    constexpr uint32_t kFlags = kStreamFlagsOffset - 16;
+    uint8_t b[kFlags + 2];
+    ReadOrZero(h, b, kTypeEnd);
     if (SameGuid(b + 8, ASF_Video_Media) && *videoStream == kNoVideoStream) {
-        ReadOrZero(h, b + 24, sizeof b - 24);
-        *videoStream = ReadLE16(b + kStreamFlagsOffset - 16) & 0x7F;
+        ReadOrZero(h, b + kTypeEnd, sizeof b - kTypeEnd);
+        *videoStream = ReadLE16(b + kFlags) & 0x7F;
     }
     return 0;
 }

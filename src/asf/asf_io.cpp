@@ -1,6 +1,5 @@
 #include "asf/asf_io.h"
 
-#include <climits>
 #include <cstdio>
 #include <cstring>
 
@@ -65,25 +64,15 @@ uint64_t Get64(int h) {
 }
 
 bool SeekBy(int h, int64_t delta) {
-    // A long may be 32 bits wide: move in steps it can hold.
-    while (delta > LONG_MAX) {
-        if (MEx_fseek(h, LONG_MAX, SEEK_CUR) != 0) return false;
-        delta -= LONG_MAX;
-    }
-    while (delta < LONG_MIN) {
-        if (MEx_fseek(h, LONG_MIN, SEEK_CUR) != 0) return false;
-        delta -= LONG_MIN;
-    }
-    if (delta == 0) return true;
-    return MEx_fseek(h, static_cast<long>(delta), SEEK_CUR) == 0;
+    return delta == 0 || MEx_fseek(h, delta, SEEK_CUR) == 0;
 }
 
-bool SeekTo(int h, long position) {
+bool SeekTo(int h, int64_t position) {
     return position >= 0 && MEx_fseek(h, position, SEEK_SET) == 0;
 }
 
 uint64_t BytesLeft(int h) {
-    long pos = MEx_ftell(h);
+    const int64_t pos = MEx_ftell(h);
     if (pos < 0 || static_cast<uint64_t>(pos) >= s_asfFileSize) return 0;
     return s_asfFileSize - static_cast<uint64_t>(pos);
 }

@@ -26,7 +26,7 @@ uint64_t Get64(int h);
 
 // Relative move by a signed 64-bit amount; false when the seek fails.
 bool SeekBy(int h, int64_t delta);
-bool SeekTo(int h, long position);
+bool SeekTo(int h, int64_t position);
 
 // Bytes from the current position to the end of the file, as far as the
 // walk knows the file's size.

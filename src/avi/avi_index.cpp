@@ -31,12 +31,12 @@ int32_t CAVIParser::locateChunk(const char* fourcc) {
     uint64_t end = nRiffEnd < nFileSize ? nRiffEnd : nFileSize;
     uint64_t pos = 12;
     while (pos + 8 <= end) {
-        if (MEx_fseek(hFile, static_cast<long>(pos), SEEK_SET) != 0) return MM_E_FAIL;
+        if (MEx_fseek(hFile, static_cast<int64_t>(pos), SEEK_SET) != 0) return MM_E_FAIL;
         _CHUNKHEADER header;
         getChunkHeader(hFile, &header);
         bool found = isList ? header.ckID == Fourcc("LIST") && header.ckType == want : header.ckID == want;
         if (found) {
-            MEx_fseek(hFile, static_cast<long>(pos), SEEK_SET);
+            MEx_fseek(hFile, static_cast<int64_t>(pos), SEEK_SET);
             return MM_OK;
         }
         pos += 8 + uint64_t(header.ckSize) + (header.ckSize & 1);
@@ -61,7 +61,7 @@ int32_t CAVIParser::getSubChunk(int handle, _SUBCHUNK* sub) {
 
 int32_t CAVIParser::parseMovi(int handle) {
     if (handle == 0) return MM_E_INVALIDARG;
-    long start = MEx_ftell(handle);
+    int64_t start = MEx_ftell(handle);
     if (start < 0) return MM_E_FAIL;
     _CHUNKHEADER header;
     getChunkHeader(handle, &header);
@@ -74,7 +74,7 @@ int32_t CAVIParser::parseMovi(int handle) {
 
     uint64_t pos = uint64_t(start) + 12;
     while (pos < nMoviEnd) {
-        if (MEx_fseek(handle, static_cast<long>(pos), SEEK_SET) != 0) break;
+        if (MEx_fseek(handle, static_cast<int64_t>(pos), SEEK_SET) != 0) break;
         _SUBCHUNK sub;
         if (getSubChunk(handle, &sub) != MM_OK) break;  // the file ends inside the list
         pos += uint64_t(sub.ckSize) + (sub.ckSize & 1) + 8;
@@ -98,13 +98,13 @@ int32_t CAVIParser::getIndexEntry(int handle, _AVIIndexEntry* entry) {
 
 int32_t CAVIParser::parseIdx1(int handle) {
     if (handle == 0) return MM_E_INVALIDARG;
-    long start = MEx_ftell(handle);
+    int64_t start = MEx_ftell(handle);
     if (start < 0) return MM_E_FAIL;
     _CHUNKHEADER header;
     getChunkHeader(handle, &header);
     if (header.ckSize >= nFileSize || header.ckSize == 0) return MM_E_FAIL;
     uint64_t first = uint64_t(start) + 8;
-    if (MEx_fseek(handle, static_cast<long>(first), SEEK_SET) != 0) return MM_E_FAIL;
+    if (MEx_fseek(handle, static_cast<int64_t>(first), SEEK_SET) != 0) return MM_E_FAIL;
 
     // No more entries than the rest of the file can hold.
     uint64_t count = header.ckSize >> 4;
@@ -261,7 +261,7 @@ int32_t CAVIParser::getNextFrame(uint32_t stream, _FrameInfo* info) {
     if (at + e.dwChunkLength > nFileSize) return MM_E_FAIL;
     unsigned char* data = new (std::nothrow) unsigned char[e.dwChunkLength];
     if (data == nullptr) return MM_E_OUTOFMEMORY;
-    if (MEx_fseek(hFile, static_cast<long>(at), SEEK_SET) != 0 ||
+    if (MEx_fseek(hFile, static_cast<int64_t>(at), SEEK_SET) != 0 ||
         MEx_fread(data, 1, e.dwChunkLength, hFile) != static_cast<int>(e.dwChunkLength)) {
         delete[] data;
         info->pData = nullptr;

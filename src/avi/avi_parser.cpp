@@ -149,7 +149,7 @@ int32_t CAVIParser::init(const char* path, _MMClipInfo* clip) {
     _CHUNKHEADER riff;
     getChunkHeader(hFile, &riff);
     if (riff.ckID != Fourcc("RIFF")) return MM_E_FAIL;
-    nRiffEnd = ClampToU32(uint64_t(riff.ckSize) + 8);
+    nRiffEnd = SaturateU32(uint64_t(riff.ckSize) + 8);
 
     int32_t result = parseListChunks();
     if (clip == nullptr) return result;
@@ -181,10 +181,10 @@ int32_t CAVIParser::init(const char* path, _MMClipInfo* clip) {
 int32_t CAVIParser::parseListChunks() {
     uint64_t pos = 12;
     while (pos < nFileSize) {
-        if (MEx_fseek(hFile, static_cast<long>(pos), SEEK_SET) != 0) return MM_E_FAIL;
+        if (MEx_fseek(hFile, static_cast<int64_t>(pos), SEEK_SET) != 0) return MM_E_FAIL;
         _CHUNKHEADER header;
         getChunkHeader(hFile, &header);
-        MEx_fseek(hFile, static_cast<long>(pos), SEEK_SET);
+        MEx_fseek(hFile, static_cast<int64_t>(pos), SEEK_SET);
         if (pos < nRiffEnd && (header.ckSize == 0 || header.ckSize >= nFileSize)) return MM_E_FAIL;
         if (header.ckID == Fourcc("JUNK")) {
             parseJunk(hFile);
@@ -209,7 +209,7 @@ int32_t CAVIParser::parseInfo() {
 }
 
 int32_t CAVIParser::parseHdrl() {
-    long start = MEx_ftell(hFile);
+    int64_t start = MEx_ftell(hFile);
     if (start < 0) return MM_E_FAIL;
     _CHUNKHEADER header;
     getChunkHeader(hFile, &header);

@@ -12,12 +12,6 @@ constexpr uint32_t Fourcc(const char (&s)[5]) {
            uint32_t(uint8_t(s[3]));
 }
 
-// File positions and sizes are kept in 32 bits; larger values saturate.
-inline uint32_t PositionToU32(long v) {
-    if (v < 0) return 0;
-    return static_cast<unsigned long long>(v) > 0xFFFFFFFFull ? 0xFFFFFFFFu : static_cast<uint32_t>(v);
-}
-inline uint32_t ClampToU32(uint64_t v) { return v > 0xFFFFFFFFull ? 0xFFFFFFFFu : static_cast<uint32_t>(v); }
 
 // "avih" chunk header and body as the header list holds them.
 constexpr uint32_t kMainHeaderBytes = 64;

@@ -12,6 +12,10 @@
 #include "core/log.h"
 #include "metainfo/records.h"
 
+// Without 64-bit file offsets a 32-bit host could neither seek past 2 GiB nor
+// stat such a file.
+static_assert(sizeof(off_t) == 8, "build with _FILE_OFFSET_BITS=64");
+
 namespace metainfo {
 namespace {
 
@@ -120,10 +124,10 @@ int ReadProtected(MexHandle* handle, void* buf, unsigned size, unsigned count) {
     return static_cast<int>(got);
 }
 
-int SeekProtected(MexHandle* handle, long offset, int whence) {
+int SeekProtected(MexHandle* handle, int64_t offset, int whence) {
     // Positions wrap rather than overflow; no bound is checked, as a later
     // read past the end simply answers 0.
-    uint64_t delta = static_cast<uint64_t>(static_cast<int64_t>(offset));
+    uint64_t delta = static_cast<uint64_t>(offset);
     switch (whence) {
         case SEEK_SET: handle->position = static_cast<int64_t>(delta); return 0;
         case SEEK_CUR: handle->position = static_cast<int64_t>(static_cast<uint64_t>(handle->position) + delta); return 0;
@@ -199,18 +203,18 @@ int MEx_fwrite(const void* buf, unsigned size, unsigned count, int h) {
     return static_cast<int>(std::fwrite(buf, size, count, handle->stream));
 }
 
-int MEx_fseek(int h, long offset, int whence) {
+int MEx_fseek(int h, int64_t offset, int whence) {
     MexHandle* handle = Lookup(h);
     if (handle == nullptr) return -1;
-    if (handle->drmKind == 0) return std::fseek(handle->stream, offset, whence);
+    if (handle->drmKind == 0) return ::fseeko(handle->stream, static_cast<off_t>(offset), whence);
     return SeekProtected(handle, offset, whence);
 }
 
-long MEx_ftell(int h) {
+int64_t MEx_ftell(int h) {
     MexHandle* handle = Lookup(h);
     if (handle == nullptr) return -1;
-    if (handle->drmKind == 0) return std::ftell(handle->stream);
-    return static_cast<long>(static_cast<int32_t>(static_cast<uint32_t>(handle->position)));
+    if (handle->drmKind == 0) return static_cast<int64_t>(::ftello(handle->stream));
+    return handle->position;
 }
 
 int MEx_feof(int h) {
@@ -247,6 +251,13 @@ int MEx_stat(const char* path, struct stat* st) {
         }
     }
     return ::stat(path, st);
+}
+
+bool MEx_fsize(const char* path, uint64_t* size) {
+    struct stat st;
+    if (MEx_stat(path, &st) != 0 || st.st_size < 0) return false;
+    *size = static_cast<uint64_t>(st.st_size);
+    return true;
 }
 
 uint32_t GetUINT32(int h, bool bLittle) {

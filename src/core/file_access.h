@@ -17,8 +17,10 @@ int MEx_fopen(const char* path, const char* mode);
 int MEx_fread(void* buf, unsigned size, unsigned count, int h);
 // Items written; -1 for a protected or bad handle.
 int MEx_fwrite(const void* buf, unsigned size, unsigned count, int h);
-int MEx_fseek(int h, long offset, int whence);
-long MEx_ftell(int h);
+// Positions are 64-bit on every target, so files of 2 GiB and more read the
+// same on 32-bit hosts.
+int MEx_fseek(int h, int64_t offset, int whence);
+int64_t MEx_ftell(int h);
 int MEx_feof(int h);
 int MEx_fclose(int h);
 int MEx_stat(const char* path, struct stat* st);
@@ -26,6 +28,16 @@ int MEx_stat(const char* path, struct stat* st);
 // the descriptor's current position, and closing the handle leaves the
 // caller's descriptor open.
 int MEx_fdopen(int fd, const char* mode);
+
+// Size in bytes of the file at path, as MEx_stat reports it; false when the
+// path cannot be looked at.
+bool MEx_fsize(const char* path, uint64_t* size);
+
+// A size or position kept in a 32-bit record field: 4 GiB and more reads as
+// 0xFFFFFFFF, the same on every target.
+inline uint32_t SaturateU32(uint64_t v) { return v > 0xFFFFFFFFu ? 0xFFFFFFFFu : static_cast<uint32_t>(v); }
+// The same for a position that MEx_ftell reported; a failed tell reads as 0.
+inline uint32_t PositionToU32(int64_t v) { return v < 0 ? 0 : SaturateU32(static_cast<uint64_t>(v)); }
 
 // Next four bytes as a 32-bit value; missing bytes of a short read count as 0.
 uint32_t GetUINT32(int h, bool bLittle);

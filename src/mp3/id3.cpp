@@ -46,7 +46,7 @@ uint32_t RawSpan(const uint8_t* raw, uint32_t rawLength, uint32_t want) {
 // v2.3 extended header behind an unsynchronised tag: its size field and body
 // are read through the unsynchronisation; the file is left after them.
 int32_t SkipUnsyncExtendedHeader(int h, uint32_t tagSize, uint32_t* extendedSize) {
-    const long start = MEx_ftell(h);
+    const int64_t start = MEx_ftell(h);
     uint8_t raw[8];
     const int got = MEx_fread(raw, 1, sizeof raw, h);
     if (got < 4) return MM_E_FAIL;
@@ -55,7 +55,7 @@ int32_t SkipUnsyncExtendedHeader(int h, uint32_t tagSize, uint32_t* extendedSize
     Sync(plain, got);
     const uint32_t size = ReadBE32(plain);
     if (size == 0 || size > tagSize) return MM_E_FAIL;
-    const long bodyStart = start + static_cast<long>(RawSpan(raw, static_cast<uint32_t>(got), 4));
+    const int64_t bodyStart = start + static_cast<int64_t>(RawSpan(raw, static_cast<uint32_t>(got), 4));
     if (MEx_fseek(h, bodyStart, SEEK_SET) != 0) return MM_E_FAIL;
     // Up to twice the size in raw bytes, never more than the tag holds.
     const uint32_t want = static_cast<uint32_t>(std::min<uint64_t>(uint64_t(size) * 2, tagSize));
@@ -64,7 +64,7 @@ int32_t SkipUnsyncExtendedHeader(int h, uint32_t tagSize, uint32_t* extendedSize
     const int read = MEx_fread(scratch, 1, want, h);
     const uint32_t span = read > 0 ? RawSpan(scratch, static_cast<uint32_t>(read), size) : 0;
     delete[] scratch;
-    if (MEx_fseek(h, bodyStart + static_cast<long>(span), SEEK_SET) != 0) return MM_E_FAIL;
+    if (MEx_fseek(h, bodyStart + static_cast<int64_t>(span), SEEK_SET) != 0) return MM_E_FAIL;
     *extendedSize = size;
     return MM_OK;
 }
@@ -79,7 +79,7 @@ void SetV24Encoding(_MMMetaItem* item, uint8_t encodingByte) {
 // Passes over a frame body that fills nothing. Where a short body fails the
 // tag (v2.4) the bytes are read through a small block, else the file seeks.
 bool PassOver(int h, uint32_t size, bool mustBePresent) {
-    if (!mustBePresent) return MEx_fseek(h, static_cast<long>(size), SEEK_CUR) == 0;
+    if (!mustBePresent) return MEx_fseek(h, static_cast<int64_t>(size), SEEK_CUR) == 0;
     uint8_t block[4096];
     while (size > 0) {
         const uint32_t want = std::min<uint32_t>(size, sizeof block);
@@ -220,9 +220,9 @@ int32_t ParseFrames(int h, ID3_MetaInfo* ctx) {
         const bool unsync = v24 ? ((flags & 0x02) != 0 || ctx->unsync != 0) : ctx->unsync != 0;
 
         if (id == FrameId("APIC")) {
-            const long bodyStart = MEx_ftell(h);
+            const int64_t bodyStart = MEx_ftell(h);
             if (GetPicData(h, size, ctx, unsync) == MM_E_OUTOFMEMORY) return MM_E_FAIL;
-            if (MEx_fseek(h, bodyStart + static_cast<long>(size), SEEK_SET) != 0) return MM_E_FAIL;
+            if (MEx_fseek(h, bodyStart + static_cast<int64_t>(size), SEEK_SET) != 0) return MM_E_FAIL;
             continue;
         }
         if (!IsTableFrame(id)) {
@@ -274,7 +274,7 @@ int32_t ParseV2Header(int h, ID3_MetaInfo* ctx) {
             uint8_t field[4];
             if (MEx_fread(field, 1, 4, h) != 4) return MM_E_FAIL;
             extendedSize = ReadBE32(field);
-            if (MEx_fseek(h, static_cast<long>(extendedSize), SEEK_CUR) != 0) return MM_E_FAIL;
+            if (MEx_fseek(h, static_cast<int64_t>(extendedSize), SEEK_CUR) != 0) return MM_E_FAIL;
         } else {
             const int32_t skipped = SkipUnsyncExtendedHeader(h, tagSize, &extendedSize);
             if (skipped != MM_OK) return skipped;
@@ -298,9 +298,9 @@ int32_t ParseID3V2_2(int h, ID3_MetaInfo* ctx) {
         ctx->remaining -= kV22FrameHeaderSize + size;
         if (size == 0) continue;
         if (id == FrameId("PIC")) {
-            const long bodyStart = MEx_ftell(h);
+            const int64_t bodyStart = MEx_ftell(h);
             if (GetPicData(h, size, ctx, ctx->unsync != 0) == MM_E_OUTOFMEMORY) return MM_E_FAIL;
-            if (MEx_fseek(h, bodyStart + static_cast<long>(size), SEEK_SET) != 0) return MM_E_FAIL;
+            if (MEx_fseek(h, bodyStart + static_cast<int64_t>(size), SEEK_SET) != 0) return MM_E_FAIL;
             continue;
         }
         if (!IsTableFrame(id)) {
@@ -345,7 +345,7 @@ int32_t ParseID3V2(int h, ID3_MetaInfo* ctx) {
 int32_t ParseID3V1(int h, _MMMetaInfo* meta) {
     if (meta == nullptr) return MM_E_INVALIDARG;
     uint8_t tag[kV1TagSize];
-    if (MEx_fseek(h, -static_cast<long>(kV1TagSize), SEEK_END) != 0 ||
+    if (MEx_fseek(h, -static_cast<int64_t>(kV1TagSize), SEEK_END) != 0 ||
         MEx_fread(tag, 1, kV1TagSize, h) != static_cast<int>(kV1TagSize)) {
         return MM_E_OUTOFMEMORY;
     }
@@ -400,9 +400,8 @@ int32_t ParseID3V1(int h, _MMMetaInfo* meta) {
 
 int32_t ID3_InitMetaData(const char* path, _MMMetaInfo* meta, ID3_MetaInfo* ctx, int pictureLimit) {
     if (meta == nullptr || ctx == nullptr) return MM_E_INVALIDARG;
-    struct stat st;
-    std::memset(&st, 0, sizeof st);
-    const uint32_t fileSize = path != nullptr && MEx_stat(path, &st) == 0 ? static_cast<uint32_t>(st.st_size) : 0;
+    uint64_t size = 0;
+    const uint32_t fileSize = path != nullptr && MEx_fsize(path, &size) ? SaturateU32(size) : 0;
     ctx->meta = meta;
     ctx->sizeBound = fileSize;
     ctx->remaining = 0;

@@ -20,7 +20,7 @@ constexpr int kConstantKind = 1;
 // First frame sync at or after offset within one 4096-byte window; without
 // one the offset moves past what was read.
 uint32_t NextFrameSync(int h, uint32_t offset) {
-    if (MEx_fseek(h, static_cast<long>(offset), SEEK_SET) != 0) return offset;
+    if (MEx_fseek(h, static_cast<int64_t>(offset), SEEK_SET) != 0) return offset;
     uint8_t buf[kBlockSize];
     const int got = MEx_fread(buf, 1, kBlockSize, h);
     if (got <= 0) return offset;
@@ -45,7 +45,7 @@ bool WriteAll(int out, const uint8_t* bytes, uint32_t n) {
 
 // Copies n bytes of the source from offset to the output, in blocks.
 bool CopyBytes(int h, int out, uint32_t offset, uint32_t n, uint8_t* block) {
-    if (MEx_fseek(h, static_cast<long>(offset), SEEK_SET) != 0) return false;
+    if (MEx_fseek(h, static_cast<int64_t>(offset), SEEK_SET) != 0) return false;
     uint32_t copied = 0;
     while (copied < n) {
         const uint32_t want = std::min(kBlockSize, n - copied);
@@ -59,7 +59,7 @@ bool CopyBytes(int h, int out, uint32_t offset, uint32_t n, uint8_t* block) {
 
 int32_t WriteTrailingTag(int h, int out, const _MP3AudioInfo* info, uint8_t* block) {
     if (info->tagBytes < 1) return MM_OK;
-    if (MEx_fseek(h, -static_cast<long>(info->tagBytes), SEEK_END) != 0) return MM_E_FAIL;
+    if (MEx_fseek(h, -static_cast<int64_t>(info->tagBytes), SEEK_END) != 0) return MM_E_FAIL;
     const int got = MEx_fread(block, 1, kBlockSize, h);
     if (got != 128) return MM_E_FAIL;
     return WriteAll(out, block, 128) ? MM_OK : MM_E_FAIL;
@@ -110,7 +110,7 @@ void WriteXingHeader(int h, int out, const _MP3AudioInfo* info, uint8_t* scratch
                      uint32_t byteSpan) {
     const uint32_t head = std::min<uint32_t>(info->xingOffset + 4, kBlockSize);
     uint32_t written = 0;
-    if (MEx_fseek(h, static_cast<long>(info->firstFrameOffset), SEEK_SET) == 0) {
+    if (MEx_fseek(h, static_cast<int64_t>(info->firstFrameOffset), SEEK_SET) == 0) {
         const int got = MEx_fread(scratch, 1, head, h);
         if (got > 0 && WriteAll(out, scratch, static_cast<uint32_t>(got))) written = static_cast<uint32_t>(got);
     }
@@ -198,7 +198,7 @@ int32_t GetAudioData_MP3(const char* path, int startSec, int endSec, void* targe
             unsigned char* data = new (std::nothrow) unsigned char[bytes];
             if (data == nullptr) {
                 result = MM_E_FAIL;
-            } else if (MEx_fseek(h, static_cast<long>(range.start), SEEK_SET) != 0 ||
+            } else if (MEx_fseek(h, static_cast<int64_t>(range.start), SEEK_SET) != 0 ||
                        MEx_fread(data, 1, bytes, h) != static_cast<int>(bytes)) {
                 delete[] data;
                 result = MM_E_FAIL;

@@ -72,7 +72,7 @@ int32_t CheckID3Header(int h) {
     if (MEx_fseek(h, 0, SEEK_SET) != 0) return MM_E_FAIL;
     uint8_t block[kID3ProbeSize];
     for (int round = 1; round <= kMaxID3Rounds; ++round) {
-        const long start = MEx_ftell(h);
+        const int64_t start = MEx_ftell(h);
         const int n = MEx_fread(block, 1, kID3ProbeSize, h);
         if (n <= 9) return MM_E_FAIL;
         if (n == kID3HeaderSize) {
@@ -86,7 +86,7 @@ int32_t CheckID3Header(int h) {
         }
         const uint32_t size = ReadSyncsafe32(block + k + 6);
         if (size > 0) {
-            long skip = static_cast<long>(k) + kID3HeaderSize + static_cast<long>(size);
+            int64_t skip = static_cast<int64_t>(k) + kID3HeaderSize + static_cast<int64_t>(size);
             if (block[k + 5] & 0x10) skip += kID3HeaderSize;  // footer
             MEx_fseek(h, start + skip, SEEK_SET);
         }
@@ -99,7 +99,7 @@ int32_t CheckID3Header(int h) {
 int32_t VerifyMP3(int h, const uint8_t* /*probe*/, _FrameHeader_Info* info) {
     int32_t result = CheckID3Header(h);
     if (result != MM_OK) return result;
-    const long start = MEx_ftell(h);
+    const int64_t start = MEx_ftell(h);
     std::vector<uint8_t> buf(kSyncWindow);
     const int n = MEx_fread(buf.data(), 1, kSyncWindow, h);
     if (n < 4) return MM_E_FAIL;

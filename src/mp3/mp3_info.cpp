@@ -61,7 +61,7 @@ uint32_t XingDistance(const _FrameHeader_Info& header) {
 }
 
 uint32_t TrailingTagBytes(int h) {
-    if (MEx_fseek(h, -static_cast<long>(kV1TagSize), SEEK_END) != 0) return 0;
+    if (MEx_fseek(h, -static_cast<int64_t>(kV1TagSize), SEEK_END) != 0) return 0;
     uint8_t tag[3];
     if (MEx_fread(tag, 1, 3, h) != 3) return 0;
     return BytesEqual(tag, "TAG", 3) ? kV1TagSize : 0;
@@ -103,7 +103,7 @@ int32_t FillCodecType(_MM_CODECTYPE* codec, const _FrameHeader_Info& header) {
 }  // namespace
 
 int32_t GetAvBitrate(int h, uint32_t start, int /*unused*/) {
-    if (MEx_fseek(h, static_cast<long>(start), SEEK_SET) != 0) return 0;
+    if (MEx_fseek(h, static_cast<int64_t>(start), SEEK_SET) != 0) return 0;
     uint8_t buf[kScanWindow];
     const int got = MEx_fread(buf, 1, kScanWindow, h);
     const int n = got - 4;  // a header needs four bytes
@@ -239,16 +239,15 @@ int32_t GetMediaInfo_MP3(const char* path, void* out, int request) {
     if (h == 0) return MM_E_FAIL;
     FileCloser closer(h);
 
-    struct stat st;
-    std::memset(&st, 0, sizeof st);
-    const uint32_t fileSize = MEx_stat(path, &st) == 0 ? static_cast<uint32_t>(st.st_size) : 0;
+    uint64_t size = 0;
+    const uint32_t fileSize = MEx_fsize(path, &size) ? SaturateU32(size) : 0;
     uint8_t probe[128];
     const int probed = MEx_fread(probe, 1, sizeof probe, h);
     if (probed < static_cast<int>(kMinProbe)) return MM_E_FAIL;
     int32_t result = VerifyMP3(h, probe, &header);
     if (result != MM_OK) return result;
     const uint32_t tagBytes = TrailingTagBytes(h);
-    if (MEx_fseek(h, static_cast<long>(header.firstFrameOffset), SEEK_SET) != 0) return MM_E_FAIL;
+    if (MEx_fseek(h, static_cast<int64_t>(header.firstFrameOffset), SEEK_SET) != 0) return MM_E_FAIL;
 
     uint8_t* frame = new (std::nothrow) uint8_t[kScanWindow];
     if (frame == nullptr) return MM_E_OUTOFMEMORY;

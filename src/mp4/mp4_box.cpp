@@ -10,14 +10,13 @@
 
 namespace metainfo {
 
-int64_t Tell(int h) { return static_cast<int64_t>(MEx_ftell(h)); }
+int64_t Tell(int h) { return MEx_ftell(h); }
 
 void SeekTo(int h, int64_t pos) {
-    // Past the end of the file nothing more can be read; clamping keeps the
-    // offset within a long on 32-bit hosts.
+    // Past the end of the file nothing more can be read.
     if (pos > static_cast<int64_t>(s_mp4FileSize)) pos = s_mp4FileSize;
     if (pos < 0) pos = 0;
-    MEx_fseek(h, static_cast<long>(pos), SEEK_SET);
+    MEx_fseek(h, pos, SEEK_SET);
 }
 
 bool BadBoxSize(uint32_t size) { return size == 0 || size >= s_mp4FileSize; }
@@ -52,16 +51,21 @@ int32_t ReadWholeBox(int h, uint32_t type, int32_t badBox, int32_t noMemory, Box
 }
 
 int getBoxHeader(int h, _BOXHEADER* header) {
-    header->size = GetUINT32(h, false);
-    header->type = GetUINT32(h, false);
-    if (header->size == 1) {
-        header->largeSizeHigh = GetUINT32(h, false);
-        header->largeSizeLow = GetUINT32(h, false);
+    uint8_t b[8] = {};
+    const bool whole = MEx_fread(b, 1, sizeof b, h) == static_cast<int>(sizeof b);
+    header->size = ReadBE32(b);
+    header->type = ReadBE32(b + 4);
+    if (whole && header->size == 1) {
+        uint8_t large[8] = {};
+        const int got = MEx_fread(large, 1, sizeof large, h);
+        header->largeSizeHigh = ReadBE32(large);
+        header->largeSizeLow = ReadBE32(large + 4);
         // Only the lower word counts: files of 4 GiB and more are refused anyway.
         header->size = header->largeSizeLow;
-        MEx_fseek(h, -8, SEEK_CUR);
+        if (got > 0) MEx_fseek(h, -got, SEEK_CUR);
+        if (got != static_cast<int>(sizeof large)) return 0;
     }
-    return 0;
+    return whole ? 8 : 0;
 }
 
 int AnaBox(const uint8_t* buf, size_t avail, _MP4BOX* box) {

@@ -97,7 +97,10 @@ bool ReadBoxBuffer(int h, uint32_t size, BoxBuffer* out);
 // box (badBox) and a buffer it cannot have (noMemory). *size: the box's size.
 int32_t ReadWholeBox(int h, uint32_t type, int32_t badBox, int32_t noMemory, BoxBuffer* buf, uint32_t* size);
 
-// Box headers.
+// Box headers. Reads the header at the current position and leaves the
+// stream after its first 8 bytes. Bytes missing at the end of the file read
+// as 0, and the result is then 0 instead of 8: a walk must stop there, as the
+// box's start can no longer be told from the stream's position.
 int getBoxHeader(int h, _BOXHEADER* header);
 // Header length (8, 16; "uuid" 12 or 20), 1 for a size of 0, 0 when the
 // buffer is too short for the header.
@@ -118,11 +121,11 @@ bool BadBoxSize(uint32_t size);
 // MM_E_FAIL.
 template <typename Visit>
 int32_t WalkChildren(int h, int64_t end, Visit&& visit) {
-    while (Tell(h) < end) {
+    // Each child has a size of at least 1 and starts before the file's end,
+    // so every step moves strictly forward.
+    for (int64_t start = Tell(h); start >= 0 && start < end; start = Tell(h)) {
         _BOXHEADER child{};
-        getBoxHeader(h, &child);
-        if (BadBoxSize(child.size)) return MM_E_FAIL;
-        const int64_t start = Tell(h) - 8;
+        if (getBoxHeader(h, &child) == 0 || BadBoxSize(child.size)) return MM_E_FAIL;
         SeekTo(h, start);
         visit(child.type, start, child.size);
         SeekTo(h, start + child.size);

@@ -136,11 +136,10 @@ int32_t AnaMaker(int h, _MAKERINFO* maker) {
     _SMARTALBUM salb;
     const int64_t end = start + header.size;
     SeekTo(h, start + 12);  // after the version/flags word
-    while (Tell(h) < end && !MEx_feof(h)) {
+    for (int64_t childStart = Tell(h); childStart >= 0 && childStart < end && !MEx_feof(h);
+         childStart = Tell(h)) {
         _BOXHEADER child{};
-        getBoxHeader(h, &child);
-        if (BadBoxSize(child.size)) return MM_E_FAIL;
-        const int64_t childStart = Tell(h) - 8;
+        if (getBoxHeader(h, &child) == 0 || BadBoxSize(child.size)) return MM_E_FAIL;
         SeekTo(h, childStart);
         switch (child.type) {
             case FourCC("salb"): AnaSalb(h, &salb); break;

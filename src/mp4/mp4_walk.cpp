@@ -241,26 +241,27 @@ int32_t AnaHdlr(int h, uint32_t* handlerType) {
 }
 
 int32_t MP4_ParseFile(int h, int mode, void* out) {
+    // A descriptor's stream may start anywhere: the first box is where it stands.
+    const int64_t origin = Tell(h);
     _BOXHEADER first{};
     getBoxHeader(h, &first);
     if (BadBoxSize(first.size)) return MM_E_FAIL;
     _FILETYPEBOX ftyp;
     std::memset(&ftyp, 0, sizeof ftyp);
     if (first.type == FourCC("ftyp")) {
-        MEx_fseek(h, -8, SEEK_CUR);
+        SeekTo(h, origin);
         BoxBuffer buf;
         if (!ReadBoxBuffer(h, first.size, &buf)) return MM_E_OUTOFMEMORY;
         AnaFileType(buf.data, buf.size, &ftyp);
     } else if (first.type == FourCC("mdat")) {
-        MEx_fseek(h, -8, SEEK_CUR);
+        SeekTo(h, origin);
     } else {
         return kMp4BadFirstBox;
     }
     for (;;) {
+        const int64_t start = Tell(h);
         _BOXHEADER box{};
-        getBoxHeader(h, &box);
-        if (BadBoxSize(box.size)) break;
-        const int64_t start = Tell(h) - 8;
+        if (start < 0 || getBoxHeader(h, &box) == 0 || BadBoxSize(box.size)) break;
         SeekTo(h, start);
         if (box.type == FourCC("moov")) {
             AnaMoov(h, mode, out);

@@ -45,7 +45,7 @@ private:
     unsigned char* data_ = nullptr;
 };
 
-uint64_t Left(uint64_t fileSize, long start) {
+uint64_t Left(uint64_t fileSize, int64_t start) {
     return start >= 0 && uint64_t(start) < fileSize ? fileSize - uint64_t(start) : 0;
 }
 
@@ -163,7 +163,7 @@ int32_t RM_GetMediaInfo(const char* path, uint16_t request, void* out) {
     if (!ReadTag(h, tag) || std::memcmp(tag, "PROP", 4) != 0) return kRmBadHeader;
     size = GetUINT32(h, false);
     if (size < 1 || size >= fileSize) return kRmNotRealMedia;
-    long propStart = MEx_ftell(h) - 8;
+    int64_t propStart = MEx_ftell(h) - 8;
     MEx_fseek(h, -8, SEEK_CUR);
     r = chunk.Read(h, size, kPropFieldBytes, Left(fileSize, propStart));
     if (r != 0) return r;
@@ -174,7 +174,7 @@ int32_t RM_GetMediaInfo(const char* path, uint16_t request, void* out) {
     uint32_t taken = 0;
     int32_t contentResult = -1;
     for (uint32_t k = 0; k + 2 < headerCount; ++k) {
-        long start = MEx_ftell(h);
+        int64_t start = MEx_ftell(h);
         if (start < 0) return kRmBadChunk;
         unsigned char id[4] = {};
         MEx_fread(id, 1, 4, h);
@@ -199,7 +199,7 @@ int32_t RM_GetMediaInfo(const char* path, uint16_t request, void* out) {
             // A skip past the end is only noticed when another header must be
             // read there: its size then reads as 0 and is rejected.
             uint64_t next = uint64_t(start) + size;
-            if (MEx_fseek(h, static_cast<long>(next), SEEK_SET) != 0) return kRmBadChunk;
+            if (MEx_fseek(h, static_cast<int64_t>(next), SEEK_SET) != 0) return kRmBadChunk;
         }
     }
 
@@ -261,8 +261,8 @@ int32_t RM_GetCodecType(const char* path, _MM_CODECTYPE* codec) {
 int32_t RM_GetClipInfo(const char* path, _MMClipInfo* clip) {
     int32_t r = RM_GetMediaInfo(path, INFO_CLIPINFO, clip);
     if (r != 0) return r;
-    struct stat st;
-    if (MEx_stat(path, &st) == 0) clip->nFileSize = static_cast<uint32_t>(st.st_size);
+    uint64_t size = 0;
+    if (MEx_fsize(path, &size)) clip->nFileSize = SaturateU32(size);
     return CopyExtensionAsFormat(path, clip->szFormat);
 }
 

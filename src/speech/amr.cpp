@@ -50,7 +50,7 @@ uint32_t FrameSizeOf(int kind, int frameType) {
 }
 
 bool SeekTo(int h, uint64_t pos) {
-    return pos <= static_cast<uint64_t>(LONG_MAX) && MEx_fseek(h, static_cast<long>(pos), 0) == 0;
+    return pos <= static_cast<uint64_t>(LONG_MAX) && MEx_fseek(h, static_cast<int64_t>(pos), 0) == 0;
 }
 
 // The magic and the first frame header of what was read from the file.
@@ -150,7 +150,7 @@ int32_t GetMediaInfo_AMR(const char* path, void* out, int request) {
     int32_t result = ParseAmrHead(buffer.get(), static_cast<size_t>(got), &frame);
     if (result != MM_OK) return result;
     if (MEx_fseek(h, 0, 2) != 0) return MM_E_FAIL;
-    long end = MEx_ftell(h);
+    int64_t end = MEx_ftell(h);
     uint64_t fileSize = end > 0 ? static_cast<uint64_t>(end) : 0;
     uint64_t payload = fileSize > frame.nHeaderLen ? fileSize - frame.nHeaderLen : 0;
 
@@ -170,7 +170,7 @@ int32_t GetMediaInfo_AMR(const char* path, void* out, int request) {
         case INFO_CLIPINFO: {
             _MMClipInfo* clip = static_cast<_MMClipInfo*>(out);
             std::memset(clip, 0, sizeof *clip);
-            clip->nFileSize = static_cast<uint32_t>(fileSize);
+            clip->nFileSize = SaturateU32(fileSize);
             bool wide = IsWideBand(frame.nFileType);
             std::strcpy(clip->szFormat, wide ? "awb" : "amr");
             clip->nSampleRate = wide ? 16000 : 8000;

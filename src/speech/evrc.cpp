@@ -33,12 +33,12 @@ int32_t EVRC_GetClipInfo(const char* path, _MMClipInfo* clip) {
     uint32_t duration = static_cast<uint32_t>(packets / 50);
     // The bit rate is taken in signed 32 bits, as callers have always seen it;
     // a clip under one second has none.
-    int64_t bits = static_cast<int32_t>(static_cast<uint32_t>(fileSize) * 8u);
+    int64_t bits = static_cast<int32_t>(SaturateU32(fileSize) * 8u);
     uint32_t bitrate = duration != 0 ? static_cast<uint32_t>(bits / static_cast<int32_t>(duration)) : 0;
     clip->nAudioBitrate = bitrate;
     clip->nBitrate = bitrate;
     clip->nDuration = duration;
-    clip->nFileSize = static_cast<uint32_t>(fileSize);
+    clip->nFileSize = SaturateU32(fileSize);
     clip->nSampleRate = 8000;
     clip->bHasAudio = 1;
     return CopyExtensionAsFormat(path, clip->szFormat);

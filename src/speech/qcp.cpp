@@ -21,7 +21,7 @@ constexpr uint32_t kCodecQcelp = 1;
 constexpr uint32_t kCodecEvrc = 2;
 
 bool SeekTo(int h, uint64_t pos) {
-    return pos <= static_cast<uint64_t>(LONG_MAX) && MEx_fseek(h, static_cast<long>(pos), 0) == 0;
+    return pos <= static_cast<uint64_t>(LONG_MAX) && MEx_fseek(h, static_cast<int64_t>(pos), 0) == 0;
 }
 
 // Whole seconds from the file size and the "fmt " average bit rate. The
@@ -111,7 +111,7 @@ int32_t QCP_GetMediaInfo(const char* path, int request, void* out) {
     if (MEx_stat(path, &st) != 0) return MM_E_FAIL;
     uint64_t fileSize = st.st_size > 0 ? static_cast<uint64_t>(st.st_size) : 0;
     _MMClipInfo* clip = request == INFO_CLIPINFO ? static_cast<_MMClipInfo*>(out) : nullptr;
-    if (clip != nullptr) clip->nFileSize = static_cast<uint32_t>(fileSize);
+    if (clip != nullptr) clip->nFileSize = SaturateU32(fileSize);
 
     uint32_t riff = GetUINT32(h, false);
     GetUINT32(h, true);   // RIFF size
@@ -124,7 +124,7 @@ int32_t QCP_GetMediaInfo(const char* path, int request, void* out) {
         uint32_t id = GetUINT32(h, false);
         uint32_t size = GetUINT32(h, true);
         if (size > fileSize) return MM_E_FAIL;
-        long after = MEx_ftell(h);
+        int64_t after = MEx_ftell(h);
         if (after < 0) return MM_E_FAIL;
         // Only a header read in full can name a chunk that is dispatched.
         uint64_t chunkStart = after >= 8 ? static_cast<uint64_t>(after) - 8 : 0;
@@ -146,10 +146,10 @@ int32_t QCP_GetMediaInfo(const char* path, int request, void* out) {
 
     if (clip == nullptr) return MM_OK;
     if (clip->nDuration == 0 && clip->nAudioBitrate != 0) {
-        clip->nDuration = DurationFromBitrate(static_cast<uint32_t>(fileSize), clip->nAudioBitrate);
+        clip->nDuration = DurationFromBitrate(SaturateU32(fileSize), clip->nAudioBitrate);
     }
     clip->nBitrate = clip->nAudioBitrate;
-    clip->nFileSize = static_cast<uint32_t>(fileSize);
+    clip->nFileSize = SaturateU32(fileSize);
     clip->bHasAudio = 1;
     return CopyExtensionAsFormat(path, clip->szFormat);
 }

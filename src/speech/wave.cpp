@@ -21,7 +21,7 @@ const char* const szWAVEMimeType[] = {"audio/L8", "audio/L16", "audio/pcma", "au
 bool KnownFormatTag(uint16_t tag) { return tag == 1 || tag == 2 || tag == 6 || tag == 7; }
 
 bool SeekTo(int h, uint64_t pos) {
-    return pos <= static_cast<uint64_t>(LONG_MAX) && MEx_fseek(h, static_cast<long>(pos), 0) == 0;
+    return pos <= static_cast<uint64_t>(LONG_MAX) && MEx_fseek(h, static_cast<int64_t>(pos), 0) == 0;
 }
 
 bool WriteAll(int out, const void* bytes, size_t n) {
@@ -129,7 +129,7 @@ int32_t GetMediaInfo_WAVE(const char* path, void* out, int request) {
     int32_t result = ParseFormatChunk(buffer.get(), static_cast<size_t>(got), &fmt);
     if (result != MM_OK) return result;
     if (MEx_fseek(h, 0, 2) != 0) return MM_E_FAIL;
-    long end = MEx_ftell(h);
+    int64_t end = MEx_ftell(h);
     uint64_t fileSize = end > 0 ? static_cast<uint64_t>(end) : 0;
 
     switch (request) {
@@ -137,7 +137,7 @@ int32_t GetMediaInfo_WAVE(const char* path, void* out, int request) {
             _MMClipInfo* clip = static_cast<_MMClipInfo*>(out);
             std::memset(clip, 0, sizeof *clip);
             std::strcpy(clip->szFormat, "wav");
-            clip->nFileSize = static_cast<uint32_t>(fileSize);
+            clip->nFileSize = SaturateU32(fileSize);
             // 32-bit products, as callers have always seen them.
             clip->nAudioBitrate = fmt.nAvgBytesPerSec * 8u;
             clip->nBitrate = clip->nAudioBitrate;
