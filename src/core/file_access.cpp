@@ -253,6 +253,10 @@ int MEx_stat(const char* path, struct stat* st) {
     return ::stat(path, st);
 }
 
+bool SeekToOffset(int h, uint64_t pos) {
+    return pos <= static_cast<uint64_t>(INT64_MAX) && MEx_fseek(h, static_cast<int64_t>(pos), SEEK_SET) == 0;
+}
+
 bool MEx_fsize(const char* path, uint64_t* size) {
     struct stat st;
     if (MEx_stat(path, &st) != 0 || st.st_size < 0) return false;

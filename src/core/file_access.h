@@ -29,6 +29,10 @@ int MEx_stat(const char* path, struct stat* st);
 // caller's descriptor open.
 int MEx_fdopen(int fd, const char* mode);
 
+// Moves to an absolute offset; false when it cannot be a file position or
+// the seek fails.
+bool SeekToOffset(int h, uint64_t pos);
+
 // Size in bytes of the file at path, as MEx_stat reports it; false when the
 // path cannot be looked at.
 bool MEx_fsize(const char* path, uint64_t* size);

@@ -1,7 +1,6 @@
 // RealMedia: one walk over the header chunks answers each request.
 #include "realmedia/rm_parser.h"
 
-#include <sys/stat.h>
 
 #include <cstdio>
 #include <cstring>
@@ -144,15 +143,14 @@ int32_t RM_GetMediaInfo(const char* path, uint16_t request, void* out) {
     int h = MEx_fopen(path, "rb");
     if (h == 0) return kRmNotRealMedia;
     FileCloser closer(h);
-    struct stat st;
-    if (MEx_stat(path, &st) != 0 || st.st_size < 0) return kRmNotRealMedia;
-    uint64_t fileSize = static_cast<uint64_t>(st.st_size);
+    uint64_t fileSize = 0;
+    if (!MEx_fsize(path, &fileSize)) return kRmNotRealMedia;
 
     unsigned char tag[4];
     if (!ReadTag(h, tag) || std::memcmp(tag, ".RMF", 4) != 0) return kRmNotRealMedia;
     uint32_t size = GetUINT32(h, false);
     if (size < 1 || size >= fileSize) return kRmNotRealMedia;
-    MEx_fseek(h, -8, SEEK_CUR);
+    MEx_fseek(h, 0, SEEK_SET);
     ChunkBuffer chunk;
     int32_t r = chunk.Read(h, size, kRmfFieldBytes, fileSize);
     if (r != 0) return r;
@@ -160,11 +158,11 @@ int32_t RM_GetMediaInfo(const char* path, uint16_t request, void* out) {
     uint32_t headerCount = ReadBE32(chunk.data() + 14);
     if (version > 1 || headerCount < 3) return kRmBadHeader;
 
-    if (!ReadTag(h, tag) || std::memcmp(tag, "PROP", 4) != 0) return kRmBadHeader;
+    const int64_t propStart = MEx_ftell(h);
+    if (propStart < 0 || !ReadTag(h, tag) || std::memcmp(tag, "PROP", 4) != 0) return kRmBadHeader;
     size = GetUINT32(h, false);
     if (size < 1 || size >= fileSize) return kRmNotRealMedia;
-    int64_t propStart = MEx_ftell(h) - 8;
-    MEx_fseek(h, -8, SEEK_CUR);
+    MEx_fseek(h, propStart, SEEK_SET);
     r = chunk.Read(h, size, kPropFieldBytes, Left(fileSize, propStart));
     if (r != 0) return r;
     _PROPERTIES prop;

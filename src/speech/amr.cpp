@@ -49,10 +49,6 @@ uint32_t FrameSizeOf(int kind, int frameType) {
     return IsWideBand(kind) ? kWbFrameSize[frameType] : kNbFrameSize[frameType];
 }
 
-bool SeekTo(int h, uint64_t pos) {
-    return pos <= static_cast<uint64_t>(LONG_MAX) && MEx_fseek(h, static_cast<int64_t>(pos), 0) == 0;
-}
-
 // The magic and the first frame header of what was read from the file.
 int32_t ParseAmrHead(const uint8_t* buf, size_t length, _AMR_FrameInfo* info) {
     std::memset(info, 0, sizeof *info);
@@ -229,7 +225,7 @@ int32_t GetAudioData_AMR(const char* path, int startSec, int endSec, unsigned ch
     FileCloser sourceCloser(source);
 
     if (mode == kAmrToBuffer) {
-        if (!SeekTo(source, begin)) return MM_E_FAIL;
+        if (!SeekToOffset(source, begin)) return MM_E_FAIL;
         unsigned char* buffer = new (std::nothrow) unsigned char[length];
         if (buffer == nullptr) return MM_E_FAIL;
         *data = buffer;
@@ -252,7 +248,7 @@ int32_t GetAudioData_AMR(const char* path, int startSec, int endSec, unsigned ch
     }
     std::unique_ptr<uint8_t[]> chunk(new (std::nothrow) uint8_t[kAmrCopyChunk]);
     if (!chunk) return MM_E_FAIL;
-    if (!SeekTo(source, begin)) return MM_E_FAIL;
+    if (!SeekToOffset(source, begin)) return MM_E_FAIL;
     uint64_t left = length;
     while (left > 0) {
         size_t want = left < kAmrCopyChunk ? static_cast<size_t>(left) : kAmrCopyChunk;

@@ -2,7 +2,6 @@
 
 #include <sys/stat.h>
 
-#include <climits>
 #include <cstring>
 
 #include "core/file_access.h"
@@ -20,10 +19,6 @@ constexpr uint32_t FourCC(const char (&s)[5]) {
 constexpr uint32_t kCodecQcelp = 1;
 constexpr uint32_t kCodecEvrc = 2;
 
-bool SeekTo(int h, uint64_t pos) {
-    return pos <= static_cast<uint64_t>(LONG_MAX) && MEx_fseek(h, static_cast<int64_t>(pos), 0) == 0;
-}
-
 // Whole seconds from the file size and the "fmt " average bit rate. The
 // product is taken in signed 32 bits, as callers have always seen it.
 uint32_t DurationFromBitrate(uint32_t fileSize, uint32_t avgBitrate) {
@@ -38,7 +33,7 @@ void RememberCodec(QcpCodec codec) {
 }
 
 int32_t parseFmt(int h, int request, void* out, uint64_t chunkStart, uint64_t fileSize) {
-    if (!SeekTo(h, chunkStart)) return MM_E_FAIL;
+    if (!SeekToOffset(h, chunkStart)) return MM_E_FAIL;
     uint32_t id = GetUINT32(h, false);
     uint32_t size = GetUINT32(h, true);
     if (id != FourCC("fmt ")) return MM_E_FAIL;
@@ -48,7 +43,7 @@ int32_t parseFmt(int h, int request, void* out, uint64_t chunkStart, uint64_t fi
     uint8_t chunk[kQcpFmtChunkBytes];
     uint64_t wanted = 8 + static_cast<uint64_t>(size);
     size_t length = wanted < sizeof chunk ? static_cast<size_t>(wanted) : sizeof chunk;
-    if (!SeekTo(h, chunkStart)) return MM_E_FAIL;
+    if (!SeekToOffset(h, chunkStart)) return MM_E_FAIL;
     if (MEx_fread(chunk, 1, static_cast<unsigned>(length), h) != static_cast<int>(length)) return MM_E_FAIL;
     _QCPFMT fmt;
     parseFMTInfo(chunk, length, &fmt);
@@ -68,7 +63,7 @@ int32_t parseFmt(int h, int request, void* out, uint64_t chunkStart, uint64_t fi
 }
 
 int32_t parseVrat(int h, _MMClipInfo* clip, uint64_t chunkStart) {
-    if (!SeekTo(h, chunkStart)) return MM_E_FAIL;
+    if (!SeekToOffset(h, chunkStart)) return MM_E_FAIL;
     uint32_t id = GetUINT32(h, false);
     GetUINT32(h, true);  // size
     if (id != FourCC("vrat")) return MM_E_FAIL;
@@ -82,7 +77,7 @@ int QcelpPayload(uint8_t rate) { return rate > 7 ? -1 : QCELP_Rate_Table[rate]; 
 int EvrcInQcpPayload(uint8_t rate) { return rate > 5 ? -1 : EVRC_Rate_Table[rate]; }
 
 int32_t parseData(int h, _MMClipInfo* clip, uint64_t chunkStart, uint64_t fileSize) {
-    if (!SeekTo(h, chunkStart)) return MM_E_FAIL;
+    if (!SeekToOffset(h, chunkStart)) return MM_E_FAIL;
     uint32_t id = GetUINT32(h, false);
     GetUINT32(h, true);  // size: the walk runs to the end of the file
     if (id != FourCC("data")) return MM_E_FAIL;
@@ -141,7 +136,7 @@ int32_t QCP_GetMediaInfo(const char* path, int request, void* out) {
         next = static_cast<uint64_t>(after) + size;
         // A file shorter than its reported size yields no header bytes: stop
         // rather than read the same place again.
-        if (next <= chunkPos || !SeekTo(h, next)) break;
+        if (next <= chunkPos || !SeekToOffset(h, next)) break;
     } while (next < fileSize && !MEx_feof(h));
 
     if (clip == nullptr) return MM_OK;

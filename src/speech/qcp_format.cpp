@@ -1,6 +1,5 @@
 #include "speech/qcp_format.h"
 
-#include <climits>
 #include <cstring>
 
 #include "core/byte_reader.h"
@@ -81,7 +80,7 @@ int32_t CountSpeechPackets(int h, uint64_t start, uint64_t end, PacketPayloadFn 
     uint64_t pos = start;
     while (pos < end) {
         if (pos < windowStart || pos - windowStart >= windowLength) {
-            if (pos > static_cast<uint64_t>(LONG_MAX) || MEx_fseek(h, static_cast<int64_t>(pos), 0) != 0) break;
+            if (!SeekToOffset(h, pos)) break;
             int n = MEx_fread(window, 1, sizeof window, h);
             if (n <= 0) break;  // the file ends before the size it reported
             windowStart = pos;

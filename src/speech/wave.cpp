@@ -20,10 +20,6 @@ const char* const szWAVEMimeType[] = {"audio/L8", "audio/L16", "audio/pcma", "au
 
 bool KnownFormatTag(uint16_t tag) { return tag == 1 || tag == 2 || tag == 6 || tag == 7; }
 
-bool SeekTo(int h, uint64_t pos) {
-    return pos <= static_cast<uint64_t>(LONG_MAX) && MEx_fseek(h, static_cast<int64_t>(pos), 0) == 0;
-}
-
 bool WriteAll(int out, const void* bytes, size_t n) {
     return n == 0 || MEx_fwrite(bytes, 1, static_cast<unsigned>(n), out) == static_cast<int>(n);
 }
@@ -199,7 +195,7 @@ int32_t GetAudioData_WAVE(const char* path, int startSec, int endSec, unsigned c
         unsigned char* buffer = new (std::nothrow) unsigned char[length]();
         if (buffer == nullptr) return MM_E_FAIL;
         *data = buffer;
-        if (SeekTo(source, begin)) MEx_fread(buffer, 1, static_cast<unsigned>(length), source);
+        if (SeekToOffset(source, begin)) MEx_fread(buffer, 1, static_cast<unsigned>(length), source);
         return MM_OK;
     }
     if (mode != kWaveToFile) return MM_E_FAIL;
@@ -219,7 +215,7 @@ int32_t GetAudioData_WAVE(const char* path, int startSec, int endSec, unsigned c
     word[3] = uint8_t(riffSize >> 24);
     if (!WriteAll(out, "RIFF", 4) || !WriteAll(out, word, 4)) return MM_E_FAIL;
     if (info.nDataOffset >= 9) {
-        if (!SeekTo(source, 8) || !CopyBytes(source, out, info.nDataOffset - 8u, chunk.get())) return MM_E_FAIL;
+        if (!SeekToOffset(source, 8) || !CopyBytes(source, out, info.nDataOffset - 8u, chunk.get())) return MM_E_FAIL;
     }
     uint32_t dataSize = static_cast<uint32_t>(length);
     word[0] = uint8_t(dataSize);
@@ -227,7 +223,7 @@ int32_t GetAudioData_WAVE(const char* path, int startSec, int endSec, unsigned c
     word[2] = uint8_t(dataSize >> 16);
     word[3] = uint8_t(dataSize >> 24);
     if (!WriteAll(out, "data", 4) || !WriteAll(out, word, 4)) return MM_E_FAIL;
-    if (!SeekTo(source, begin) || !CopyBytes(source, out, length, chunk.get())) return MM_E_FAIL;
+    if (!SeekToOffset(source, begin) || !CopyBytes(source, out, length, chunk.get())) return MM_E_FAIL;
     return MM_OK;
 }
 
