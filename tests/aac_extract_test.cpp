@@ -1,6 +1,7 @@
 // Range extraction from raw AAC files: proportional mapping, cuts at ADTS
 // sync words, the tag copies, the buffer trims and the rejected ranges.
 #include <gtest/gtest.h>
+#include <unistd.h>
 
 #include <algorithm>
 #include <cstdlib>
@@ -149,6 +150,13 @@ TEST(AacExtract, RejectedRangesAnswerOneAndCloseTheirFiles) {
         EXPECT_EQ(1, AAC_GetAuidoData_File(c.file->c_str(), c.start, c.end, out.c_str())) << *c.file << c.start;
         EXPECT_EQ(1, CutToBuffer(*c.file, c.start, c.end).result) << *c.file << c.start;
     }
+    // 64 MiB at 6250 bit/s: a late time times the size leaves 32 bits, so
+    // nothing is cut; an early one still is.
+    const std::string large = dir.Write("large.aac", HundredByteFrames(100));
+    ASSERT_EQ(0, ::truncate(large.c_str(), 64 << 20));
+    EXPECT_EQ(MM_E_UNSUPPORTED, AAC_GetAuidoData_File(large.c_str(), 0, 80000, out.c_str()));
+    EXPECT_EQ(MM_E_UNSUPPORTED, CutToBuffer(large, 0, 80000).result);
+    EXPECT_EQ(MM_OK, CutToBuffer(large, 0, 1).result);
     EXPECT_EQ(1, AAC_GetAuidoData_File(path.c_str(), 0, 1, dir.PathOf("no/such/dir.aac").c_str()));
     EXPECT_EQ(MM_E_INVALIDARG, AAC_GetAuidoData_Buf(path.c_str(), 0, 1, nullptr, nullptr));
     EXPECT_EQ(MM_OK, AAC_GetAuidoData_File(path.c_str(), 1, 4, out.c_str()));

@@ -2,7 +2,12 @@
  *
  * Times are whole seconds. The range is mapped to bytes in proportion to the
  * file's size and duration and moved to ADTS frame starts; frames are copied
- * as they are, without decoding. (The names are spelled "Auido".) */
+ * as they are, without decoding. (The names are spelled "Auido".)
+ *
+ * The offsets are time x file size / duration with the product taken in 32
+ * signed bits. Where that product would not fit (a late time in a file of a
+ * few megabytes or more), both functions answer 0x800700E7 and cut nothing,
+ * rather than cutting at a wrapped, wrong offset. */
 #ifndef METAINFO_AAC_H
 #define METAINFO_AAC_H
 

@@ -1,4 +1,5 @@
 // Copies of a time range of a raw AAC file, cut at ADTS frame starts.
+#include <cstdint>
 #include <cstdio>
 #include <cstring>
 #include <memory>
@@ -18,16 +19,18 @@ constexpr int kChunkSize = 8192;
 constexpr int kSyncMargin = 100;
 constexpr int64_t kTrailingTagSize = 128;
 
-// value x fileSize / duration. The product is a signed 32-bit value, wrapped
-// explicitly as the offsets have always been computed; the division is done
-// wider so that no quotient can fault.
-int32_t Proportional(int32_t value, uint32_t fileSize, int32_t duration) {
-    const int32_t product = static_cast<int32_t>(static_cast<uint32_t>(value) * fileSize);
-    return static_cast<int32_t>(static_cast<int64_t>(product) / duration);
+// value x fileSize / duration, with the product a signed 32-bit value as the
+// offsets have always been computed. Where the true product does not fit, the
+// wrapped one would name a wrong place in the file: false, and no offset.
+bool Proportional(int32_t value, uint32_t fileSize, int32_t duration, int32_t* offset) {
+    const int64_t product = static_cast<int64_t>(value) * static_cast<int64_t>(fileSize);
+    if (product > INT32_MAX || product < INT32_MIN) return false;
+    *offset = static_cast<int32_t>(product / duration);
+    return true;
 }
 
 // The byte offsets of a time range; 1 when the clip info fails or the range
-// is rejected.
+// is rejected, MM_E_UNSUPPORTED when its offsets do not fit the arithmetic.
 int32_t MapRange(const char* path, int startSec, int endSec, int32_t* startOffset, int32_t* endOffset,
                  uint32_t* fileSize) {
     _MMClipInfo clip;
@@ -37,8 +40,10 @@ int32_t MapRange(const char* path, int startSec, int endSec, int32_t* startOffse
     if (startSec >= endSec || duration <= startSec || std::strcmp(clip.szFormat, "aac") != 0) return 1;
     // Only a negative start reaches here with a zero duration: nothing to map.
     if (duration == 0) return 1;
-    *startOffset = Proportional(startSec, clip.nFileSize, duration);
-    *endOffset = Proportional(endSec < duration ? endSec : duration, clip.nFileSize, duration);
+    if (!Proportional(startSec, clip.nFileSize, duration, startOffset) ||
+        !Proportional(endSec < duration ? endSec : duration, clip.nFileSize, duration, endOffset)) {
+        return MM_E_UNSUPPORTED;
+    }
     *fileSize = clip.nFileSize;
     return MM_OK;
 }
@@ -114,7 +119,8 @@ extern "C" int32_t AAC_GetAuidoData_File(const char* path, int startSec, int end
     int32_t startOffset = 0;
     int32_t endOffset = 0;
     uint32_t fileSize = 0;
-    if (MapRange(path, startSec, endSec, &startOffset, &endOffset, &fileSize) != MM_OK) return 1;
+    const int32_t mapped = MapRange(path, startSec, endSec, &startOffset, &endOffset, &fileSize);
+    if (mapped != MM_OK) return mapped;
 
     std::unique_ptr<uint8_t[]> buf(new (std::nothrow) uint8_t[kChunkSize + 1]);
     if (!buf) return MM_E_FAIL;
@@ -130,7 +136,8 @@ extern "C" int32_t AAC_GetAuidoData_Buf(const char* path, int startSec, int endS
     int32_t startOffset = 0;
     int32_t endOffset = 0;
     uint32_t fileSize = 0;
-    if (MapRange(path, startSec, endSec, &startOffset, &endOffset, &fileSize) != MM_OK) return 1;
+    const int32_t mapped = MapRange(path, startSec, endSec, &startOffset, &endOffset, &fileSize);
+    if (mapped != MM_OK) return mapped;
 
     FileCloser in(MEx_fopen(path, "rb"));
     if (in.get() == 0) return 1;
