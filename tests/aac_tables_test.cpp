@@ -58,7 +58,7 @@ TEST(AacTables, CompiledTablesAreThoseOfTheTableData) {
     std::map<std::string, std::vector<std::vector<long>>> rows;
     if (!LoadTables(&rows)) GTEST_SKIP() << "no table data at " << kTablePath;
     std::map<int, std::map<int, std::pair<int, uint32_t>>> codes;
-    for (const auto& r : rows["huffman"]) codes[r[0]][r[1]] = {r[2], static_cast<uint32_t>(r[3])};
+    for (const auto& r : rows["huffman"]) codes[static_cast<int>(r[0])][static_cast<int>(r[1])] = {static_cast<int>(r[2]), static_cast<uint32_t>(r[3])};
     ASSERT_EQ(12u, codes.size());
     for (int book = 0; book < 12; ++book) {
         const HuffNode* tree = book == 0 ? metainfo::hcb_sf : metainfo::hcb_table[book].tree;

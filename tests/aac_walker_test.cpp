@@ -27,7 +27,7 @@ std::vector<Frame> AdtsFramesOf(const std::vector<uint8_t>& data) {
     size_t pos = 0;
     while (pos + 7 <= data.size() && data[pos] == 0xFF && (data[pos + 1] & 0xF6) == 0xF0) {
         const uint8_t* h = &data[pos];
-        const size_t length = (h[3] & 3u) << 11 | h[4] << 3 | h[5] >> 5;
+        const size_t length = (h[3] & 3u) << 11 | uint32_t{h[4]} << 3 | uint32_t{h[5]} >> 5;
         if (length < 7 || pos + length > data.size()) break;
         frames.push_back({pos, length, (h[2] >> 2) & 0x0F, (h[1] & 1) ? 7 : 9, h[6] & 3});
         pos += length;

@@ -68,7 +68,7 @@ TEST(AmrClip, BadMagicHeaderByteOrShortFileFailsEveryQuery) {
         SCOPED_TRACE(testing::Message() << c.magic << c.header);
         Bytes b;
         b.str(c.magic);
-        if (c.header >= 0) b.u8(c.header);
+        if (c.header >= 0) b.u8(static_cast<uint32_t>(c.header));
         std::string path = SpeechFile("bad.amr", b.zeros(c.bytes));
         _MMClipInfo clip{};
         EXPECT_EQ(metainfo::AMR_GetClipInfo(path.c_str(), &clip), c.result);

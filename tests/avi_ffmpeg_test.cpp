@@ -78,6 +78,6 @@ TEST_P(AviFromFfmpeg, ClipAndFramesAgreeWithFfprobe) {
 
 INSTANTIATE_TEST_SUITE_P(Writers, AviFromFfmpeg,
                          ::testing::Values(Variant{"mpeg4", "pcm_s16le"}, Variant{"msmpeg4", "libmp3lame"}),
-                         [](const ::testing::TestParamInfo<Variant>& info) {
-                             return std::string(info.param.video) + "_" + info.param.audio;
+                         [](const ::testing::TestParamInfo<Variant>& param) {
+                             return std::string(param.param.video) + "_" + param.param.audio;
                          });

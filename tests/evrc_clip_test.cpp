@@ -38,7 +38,7 @@ TEST(EvrcClip, PacketsBySizeOfTheirRateOver50GiveTheDurationAndBitrate) {
 
 TEST(EvrcClip, QuarterRateHighRatesMissingFilesAndExtensionsFail) {
     _MMClipInfo clip{};
-    for (uint8_t rate : {2, 6, 0xFF}) {
+    for (uint8_t rate : {uint8_t{2}, uint8_t{6}, uint8_t{0xFF}}) {
         std::string path = SpeechFile("bad.evc", EvrcFile(SpeechPackets(4, 22, 3).raw(SpeechPackets(rate, 5, 1))));
         EXPECT_EQ(metainfo::EVRC_GetClipInfo(path.c_str(), &clip), MM_E_FAIL) << int(rate);
     }

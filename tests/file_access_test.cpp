@@ -126,7 +126,7 @@ TEST(BadHandle, ManyThreadsOpenReadAndCloseIndependently) {
                 char c = 0;
                 if (h == 0 || MEx_fseek(h, t, SEEK_SET) != 0 || MEx_fread(&c, 1, 1, h) != 1 ||
                     c != "0123456789abcdef"[t]) {
-                    ++failures[t];
+                    ++failures[static_cast<size_t>(t)];
                 }
                 MEx_fclose(h);
             }

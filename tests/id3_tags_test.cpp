@@ -216,7 +216,7 @@ TEST(Id3Tags, V24FrameUnsyncAndDataLengthIndicator) {
 
 TEST(Id3Tags, V23ExtendedHeaderIsSkippedWithOrWithoutUnsync) {
     const auto body = Bytes().be32(6).zeros(6).raw(Text3("TIT2", "Ext")).zeros(30).data();
-    for (uint8_t flags : {0x40, 0xC0}) {
+    for (uint8_t flags : {uint8_t{0x40}, uint8_t{0xC0}}) {
         const Meta m(Bytes().raw(Id3v2Tag(3, body, flags)).raw(Mp3Frames(6)).data());
         EXPECT_EQ(m.result, MM_OK);
         EXPECT_EQ(m.Text(META_TITLE), "Ext") << int{flags};

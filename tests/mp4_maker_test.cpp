@@ -65,7 +65,7 @@ protected:
 
 TEST_F(Mp4Maker, ChildrenInAnyOrderFillTheRecord) {
     std::vector<ByteVec> children = {Modl("PX-100"), Thub(kImage), Salb("Holiday")};
-    std::vector<int> order = {0, 1, 2};
+    std::vector<size_t> order = {0, 1, 2};
     do {
         ByteVec mkr = Mkr(Join({children[order[0]], children[order[1]], children[order[2]]}));
         ASSERT_EQ(Read(mkr), MM_OK);

@@ -30,7 +30,7 @@ private:
 };
 
 // objectType, frequency index, channels (an empty GA configuration follows when asked).
-BitWriter Asc(int objectType, int frequencyIndex, int channels) {
+BitWriter Asc(uint32_t objectType, uint32_t frequencyIndex, uint32_t channels) {
     BitWriter w;
     w.put(objectType, 5).put(frequencyIndex, 4).put(channels, 4);
     return w;
@@ -71,7 +71,7 @@ TEST_F(Mp4Sample, OnlyTheFirstSampleEntryCountsAndIsRead) {
 }
 
 TEST_F(Mp4Sample, AacObjectTypesGiveCodecAndProfile) {
-    struct Case { int objectType; uint32_t codec, profile; } cases[] = {
+    struct Case { uint32_t objectType; uint32_t codec, profile; } cases[] = {
         {1, kAac, 0x2101}, {2, kAac, kLc}, {3, kAac, 0x2103}, {4, kAac, kNoDefine}, {17, kAac, kNoDefine}};
     for (const Case& c : cases) {
         MP4TrackNode node = AacNode(Asc(c.objectType, 3, 2).put(0, 3).bytes());

@@ -93,7 +93,7 @@ TEST_F(Mp4Udta, ItunesItemsFillArtistYearGenreAndTrackAndLaterOnesReplaceEarlier
 }
 
 TEST_F(Mp4Udta, GenreNumbersOutsideTheTableStayRaw) {
-    for (uint8_t n : {0, 148}) {
+    for (uint8_t n : {uint8_t{0}, uint8_t{148}}) {
         ASSERT_EQ(Read(Meta(Ilst(IlstItem("gnre", 0, {0, n})))), MM_OK);
         EXPECT_EQ(Text(META_GENRE), std::string({'\0', static_cast<char>(n)})) << int(n);
     }

@@ -83,4 +83,4 @@ INSTANTIATE_TEST_SUITE_P(
                 "-ac 1",
                 true, 0x3010},
         Variant{"real144_only", "-f lavfi -i sine=d=2:sample_rate=8000 -c:a real_144 -ac 1", false, 0}),
-    [](const ::testing::TestParamInfo<Variant>& info) { return std::string(info.param.name); });
+    [](const ::testing::TestParamInfo<Variant>& param) { return std::string(param.param.name); });

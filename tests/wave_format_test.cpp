@@ -82,7 +82,7 @@ TEST(WaveFormat, MimeAndCodecByTagWithTheL16Quirk) {
 }
 
 TEST(WaveFormat, FloatAndExtensibleTagsAreUnsupportedEverywhere) {
-    for (uint16_t tag : {3, 0xFFFE}) {
+    for (uint16_t tag : {uint16_t{3}, uint16_t{0xFFFE}}) {
         std::string path = SpeechFile("f.wav", CanonicalWave(tag, 1, 8000, 32, 64));
         _MMClipInfo clip;
         EXPECT_EQ(MM_MediaExtractor_GetClipInfo(path.c_str(), MEDIA_TYPE_WAVE, &clip), MM_E_UNSUPPORTED);

@@ -143,7 +143,8 @@ std::string ResultText(int32_t result) {
 
 std::string JsonString(const std::string& s) {
     std::string out = "\"";
-    for (unsigned char c : s) {
+    for (char ch : s) {
+        const auto c = static_cast<unsigned char>(ch);
         switch (c) {
             case '"': out += "\\\""; break;
             case '\\': out += "\\\\"; break;

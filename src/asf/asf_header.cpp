@@ -239,7 +239,7 @@ int32_t ASF_ParseStreamPropertyObj(int h, _MMClipInfo* clip) {
             // Bits per second as the 32-bit field holds it.
             clip->nAudioBitrate = ReadLE32(w + 46) * 8u;
             clip->nBitsPerSample = ReadLE16(w + 52);
-            consumed += sizeof w;
+            consumed += static_cast<int64_t>(sizeof w);
         }
     } else if (SameGuid(b + 8, ASF_Video_Media)) {
         if (++clip->bHasVideo == 1) {
@@ -247,7 +247,7 @@ int32_t ASF_ParseStreamPropertyObj(int h, _MMClipInfo* clip) {
             ReadOrZero(h, v, sizeof v);
             clip->nWidth = ReadLE32(v + 38);
             clip->nHeight = ReadLE32(v + 42);
-            consumed += sizeof v;
+            consumed += static_cast<int64_t>(sizeof v);
         }
     }
     return SkipRest(h, size, consumed) ? 0 : kWalkFailed;
@@ -297,7 +297,7 @@ int32_t ASF_ParseExtStreamPropertyObj(int h, _MMClipInfo* clip, uint32_t videoSt
             // Start and End Time, rates, buffers, sizes, Flags, then Stream Number.
             uint8_t e[48 + 2];
             ReadOrZero(h, e, sizeof e);
-            consumed += sizeof e;
+            consumed += static_cast<int64_t>(sizeof e);
             if (ReadLE16(e + 48) == videoStream) {
                 Get16(h);  // Stream Language ID Index
                 timePerFrame = Get64(h);

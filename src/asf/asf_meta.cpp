@@ -84,7 +84,7 @@ int32_t TakePictureValue(int h, _MMMetaInfo* meta, uint32_t length, uint32_t all
     if (length >= sizeof head) {
         if (!ReadExact(h, head, sizeof head)) return kBroken;
         if (!WantPicture(ReadLE32(head + 1), allowance)) {
-            return SeekBy(h, length - sizeof head) ? 0 : kBroken;
+            return SeekBy(h, static_cast<int64_t>(length - sizeof head)) ? 0 : kBroken;
         }
         if (!SeekBy(h, -static_cast<int64_t>(sizeof head))) return kBroken;
     }

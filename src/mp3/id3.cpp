@@ -118,7 +118,7 @@ long ParsePictureHead(const uint8_t* buf, uint32_t length, uint8_t version, bool
         const uint8_t* mime = buf + r.position();
         const void* zero = std::memchr(mime, 0, r.remaining());
         const uint32_t kept = static_cast<uint32_t>(
-            std::min<size_t>(zero != nullptr ? static_cast<const uint8_t*>(zero) - mime : r.remaining(),
+            std::min<size_t>(zero != nullptr ? static_cast<size_t>(static_cast<const uint8_t*>(zero) - mime) : r.remaining(),
                              MM_META_DATA_SIZE));
         if (mimeCountsZero) {
             const uint32_t withZero = std::min<uint32_t>(kept + (zero != nullptr ? 1 : 0), MM_META_DATA_SIZE);

@@ -50,10 +50,10 @@ struct _SMARTALBUM {
 
 // Reads the child box at the current position whole; its full-box header
 // length goes to *at.
-int32_t ReadMakerChild(int h, uint32_t type, BoxBuffer* buf, _MP4FULLBOX* full, int* at, uint32_t* size) {
+int32_t ReadMakerChild(int h, uint32_t type, BoxBuffer* buf, _MP4FULLBOX* full, size_t* at, uint32_t* size) {
     const int32_t result = ReadWholeBox(h, type, kMp4BadIlst, MM_E_OUTOFMEMORY, buf, size);
     if (result != MM_OK) return result;
-    *at = AnaFullBox(buf->data, buf->size, full);
+    *at = static_cast<size_t>(AnaFullBox(buf->data, buf->size, full));
     return *at == 0 ? MM_E_FAIL : MM_OK;
 }
 
@@ -69,7 +69,7 @@ bool TakeBytes(const BoxBuffer& buf, uint64_t offset, uint64_t n, Payload* paylo
 
 int32_t AnaModl(int h, _PHONEMODEL* modl) {
     BoxBuffer buf;
-    int at = 0;
+    size_t at = 0;
     uint32_t size = 0;
     int32_t result = ReadMakerChild(h, FourCC("modl"), &buf, &modl->header, &at, &size);
     if (result != MM_OK) return result;
@@ -81,7 +81,7 @@ int32_t AnaModl(int h, _PHONEMODEL* modl) {
 
 int32_t AnaThub(int h, _THUMBNAIL* thub) {
     BoxBuffer buf;
-    int at = 0;
+    size_t at = 0;
     uint32_t size = 0;
     int32_t result = ReadMakerChild(h, FourCC("thub"), &buf, &thub->header, &at, &size);
     if (result != MM_OK) return result;
@@ -101,7 +101,7 @@ int32_t AnaThub(int h, _THUMBNAIL* thub) {
 
 int32_t AnaSalb(int h, _SMARTALBUM* salb) {
     BoxBuffer buf;
-    int at = 0;
+    size_t at = 0;
     uint32_t size = 0;
     int32_t result = ReadMakerChild(h, FourCC("salb"), &buf, &salb->header, &at, &size);
     if (result != MM_OK) return result;

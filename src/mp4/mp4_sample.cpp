@@ -319,7 +319,7 @@ int32_t AnaStsd(int h, uint32_t /*handlerType*/, _ME_ClipInfoEx* info) {
     MP4TrackNode* node = CurrentTrack(info);
     if (node == nullptr) return MM_E_FAIL;
     _MP4FULLBOX full;
-    const int at = AnaFullBox(buf.data, buf.size, &full);
+    const size_t at = static_cast<size_t>(AnaFullBox(buf.data, buf.size, &full));
     if (at == 0 || buf.size < static_cast<size_t>(at) + 4) return MM_E_FAIL;
     // Only the first sample entry is interpreted: the cursor has always
     // advanced by the whole box after it.

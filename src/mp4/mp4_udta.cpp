@@ -64,7 +64,7 @@ void SetTextItem(_MMMetaItem* item, const uint8_t* data, size_t length) {
 
 // Text boxes: language, then the text; "albm" ends with a track-number byte.
 int32_t ParseTextBox(const uint8_t* buf, size_t avail, bool album, _INFOBOX* box) {
-    const int at = AnaFullBox(buf, avail, &box->header);
+    const size_t at = static_cast<size_t>(AnaFullBox(buf, avail, &box->header));
     const uint32_t size = box->header.box.size;
     if (at == 0 || static_cast<uint64_t>(at) + 2 >= size || size >= s_mp4FileSize) return MM_E_FAIL;
     if (avail < static_cast<size_t>(at) + 2) return MM_E_FAIL;
@@ -90,7 +90,7 @@ int32_t AnaAlbmBox(const uint8_t* buf, size_t avail, _INFOBOX* box) { return Par
 
 int32_t AnaYrrcBox(const uint8_t* buf, size_t avail, _YRRCBOX* box) {
     _MP4FULLBOX header;
-    const int at = AnaFullBox(buf, avail, &header);
+    const size_t at = static_cast<size_t>(AnaFullBox(buf, avail, &header));
     if (at == 0 || avail < static_cast<size_t>(at) + 2) return MM_E_FAIL;
     box->recordingYear = ReadBE16(buf + at);
     box->present = true;
@@ -101,7 +101,7 @@ int32_t AnaYrrcBox(const uint8_t* buf, size_t avail, _YRRCBOX* box) {
 // shape of each is checked.
 int32_t AnaDroppedBox(const uint8_t* buf, size_t avail, size_t fixedBytes) {
     _MP4FULLBOX header;
-    const int at = AnaFullBox(buf, avail, &header);
+    const size_t at = static_cast<size_t>(AnaFullBox(buf, avail, &header));
     if (at == 0 || avail < static_cast<size_t>(at) + fixedBytes) return MM_E_FAIL;
     return MM_OK;
 }
@@ -125,7 +125,7 @@ int32_t AnaData(int h, _DATA* data) {
     const int32_t result = ReadWholeBox(h, FourCC("data"), kMp4BadIlst, MM_E_OUTOFMEMORY, &buf, &size);
     if (result != MM_OK) return result;
     _MP4FULLBOX full;
-    const int at = AnaFullBox(buf.data, buf.size, &full);
+    const size_t at = static_cast<size_t>(AnaFullBox(buf.data, buf.size, &full));
     if (at == 0 || size < 16) return MM_E_FAIL;
     // The value follows the full-box header and the 4-byte locale word.
     const size_t offset = static_cast<size_t>(at) + 4;

@@ -45,7 +45,7 @@ int32_t AnaTimeHeader(int h, uint32_t type, int32_t noMemory, _ME_ClipInfoEx* in
     BoxBuffer buf;
     if (!ReadBoxBuffer(h, header.size, &buf)) return noMemory;
     _MP4FULLBOX full;
-    const int at = AnaFullBox(buf.data, buf.size, &full);
+    const size_t at = static_cast<size_t>(AnaFullBox(buf.data, buf.size, &full));
     if (at == 0) return MM_E_FAIL;
     ByteReader r(buf.data, buf.size);
     r.Seek(at);
@@ -214,7 +214,7 @@ int32_t AnaTkhd(int h, _ME_ClipInfoEx* info) {
     BoxBuffer buf;
     if (!ReadBoxBuffer(h, header.size, &buf)) return MM_E_OUTOFMEMORY;
     _MP4FULLBOX full;
-    const int at = AnaFullBox(buf.data, buf.size, &full);
+    const size_t at = static_cast<size_t>(AnaFullBox(buf.data, buf.size, &full));
     if (at == 0 || full.version > 1) return MM_E_FAIL;
     const size_t offset = static_cast<size_t>(at) + (full.version == 0 ? 72 : 84);
     if (buf.size < offset + 8) return MM_E_FAIL;
@@ -234,7 +234,7 @@ int32_t AnaHdlr(int h, uint32_t* handlerType) {
     BoxBuffer buf;
     if (!ReadBoxBuffer(h, header.size, &buf)) return MM_E_OUTOFMEMORY;
     _MP4FULLBOX full;
-    const int at = AnaFullBox(buf.data, buf.size, &full);
+    const size_t at = static_cast<size_t>(AnaFullBox(buf.data, buf.size, &full));
     if (at == 0 || buf.size < static_cast<size_t>(at) + 8) return MM_E_FAIL;
     *handlerType = ReadBE32(buf.data + at + 4);
     return MM_OK;

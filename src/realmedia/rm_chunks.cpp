@@ -139,7 +139,7 @@ int32_t anaContentHdr(const unsigned char* chunk, uint32_t size, _MMMetaInfo* me
     if (FieldAt(chunk, size, 8, 2) != 0) return 0;
     static const int kItems[4] = {META_TITLE, META_ARTIST, META_COPYRIGHT, META_COMMENT};
     uint64_t at = 10;
-    for (int k = 0; k < 4; ++k) {
+    for (uint32_t k = 0; k < 4; ++k) {
         if (at + 2 > size) return kRmBadChunk;
         uint32_t n = FieldAt(chunk, size, at, 2);
         at += 2;

@@ -11,11 +11,11 @@ Bytes AsfGuid(const char* text) {
         if (*p != '-') hex.push_back(*p);
     }
     if (hex.size() != 32) throw std::invalid_argument("GUID text");
-    auto byteAt = [&](size_t i) { return std::strtoul(hex.substr(2 * i, 2).c_str(), nullptr, 16); };
+    auto byteAt = [&](size_t i) { return static_cast<uint32_t>(std::strtoul(hex.substr(2 * i, 2).c_str(), nullptr, 16)); };
     Bytes out;
     // First three groups little-endian, the last eight bytes as written.
-    for (int i : {3, 2, 1, 0, 5, 4, 7, 6}) out.u8(byteAt(i));
-    for (int i = 8; i < 16; ++i) out.u8(byteAt(i));
+    for (size_t i : {3u, 2u, 1u, 0u, 5u, 4u, 7u, 6u}) out.u8(byteAt(i));
+    for (size_t i = 8; i < 16; ++i) out.u8(byteAt(i));
     return out;
 }
 
@@ -112,7 +112,7 @@ Bytes AsfExtStreamProperties(int streamNumber, uint64_t avgTimePerFrame) {
 
 Bytes Utf16(const std::string& text, bool terminator) {
     Bytes b;
-    for (unsigned char c : text) b.le16(c);
+    for (char c : text) b.le16(static_cast<unsigned char>(c));
     if (terminator) b.le16(0);
     return b;
 }

@@ -13,12 +13,12 @@
 namespace testing_support {
 
 Bytes& Bytes::patch_be32(size_t offset, uint32_t v) {
-    for (int i = 0; i < 4; ++i) data_.at(offset + i) = static_cast<uint8_t>(v >> (24 - 8 * i));
+    for (size_t i = 0; i < 4; ++i) data_.at(offset + i) = static_cast<uint8_t>(v >> (24 - 8 * i));
     return *this;
 }
 
 Bytes& Bytes::patch_le32(size_t offset, uint32_t v) {
-    for (int i = 0; i < 4; ++i) data_.at(offset + i) = static_cast<uint8_t>(v >> (8 * i));
+    for (size_t i = 0; i < 4; ++i) data_.at(offset + i) = static_cast<uint8_t>(v >> (8 * i));
     return *this;
 }
 

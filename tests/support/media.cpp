@@ -40,7 +40,7 @@ std::vector<uint8_t> Mp3Frame(const Mp3FrameLayout& shape) {
 
 std::vector<uint8_t> Id3v2Tag(int version, const std::vector<uint8_t>& body, uint8_t flags) {
     Bytes b;
-    b.str("ID3").u8(version).u8(0).u8(flags).syncsafe32(static_cast<uint32_t>(body.size())).raw(body);
+    b.str("ID3").u8(static_cast<uint32_t>(version)).u8(0).u8(flags).syncsafe32(static_cast<uint32_t>(body.size())).raw(body);
     return b.data();
 }
 
@@ -51,7 +51,7 @@ std::vector<uint8_t> AdtsFrame(const AdtsFields& s, const std::vector<uint8_t>& 
     h[0] = 0xFF;
     h[1] = static_cast<uint8_t>(0xF0 | s.mpegId << 3 | (s.crc ? 0 : 1));
     h[2] = static_cast<uint8_t>(s.profile << 6 | s.samplingIndex << 2 | (s.channelConfig >> 2));
-    h[3] = static_cast<uint8_t>((s.channelConfig & 3) << 6 | (length >> 11));
+    h[3] = static_cast<uint8_t>(static_cast<uint32_t>(s.channelConfig & 3) << 6 | (length >> 11));
     h[4] = static_cast<uint8_t>(length >> 3);
     h[5] = static_cast<uint8_t>((length & 7) << 5 | 0x1F);
     h[6] = static_cast<uint8_t>(0xFC | (s.rawBlocks & 3));

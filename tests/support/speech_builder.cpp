@@ -33,7 +33,7 @@ std::vector<uint8_t> RiffForm(const std::string& form, const std::vector<Bytes>&
 }
 
 Bytes WaveFmtBody(uint16_t tag, uint16_t channels, uint32_t rate, uint16_t bits) {
-    uint32_t blockAlign = channels * bits / 8;
+    uint32_t blockAlign = uint32_t{channels} * bits / 8;
     Bytes b;
     b.le16(tag).le16(channels).le32(rate).le32(rate * blockAlign).le16(blockAlign).le16(bits);
     return b;
@@ -46,7 +46,7 @@ std::vector<uint8_t> CanonicalWave(uint16_t tag, uint16_t channels, uint32_t rat
 
 Bytes AmrFrame(bool wideBand, int frameType, bool quality) {
     Bytes b;
-    b.u8(((frameType & 15) << 3) | (quality ? 0x04 : 0));
+    b.u8(static_cast<uint32_t>((frameType & 15) << 3) | (quality ? 0x04u : 0u));
     uint32_t size = wideBand ? kWbFrameBytes[frameType & 15] : kNbFrameBytes[frameType & 15];
     if (size > 1) b.zeros(size - 1);
     return b;
@@ -68,7 +68,7 @@ Bytes QcpFmtChunk(const std::vector<uint8_t>& guid, uint16_t avgBitrate) {
     body.str(name).zeros(80 - name.size());
     body.le16(avgBitrate).le16(35).le16(160).le16(8000).le16(16);
     body.le32(5);
-    for (int i = 0; i < 8; ++i) body.u8(i < 5 ? 4 - i : 0).u8(i < 5 ? 4 - i : 0);
+    for (uint32_t i = 0; i < 8; ++i) body.u8(i < 5 ? 4 - i : 0).u8(i < 5 ? 4 - i : 0);
     body.zeros(20);
     return SpeechChunk("fmt ", body);
 }
