@@ -101,6 +101,12 @@ typedef enum MetaItemKind {
 #define MM_META_ITEMS 17
 #define MM_META_DATA_SIZE 128
 
+/* Sizes and positions are read in 64 bits on every target. Where a 32-bit
+ * field carries one, a file of 4 GiB or more reads as 0xFFFFFFFF (ASF: the low
+ * 32 bits of the size its header states). Products that the fields have
+ * always been computed from in 32 bits (file size x 8 for a bit rate) wrap
+ * from that value, the same on 32- and 64-bit hosts. MP4 files of 2 GiB or
+ * more are refused with 0x80004005. */
 typedef struct _MMClipInfo {
     char szFormat[128];
     uint32_t nFileSize;
