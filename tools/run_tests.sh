@@ -1,14 +1,17 @@
 #!/usr/bin/env bash
 # Installs what the build and the tests need (when run as root on a Debian-like
-# system), builds the library, and runs the whole test suite twice: plain, and
-# under AddressSanitizer with UndefinedBehaviorSanitizer.
+# system), then builds and runs the whole suite several ways: plain with gcc
+# (warnings as errors), under AddressSanitizer + UndefinedBehaviorSanitizer with
+# gcc and with clang, and the thread tests under ThreadSanitizer. Every build
+# also checks that each public header compiles on its own and replays the
+# fuzzing regression inputs.
 set -euo pipefail
 cd "$(dirname "$0")/.."
 
 need=()
 have_pkg() { dpkg -s "$1" >/dev/null 2>&1; }
 if command -v dpkg >/dev/null 2>&1; then
-  for pkg in cmake g++ make libgtest-dev ffmpeg; do
+  for pkg in cmake g++ make clang libclang-rt-dev libgtest-dev ffmpeg; do
     have_pkg "$pkg" || need+=("$pkg")
   done
   # The Java binding is built and tested in a real JVM when a JDK is there.
@@ -25,16 +28,30 @@ if [ "${#need[@]}" -gt 0 ]; then
 fi
 
 jobs=$(nproc 2>/dev/null || echo 2)
+export ASAN_OPTIONS=detect_leaks=1
+export UBSAN_OPTIONS=print_stacktrace=1:halt_on_error=1
+export TSAN_OPTIONS=halt_on_error=1:second_deadlock_stack=1
 
+# run_suite DIR C-COMPILER C++-COMPILER CTEST-FILTER [CMAKE OPTIONS...]
 run_suite() {
-  local dir=$1; shift
-  cmake -S . -B "$dir" -DCMAKE_BUILD_TYPE=RelWithDebInfo "$@" >/dev/null
+  local dir=$1 cc=$2 cxx=$3 filter=$4
+  shift 4
+  CC=$cc CXX=$cxx cmake -S . -B "$dir" -DCMAKE_BUILD_TYPE=RelWithDebInfo -DMETAINFO_WERROR=ON "$@" >/dev/null
   cmake --build "$dir" -j "$jobs"
-  ctest --test-dir "$dir" --output-on-failure -j "$jobs"
+  if [ -n "$filter" ]; then
+    ctest --test-dir "$dir" --output-on-failure -j "$jobs" -R "$filter"
+  else
+    ctest --test-dir "$dir" --output-on-failure -j "$jobs"
+  fi
 }
 
-echo "== plain build"
-run_suite build
-echo "== AddressSanitizer + UndefinedBehaviorSanitizer build"
-ASAN_OPTIONS=detect_leaks=1 UBSAN_OPTIONS=print_stacktrace=1 \
-  run_suite build-asan -DMETAINFO_ASAN=ON -DMETAINFO_UBSAN=ON
+start=$(date +%s)
+echo "== plain build (gcc)"
+run_suite build gcc g++ ""
+echo "== AddressSanitizer + UndefinedBehaviorSanitizer (gcc)"
+run_suite build-asan gcc g++ "" -DMETAINFO_ASAN=ON -DMETAINFO_UBSAN=ON
+echo "== AddressSanitizer + UndefinedBehaviorSanitizer (clang)"
+run_suite build-clang-asan clang clang++ "" -DMETAINFO_ASAN=ON -DMETAINFO_UBSAN=ON
+echo "== ThreadSanitizer (clang): the thread tests"
+run_suite build-tsan clang clang++ "ThreadStress|FileAccess" -DMETAINFO_TSAN=ON
+echo "== all suites passed in $(( $(date +%s) - start )) s"
