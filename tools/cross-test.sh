@@ -150,11 +150,13 @@ host_targets=(--target metainfo_cli)
 end_phase host-build
 
 # The Java binding has no target JDK: it is left out. -Wconversion on top of
-# the project's warnings shows where 32-bit sizes narrow.
+# the project's warnings shows where 32-bit sizes narrow (through CXXFLAGS, so
+# that the toolchain's own flags stay).
 say "build for $target ($bdir)"
-cmake -S . -B "$bdir" -DCMAKE_TOOLCHAIN_FILE="$toolchain" -DCMAKE_BUILD_TYPE=RelWithDebInfo \
+CXXFLAGS="${CXXFLAGS:-} -Wconversion" \
+  cmake -S . -B "$bdir" -DCMAKE_TOOLCHAIN_FILE="$toolchain" -DCMAKE_BUILD_TYPE=RelWithDebInfo \
   -DCMAKE_DISABLE_FIND_PACKAGE_JNI=ON -DGTest_DIR="$gtest_prefix/lib/cmake/GTest" \
-  -DCMAKE_CXX_FLAGS=-Wconversion >"$bdir/configure.log" 2>&1 \
+  >"$bdir/configure.log" 2>&1 \
   || { tail -20 "$bdir/configure.log"; die "configuring for $target failed"; }
 cmake --build "$bdir" -j $jobs $clean >"$bdir/build.log" 2>&1
 build_rc=$?
@@ -175,10 +177,11 @@ end_phase build
 
 say "test suite on $target"
 # The tests' temporary folders go under the build folder, which is emptied
-# afterwards whatever the tests left.
+# afterwards whatever the tests left. The target's SparseFiles tests keep
+# their files there too, never in the folder the host's tests fill.
 test_tmp=$bdir/tmp
 rm -rf "$test_tmp"; mkdir -p "$test_tmp"
-TMPDIR=$test_tmp ctest --test-dir "$bdir" -j $jobs --timeout 900 --output-on-failure \
+TMPDIR=$test_tmp env -u METAINFO_SPARSE_DIR ctest --test-dir "$bdir" -j $jobs --timeout 900 --output-on-failure \
   >"$bdir/ctest.log" 2>&1
 ctest_rc=$?
 left_behind=$(find "$test_tmp" -mindepth 1 -maxdepth 1 | wc -l)
@@ -264,21 +267,24 @@ def parse(line):
         return status, json.loads(rest)
     except ValueError:
         return status, None
-def flatten(value, prefix=""):
-    if not isinstance(value, dict):
-        return {prefix[:-1]: value}
-    out = {}
-    for k, v in value.items():
-        out.update(flatten(v, prefix + k + "."))
-    return out
+def show(v):
+    if v is None:
+        return "absent"
+    if isinstance(v, dict):
+        return "{%d keys}" % len(v)
+    return json.dumps(v)
+def walk(h, t, prefix):
+    for key in list(h) + [k for k in t if k not in h]:
+        a, b = h.get(key), t.get(key)
+        if isinstance(a, dict) and isinstance(b, dict):
+            walk(a, b, prefix + key + ".")
+        elif a != b:
+            print("key %s%s: host %s, target %s" % (prefix, key, show(a), show(b)))
 (hs, hv), (ts, tv) = parse(sys.argv[1]), parse(sys.argv[2])
 if hs != ts:
-    print("key exit: host %s, target %s" % (hs[5:], ts[5:]))
+    print("key (exit status): host %s, target %s" % (hs[5:], ts[5:]))
 if isinstance(hv, dict) and isinstance(tv, dict):
-    fh, ft = flatten(hv), flatten(tv)
-    for key in sorted(set(fh) | set(ft)):
-        if fh.get(key) != ft.get(key):
-            print("key %s: host %s, target %s" % (key, json.dumps(fh.get(key)), json.dumps(ft.get(key))))
+    walk(hv, tv, "")
 ' "$1" "$2"
 }
 
