@@ -14,6 +14,7 @@
 # replaces the other. Exits 1 when a test fails or an answer differs, 2 when
 # nothing could be built.
 set -uo pipefail
+caller_dir=$PWD
 cd "$(dirname "$0")/.."
 root=$PWD
 
@@ -24,12 +25,14 @@ for arg in "$@"; do
   case $arg in
     armhf|i386) target=$arg ;;
     --clean) clean=--clean-first ;;
-    -h|--help) sed -n '2,16p' "$0" | sed 's/^# \{0,1\}//'; exit 0 ;;
+    -h|--help) sed -n '2,15p' "$0" | sed 's/^# \{0,1\}//'; exit 0 ;;
     -*) echo "unknown option: $arg" >&2; exit 2 ;;
     *) sparse_dir=$arg ;;
   esac
 done
 
+# A relative SPARSE_DIR is taken from where the script was started.
+[ -n "$sparse_dir" ] && [ "${sparse_dir#/}" = "$sparse_dir" ] && sparse_dir=$caller_dir/$sparse_dir
 bdir=$root/build-$target
 hostdir=$root/build
 jobs=2
