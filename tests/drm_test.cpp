@@ -54,7 +54,7 @@ void* OpenSession(void* ctx, const char* path, int* apiType) {
 long long Pread(void* ctx, void* session, void* buf, size_t size, long long offset) {
     static_cast<FakeService*>(ctx)->readOffsets.push_back(offset);
     FILE* f = static_cast<FILE*>(session);
-    if (offset < 0 || std::fseek(f, offset, SEEK_SET) != 0) return -1;
+    if (offset < 0 || ::fseeko(f, static_cast<off_t>(offset), SEEK_SET) != 0) return -1;
     size_t n = std::fread(buf, 1, size, f);
     for (size_t i = 0; i < n; ++i) static_cast<uint8_t*>(buf)[i] ^= kScramble;
     return static_cast<long long>(n);

@@ -366,9 +366,10 @@ int32_t CAVIParser::getAVIStreamFormat(const unsigned char* chunk, uint32_t avai
     if (extraSize == 0) return MM_OK;
     // Private bytes the stream list does not hold cannot be copied.
     if (extraAt + extraSize > avail) return MM_E_FAIL;
-    unsigned char* extra = new (std::nothrow) unsigned char[extraSize];
+    const auto bytes = static_cast<size_t>(extraSize);  // within avail, so it fits
+    unsigned char* extra = new (std::nothrow) unsigned char[bytes];
     if (extra == nullptr) return MM_E_FAIL;
-    std::memcpy(extra, chunk + extraAt, extraSize);
+    std::memcpy(extra, chunk + extraAt, bytes);
     delete[] pExtra[slot];
     pExtra[slot] = extra;
     nExtraSize[slot] = static_cast<uint32_t>(extraSize);

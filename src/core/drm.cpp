@@ -80,14 +80,19 @@ int GetDRMMetaInfo(const char* path, const DrmClient* client, _DRM_METADATA* met
 }
 
 int CheckDRM(const char* path) {
+    DrmClient client;
+    return CheckDRM(path, &client);
+}
+
+int CheckDRM(const char* path, DrmClient* client) {
+    std::memset(client, 0, sizeof *client);
     size_t len = std::strlen(path);
     if (len < 5) return -1;
     if (!EndsWith(path, len, ".dcf") && !EndsWith(path, len, ".fl")) return 0;
-    DrmClient client;
     // Without a protection service every file is plain.
-    if (!MakeDrmClient(&client)) return 0;
+    if (!MakeDrmClient(client)) return 0;
     _DRM_METADATA meta;
-    if (GetDRMMetaInfo(path, &client, &meta) != 0) return 1;
+    if (GetDRMMetaInfo(path, client, &meta) != 0) return 1;
     return static_cast<int>(meta.nDrmType);
 }
 

@@ -33,5 +33,9 @@ int GetDRMMetaInfo(const char* path, const DrmClient* client, _DRM_METADATA* met
 // -1: path too short to be opened; 0: plain file; otherwise the DRM type
 // (1 when the service has no metadata for a protected path).
 int CheckDRM(const char* path);
+// The same, decided with one copy of the installed provider, left in *client
+// for whoever goes on to open the file: a provider removed or replaced
+// meanwhile cannot change what was decided.
+int CheckDRM(const char* path, DrmClient* client);
 
 }  // namespace metainfo

@@ -79,10 +79,10 @@ void CloseProtected(MexHandle* handle) {
     handle->hasClient = false;
 }
 
-bool OpenProtected(MexHandle* handle, const char* path) {
-    if (!MakeDrmClient(&handle->client) || handle->client.provider.openDecryptSession == nullptr) {
-        return false;
-    }
+// Opens a decrypt session with the provider that decided the file is protected.
+bool OpenProtected(MexHandle* handle, const char* path, const DrmClient& client) {
+    if (client.provider.openDecryptSession == nullptr) return false;
+    handle->client = client;
     handle->hasClient = true;
     const MM_DrmProvider& p = handle->client.provider;
     int apiType = 0;
@@ -142,7 +142,8 @@ int MEx_fopen(const char* path, const char* mode) {
     if (path == nullptr || mode == nullptr) return 0;
     MexHandle* handle = new (std::nothrow) MexHandle();
     if (handle == nullptr) return 0;
-    int kind = CheckDRM(path);
+    DrmClient client;
+    int kind = CheckDRM(path, &client);
     if (kind < 0) {
         delete handle;
         return 0;
@@ -153,7 +154,7 @@ int MEx_fopen(const char* path, const char* mode) {
         handle->stream = std::fopen(path, mode);
         opened = handle->stream != nullptr;
     } else {
-        opened = OpenProtected(handle, path);
+        opened = OpenProtected(handle, path, client);
     }
     int h = opened ? Register(handle) : 0;
     if (h == 0) {
@@ -240,12 +241,13 @@ int MEx_fclose(int h) {
 
 int MEx_stat(const char* path, struct stat* st) {
     if (path == nullptr || st == nullptr) return -1;
-    int kind = CheckDRM(path);
+    DrmClient client;
+    int kind = CheckDRM(path, &client);
     if (kind < 0) return -1;
     if (kind != 0) {
         _DRM_METADATA meta;
         std::memset(&meta, 0, sizeof meta);
-        if (GetDRMMetaInfo(path, nullptr, &meta) == 0 && meta.nContentLength != 0) {
+        if (GetDRMMetaInfo(path, &client, &meta) == 0 && meta.nContentLength != 0) {
             st->st_size = static_cast<off_t>(meta.nContentLength);
             return 0;
         }

@@ -61,9 +61,10 @@ int32_t ReadMakerChild(int h, uint32_t type, BoxBuffer* buf, _MP4FULLBOX* full, 
 bool TakeBytes(const BoxBuffer& buf, uint64_t offset, uint64_t n, Payload* payload) {
     if (offset > buf.size || n > buf.size - offset) return false;
     payload->Reset();
+    const auto bytes = static_cast<size_t>(n);  // within the buffer, so it fits
     payload->size = static_cast<uint32_t>(n);
-    payload->data = new (std::nothrow) uint8_t[n != 0 ? n : 1];
-    if (payload->data != nullptr && n != 0) std::memcpy(payload->data, buf.data + offset, n);
+    payload->data = new (std::nothrow) uint8_t[bytes != 0 ? bytes : 1];
+    if (payload->data != nullptr && bytes != 0) std::memcpy(payload->data, buf.data + offset, bytes);
     return true;
 }
 

@@ -24,9 +24,12 @@ const uint32_t kSamplingFrequencies[12] = {96000, 88200, 64000, 48000, 44100, 32
 struct Entry {
     const uint8_t* data;
     size_t avail;
-    bool Has(size_t offset, size_t n) const { return offset <= avail && n <= avail - offset; }
-    uint16_t U16(size_t offset) const { return ReadBE16(data + offset); }
-    uint32_t U32(size_t offset) const { return ReadBE32(data + offset); }
+    // Offsets are 64-bit, as the sizes they are summed from: on a 32-bit host a
+    // narrower offset would wrap back into the buffer. Readers come after Has().
+    bool Has(uint64_t offset, uint64_t n) const { return offset <= avail && n <= avail - offset; }
+    uint8_t U8(uint64_t offset) const { return data[static_cast<size_t>(offset)]; }
+    uint16_t U16(uint64_t offset) const { return ReadBE16(data + static_cast<size_t>(offset)); }
+    uint32_t U32(uint64_t offset) const { return ReadBE32(data + static_cast<size_t>(offset)); }
 };
 
 int32_t AnaMp4aSampleEntry(const Entry& e, _ME_ClipInfoEx* info, MP4TrackNode* node) {
@@ -123,9 +126,9 @@ int32_t AnaAvc1SampleEntry(const Entry& e, _ME_ClipInfoEx* info, MP4TrackNode* n
         }
     };
     if (e.Has(at + 13, 1)) {
-        skipSets(e.data[at + 13] & 0x1F);
+        skipSets(e.U8(at + 13) & 0x1Fu);
         if (e.Has(pos, 1)) {
-            const uint32_t ppsCount = e.data[pos];
+            const uint32_t ppsCount = e.U8(pos);
             pos += 1;
             skipSets(ppsCount);
         } else {

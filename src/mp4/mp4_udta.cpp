@@ -73,9 +73,9 @@ int32_t ParseTextBox(const uint8_t* buf, size_t avail, bool album, _INFOBOX* box
     box->textLength = 0;
     box->present = true;
     box->language = ReadBE16(buf + at);
-    uint64_t length = size - (at + 2) - (album ? 1 : 0);
-    const uint64_t held = avail - (at + 2);
-    if (length > held) length = held;
+    const uint64_t claimed = size - (at + 2) - (album ? 1 : 0);
+    const size_t held = avail - (at + 2);
+    const size_t length = claimed < held ? static_cast<size_t>(claimed) : held;
     box->text = new (std::nothrow) uint8_t[length != 0 ? length : 1];
     if (box->text != nullptr) {
         if (length != 0) std::memcpy(box->text, buf + at + 2, length);
@@ -130,8 +130,8 @@ int32_t AnaData(int h, _DATA* data) {
     // The value follows the full-box header and the 4-byte locale word.
     const size_t offset = static_cast<size_t>(at) + 4;
     if (buf.size < offset) return MM_E_FAIL;
-    uint64_t length = size - 16;
-    if (length > buf.size - offset) length = buf.size - offset;
+    const uint64_t claimed = size - 16;
+    const size_t length = claimed < buf.size - offset ? static_cast<size_t>(claimed) : buf.size - offset;
     data->value = new (std::nothrow) uint8_t[length != 0 ? length : 1];
     if (data->value == nullptr) return MM_E_OUTOFMEMORY;
     if (length != 0) std::memcpy(data->value, buf.data + offset, length);
