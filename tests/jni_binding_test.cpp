@@ -43,23 +43,42 @@ struct FakeJvm {
     bool thrownWithMessage = false;
     int throws = 0;
     bool failStringChars = false;
+    bool outOfMemory = false;  // failing calls leave an OutOfMemoryError pending
+    // The exception pending in the native method; Java receives it on return.
+    std::string pending;
+
+    // A JVM's rule: with an exception pending, only the exception and release
+    // functions may be called.
+    static void Enter(const char* function) {
+        if (!g_jvm->pending.empty()) ADD_FAILURE() << function << " called with " << g_jvm->pending << " pending";
+    }
+    static void Raise(const std::string& cls) { g_jvm->pending = cls; }
 
     FakeJvm() {
         classNames.reserve(64);
         functions.FindClass = [](JNIEnv*, const char* name) -> jclass {
+            Enter("FindClass");
             std::string n = name;
-            if (n == "com/velorana/android/mediametainfo/MediaMetaInfo" && !g_jvm->classExists) return nullptr;
+            if (n == "com/velorana/android/mediametainfo/MediaMetaInfo" && !g_jvm->classExists) {
+                Raise("java/lang/NoClassDefFoundError");
+                return nullptr;
+            }
             g_jvm->classNames.push_back(n);
             return reinterpret_cast<jclass>(&g_jvm->classNames.back());
         };
         functions.ThrowNew = [](JNIEnv*, jclass cls, const char* message) -> jint {
+            Enter("ThrowNew");
+            Raise(*reinterpret_cast<std::string*>(cls));
             g_jvm->thrownClass = *reinterpret_cast<std::string*>(cls);
             g_jvm->thrownWithMessage = message != nullptr;
             g_jvm->thrownMessage = message != nullptr ? message : "";
             ++g_jvm->throws;
             return 0;
         };
+        functions.ExceptionCheck = [](JNIEnv*) -> jboolean { return g_jvm->pending.empty() ? JNI_FALSE : JNI_TRUE; };
+        functions.ExceptionClear = [](JNIEnv*) { g_jvm->pending.clear(); };
         functions.GetObjectClass = [](JNIEnv*, jobject) -> jclass {
+            Enter("GetObjectClass");
             static std::string cls = "MediaMetaInfo";
             return reinterpret_cast<jclass>(&cls);
         };
@@ -69,24 +88,37 @@ struct FakeJvm {
             return nullptr;  // replaced per object below
         };
         functions.GetLongField = [](JNIEnv*, jobject obj, jfieldID) -> jlong {
+            Enter("GetLongField");
             return reinterpret_cast<FakeObject*>(obj)->context;
         };
         functions.SetLongField = [](JNIEnv*, jobject obj, jfieldID, jlong value) {
+            Enter("SetLongField");
             reinterpret_cast<FakeObject*>(obj)->context = value;
         };
         functions.GetStringUTFChars = [](JNIEnv*, jstring s, jboolean*) -> const char* {
-            if (g_jvm->failStringChars) return nullptr;
+            Enter("GetStringUTFChars");
+            if (g_jvm->failStringChars) {
+                if (g_jvm->outOfMemory) Raise("java/lang/OutOfMemoryError");
+                return nullptr;
+            }
             return reinterpret_cast<std::string*>(s)->c_str();
         };
         functions.ReleaseStringUTFChars = [](JNIEnv*, jstring, const char*) {};
         functions.NewStringUTF = [](JNIEnv*, const char* text) -> jstring {
+            Enter("NewStringUTF");
+            if (g_jvm->outOfMemory) {
+                Raise("java/lang/OutOfMemoryError");
+                return nullptr;
+            }
             g_jvm->strings.push_back(std::make_unique<std::string>(text));
             return reinterpret_cast<jstring>(g_jvm->strings.back().get());
         };
         functions.RegisterNatives = [](JNIEnv*, jclass, const JNINativeMethod* methods, jint n) -> jint {
+            Enter("RegisterNatives");
             for (jint i = 0; i < n; ++i) {
                 g_jvm->registered.push_back(std::string(methods[i].name) + methods[i].signature);
             }
+            if (g_jvm->registerResult < 0) Raise("java/lang/NoSuchMethodError");
             return g_jvm->registerResult;
         };
         env.functions = &functions;
@@ -105,8 +137,12 @@ struct FakeJvm {
 FakeObject* g_currentObject = nullptr;
 jfieldID FieldFor(JNIEnv*, jclass, const char* name, const char* sig) {
     static int token;
-    if (g_currentObject == nullptr || !g_currentObject->hasField) return nullptr;
-    if (std::string(name) != "mNativeContext" || std::string(sig) != "J") return nullptr;
+    FakeJvm::Enter("GetFieldID");
+    if (g_currentObject == nullptr || !g_currentObject->hasField || std::string(name) != "mNativeContext" ||
+        std::string(sig) != "J") {
+        FakeJvm::Raise("java/lang/NoSuchFieldError");
+        return nullptr;
+    }
     return reinterpret_cast<jfieldID>(&token);
 }
 
@@ -124,7 +160,7 @@ protected:
         MM_MediaExtractor_SetLogSink(CaptureLog);
     }
     void TearDown() override {
-        Java_MediaMetaInfo_Release(&jvm.env, Self());
+        Release();
         MM_MediaExtractor_SetLogSink(nullptr);
         g_currentObject = nullptr;
     }
@@ -134,21 +170,42 @@ protected:
         jvm.strings.push_back(std::make_unique<std::string>(s));
         return reinterpret_cast<jstring>(jvm.strings.back().get());
     }
+    // Each native method is called as Java would: the exception it leaves
+    // pending is what Java receives, and is no longer pending afterwards.
+    void BackInJava() {
+        raised = jvm.pending;
+        jvm.pending.clear();
+    }
     std::string Ask(jint key) {
         jstring s = Java_MediaMetaInfo_GetMediaMetaInfo(&jvm.env, Self(), key);
+        BackInJava();
         return s != nullptr ? *reinterpret_cast<std::string*>(s) : "(null)";
     }
-    void SetFile(const std::string& path) { Java_MediaMetaInfo_setFileSource(&jvm.env, Self(), JavaString(path)); }
+    void SetPath(jstring path) {
+        Java_MediaMetaInfo_setFileSource(&jvm.env, Self(), path);
+        BackInJava();
+    }
+    void SetFile(const std::string& path) { SetPath(JavaString(path)); }
+    void Release() {
+        Java_MediaMetaInfo_Release(&jvm.env, Self());
+        BackInJava();
+    }
+    jint OnLoad() {
+        jint version = JNI_OnLoad(&jvm.vm, nullptr);
+        BackInJava();
+        return version;
+    }
 
     FakeJvm jvm;
     FakeObject object;
     TempDir dir;
+    std::string raised;  // what the last native method left pending
 };
 
 }  // namespace
 
 TEST_F(Binding, OnLoadRegistersTheThreeMethodsInOrder) {
-    EXPECT_EQ(JNI_OnLoad(&jvm.vm, nullptr), 0x10004);
+    EXPECT_EQ(OnLoad(), 0x10004);
     EXPECT_EQ(jvm.registered, (std::vector<std::string>{"GetMediaMetaInfo(I)Ljava/lang/String;",
                                                         "setFileSource(Ljava/lang/String;)V", "Release()V"}));
     EXPECT_TRUE(g_log.empty());
@@ -156,18 +213,18 @@ TEST_F(Binding, OnLoadRegistersTheThreeMethodsInOrder) {
 
 TEST_F(Binding, OnLoadLogsAndGivesUpWhenRegistrationFails) {
     jvm.classExists = false;
-    EXPECT_EQ(JNI_OnLoad(&jvm.vm, nullptr), 0);
+    EXPECT_EQ(OnLoad(), 0);
     EXPECT_EQ(g_log, (std::vector<std::string>{
                          "6|MetaInfo_JNI|find class failed : com/velorana/android/mediametainfo/MediaMetaInfo\n",
                          "6|MetaInfo_JNI|register natives failed \n"}));
     g_log.clear();
     jvm.classExists = true;
     jvm.registerResult = -1;
-    EXPECT_EQ(JNI_OnLoad(&jvm.vm, nullptr), 0);
+    EXPECT_EQ(OnLoad(), 0);
     EXPECT_EQ(g_log, (std::vector<std::string>{"6|MetaInfo_JNI|RegisterNatives failed\n",
                                                "6|MetaInfo_JNI|register natives failed \n"}));
     jvm.envAvailable = false;
-    EXPECT_EQ(JNI_OnLoad(&jvm.vm, nullptr), -1);
+    EXPECT_EQ(OnLoad(), -1);
 }
 
 TEST_F(Binding, AskingBeforeAFileIsSetThrowsIOException) {
@@ -176,19 +233,23 @@ TEST_F(Binding, AskingBeforeAFileIsSetThrowsIOException) {
     EXPECT_EQ(jvm.thrownMessage, "No extractor available");
     object.hasField = false;
     EXPECT_EQ(Ask(0), "(null)");
+    EXPECT_EQ(raised, "java/io/IOException") << "in place of the missing field's error";
     EXPECT_EQ(jvm.throws, 2);
 }
 
 TEST_F(Binding, KeysOutsideZeroToThreeThrowButStillAnswer) {
     SetFile(dir.Write("tune.mid", Bytes().str("MThd").be32(6).zeros(120)));
     for (jint key : {4, -1, 0x7FFFFFFF}) {
-        jvm.thrownClass.clear();
         EXPECT_EQ(Ask(key), "MediaInfo_NODEFINE") << key;
-        EXPECT_EQ(jvm.thrownClass, "java/lang/IllegalArgumentException");
+        EXPECT_EQ(raised, "java/lang/IllegalArgumentException");
         EXPECT_FALSE(jvm.thrownWithMessage);
     }
     jvm.throws = 0;
     for (jint key = 0; key <= 3; ++key) EXPECT_EQ(Ask(key), "MediaInfo_NODEFINE") << "MIDI has no codec query";
+    EXPECT_EQ(jvm.throws, 0);
+    jvm.outOfMemory = true;
+    EXPECT_EQ(Ask(4), "(null)");
+    EXPECT_EQ(raised, "java/lang/OutOfMemoryError") << "no answer to give beside the exception";
     EXPECT_EQ(jvm.throws, 0);
 }
 
@@ -211,9 +272,9 @@ TEST_F(Binding, SettingAFileAgainReplacesTheAdapter) {
     EXPECT_EQ(adapter->drmKind(), 0);
     SetFile(midi);
     EXPECT_NE(object.context, first);
-    Java_MediaMetaInfo_Release(&jvm.env, Self());
+    Release();
     EXPECT_EQ(object.context, 0);
-    Java_MediaMetaInfo_Release(&jvm.env, Self());
+    Release();
 }
 
 TEST_F(Binding, UndetectableFilesAreLoggedAndKept) {
@@ -225,13 +286,17 @@ TEST_F(Binding, UndetectableFilesAreLoggedAndKept) {
 }
 
 TEST_F(Binding, BadPathsAndObjectsWithoutTheFieldLeakNothing) {
-    Java_MediaMetaInfo_setFileSource(&jvm.env, Self(), nullptr);
-    EXPECT_EQ(jvm.thrownClass, "java/lang/IllegalArgumentException");
+    SetPath(nullptr);
+    EXPECT_EQ(raised, "java/lang/IllegalArgumentException");
     jvm.failStringChars = true;
-    jvm.thrownClass.clear();
     SetFile("/x/y.mp3");
-    EXPECT_EQ(jvm.thrownClass, "java/lang/IllegalArgumentException");
+    EXPECT_EQ(raised, "java/lang/IllegalArgumentException");
+    jvm.outOfMemory = true;
+    SetFile("/x/y.mp3");
+    EXPECT_EQ(raised, "java/lang/OutOfMemoryError") << "the JVM's own exception stays";
+    EXPECT_EQ(object.context, 0);
     jvm.failStringChars = false;
+    jvm.outOfMemory = false;
     object.hasField = false;
     SetFile(dir.Write("b.mid", Bytes().str("MThd").be32(6).zeros(120)));
     EXPECT_EQ(object.context, 0) << "nowhere to store it";

@@ -41,11 +41,15 @@ const JNINativeMethod gMethods[] = {
     {const_cast<char*>("Release"), const_cast<char*>("()V"), reinterpret_cast<void*>(Java_MediaMetaInfo_Release)},
 };
 
+// Leaves an exception pending: the one asked for, or the JVM's own when the
+// class cannot be found. The caller returns to Java straight away, since no
+// JNI function may be called while an exception is pending.
 void Throw(JNIEnv* env, const char* className, const char* message) {
     jclass cls = env->FindClass(className);
     if (cls != nullptr) env->ThrowNew(cls, message);
 }
 
+// Null, with the JVM's NoSuchFieldError pending, when the object has no such field.
 jfieldID ContextField(JNIEnv* env, jobject thiz) {
     jclass cls = env->GetObjectClass(thiz);
     if (cls == nullptr) return nullptr;
@@ -84,7 +88,9 @@ void Java_MediaMetaInfo_setFileSource(JNIEnv* env, jobject thiz, jstring path) {
     Locked lock;
     const char* chars = path != nullptr ? env->GetStringUTFChars(path, nullptr) : nullptr;
     if (chars == nullptr) {
-        Throw(env, "java/lang/IllegalArgumentException", nullptr);
+        // The characters can only be missing for want of memory: the JVM's
+        // OutOfMemoryError is then pending and says so better.
+        if (!env->ExceptionCheck()) Throw(env, "java/lang/IllegalArgumentException", nullptr);
         return;
     }
     MP_MetaInfo_Adapter* adapter = new MP_MetaInfo_Adapter(chars);
@@ -112,13 +118,18 @@ jstring Java_MediaMetaInfo_GetMediaMetaInfo(JNIEnv* env, jobject thiz, jint key)
     jfieldID field = ContextField(env, thiz);
     MP_MetaInfo_Adapter* adapter = field != nullptr ? AdapterIn(env, thiz, field) : nullptr;
     if (adapter == nullptr) {
+        // Java hears of a missing field as a missing extractor.
+        if (env->ExceptionCheck()) env->ExceptionClear();
         Throw(env, "java/io/IOException", "No extractor available");
         return nullptr;
     }
     if (static_cast<uint32_t>(key) > 3) {
-        // The exception stays pending; the caller still gets an answer.
+        // The caller still gets an answer beside the pending exception; the
+        // string is made first, while no exception is pending.
+        jstring answer = env->NewStringUTF(kNoDefine);
+        if (answer == nullptr) return nullptr;
         Throw(env, "java/lang/IllegalArgumentException", nullptr);
-        return env->NewStringUTF(kNoDefine);
+        return answer;
     }
     _MM_CODECTYPE codec;
     std::memset(&codec, 0, sizeof codec);

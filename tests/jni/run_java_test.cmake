@@ -24,6 +24,22 @@ if(inner)
   file(COPY ${inner} DESTINATION ${noclass})
 endif()
 
-run(${JAVA} -Djava.library.path=${LIBDIR} -cp ${classes} MediaMetaInfoTest binding)
-run(${JAVA} -Djava.library.path=${LIBDIR} -cp ${nomethods} MediaMetaInfoTest nomethods)
-run(${JAVA} -Djava.library.path=${LIBDIR} -cp ${noclass} MediaMetaInfoTest noclass)
+# The JVM checks every JNI call (-Xcheck:jni); whatever it complains about
+# fails the test, even when the Java side saw the right answers.
+function(run_jvm classpath mode)
+  execute_process(COMMAND ${JAVA} -Xcheck:jni -Djava.library.path=${LIBDIR} -cp ${classpath} MediaMetaInfoTest ${mode}
+    RESULT_VARIABLE rc OUTPUT_VARIABLE out ERROR_VARIABLE err)
+  message("${out}${err}")
+  if(NOT rc EQUAL 0)
+    message(FATAL_ERROR "${mode}: the JVM exited with ${rc}")
+  endif()
+  string(REGEX MATCH "(WARNING|FATAL ERROR) in native method[^\n]*|WARNING: JNI[^\n]*|Warning: Calling other JNI[^\n]*"
+    complaint "${out}${err}")
+  if(complaint)
+    message(FATAL_ERROR "${mode}: JNI misuse reported: ${complaint}")
+  endif()
+endfunction()
+
+run_jvm(${classes} binding)
+run_jvm(${nomethods} nomethods)
+run_jvm(${noclass} noclass)
