@@ -295,10 +295,9 @@ TEST_F(ThreadStress, SamplesBuiltAndProtectedFilesAnswerAsAlone) {
     EXPECT_GT(first.opened.load() + second.opened.load(), 0) << "protected names were read through the service";
 }
 
-// Removing the service while a protected file is being opened fails that
-// open today: MEx_fopen asks for the service once to decide that the file is
-// protected and again to open the session. Enable once it asks only once.
-TEST_F(ThreadStress, DISABLED_ProtectedFilesAnswerAsAloneWhileTheServiceComesAndGoes) {
+// A service removed between deciding that a file is protected and opening its
+// session must not fail the open.
+TEST_F(ThreadStress, ProtectedFilesAnswerAsAloneWhileTheServiceComesAndGoes) {
     TempDir dir;
     Stress(SamplesBuiltAndProtected(dir), true);
 }
