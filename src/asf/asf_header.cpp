@@ -336,7 +336,7 @@ uint32_t ASF_unicode2ascii(uint8_t* buf, uint32_t length) {
     for (uint32_t i = 0; i < length / 2; ++i) {
         // Byte i is only rewritten for a non-zero low byte: text beyond
         // Latin-1 is not compacted, and the count is what callers compare.
-        uint8_t low = buf[2 * i];
+        uint8_t low = buf[size_t{2} * i];
         if (low != 0) {
             buf[i] = low;
             ++kept;

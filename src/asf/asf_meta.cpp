@@ -138,7 +138,7 @@ int32_t ASF_ParseContentDescriptionObj(int h, _MMMetaInfo* meta) {
     uint8_t b[8 + 10];
     if (!ReadExact(h, b, sizeof b)) return kBroken;
     static const int kItems[] = {META_TITLE, META_ARTIST, META_COPYRIGHT, META_COMMENT};
-    for (int i = 0; i < 4; ++i) {
+    for (size_t i = 0; i < 4; ++i) {
         if (!FillItem(h, &meta->aItems[kItems[i]], ReadLE16(b + 8 + 2 * i), kStringEncoding)) {
             return kBroken;
         }

@@ -1,6 +1,8 @@
 // The AVI parser's index and frame reader: "movi", "idx1", entry times,
 // seeking and frame delivery.
+#include <cctype>
 #include <cstdio>
+#include <cstdlib>
 #include <cstring>
 #include <new>
 
@@ -19,6 +21,16 @@ uint32_t FrameTimeMs(const _AVIStreamHeader& h) {
     if (h.dwRate == 0) return 0;
     double ms = static_cast<double>(h.dwScale) * 1000.0 / h.dwRate;
     return ms >= 4294967295.0 ? 0xFFFFFFFFu : static_cast<uint32_t>(ms);
+}
+
+// The first blank-delimited word of text (at most two characters), as a
+// "%2s" conversion takes it.
+void CopyWord(const char* text, char* out) {
+    size_t i = 0;
+    while (text[i] != '\0' && std::isspace(static_cast<unsigned char>(text[i])) != 0) ++i;
+    for (size_t n = 0; n < 2 && text[i] != '\0' && std::isspace(static_cast<unsigned char>(text[i])) == 0; ++n) {
+        out[n] = text[i++];
+    }
 }
 
 }  // namespace
@@ -52,10 +64,10 @@ int32_t CAVIParser::getSubChunk(int handle, _SUBCHUNK* sub) {
     sub->ckSize = ReadLE32(b + 4);
     char number[3] = {static_cast<char>(b[0]), static_cast<char>(b[1]), '\0'};
     char type[3] = {static_cast<char>(b[2]), static_cast<char>(b[3]), '\0'};
-    sub->nStream = 0;
-    std::sscanf(number, "%d", &sub->nStream);
+    // Read as a decimal number after optional blanks and sign; no digits read as 0.
+    sub->nStream = static_cast<int>(std::strtol(number, nullptr, 10));
     std::memset(sub->szType, 0, sizeof sub->szType);
-    std::sscanf(type, "%2s", sub->szType);
+    CopyWord(type, sub->szType);
     return MM_OK;
 }
 
@@ -208,10 +220,9 @@ int32_t CAVIParser::setMediaTime(uint32_t stream, uint32_t timeMs, uint32_t* act
     uint32_t cur = share >= nIndexCount ? nIndexCount - 1 : static_cast<uint32_t>(share);
     if (pIndex[cur].wStream != stream) {
         uint32_t j;
-        if (nextOfStream(stream, cur, &j)) {
+        // Failing a later entry, the estimate lies past the stream's last one.
+        if (nextOfStream(stream, cur, &j) || previousOfStream(stream, cur, &j)) {
             cur = j;
-        } else if (previousOfStream(stream, cur, &j)) {
-            cur = j;  // the estimate lies past the stream's last entry
         } else {
             return MM_E_FAIL;  // the stream has no entries
         }

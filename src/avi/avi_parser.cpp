@@ -267,7 +267,7 @@ int32_t CAVIParser::getAVIMainHeader(const unsigned char* body, uint32_t size) {
     mainHeader.dwSuggestedBufferSize = ReadLE32(avih + 36);
     mainHeader.dwWidth = ReadLE32(avih + 40);
     mainHeader.dwHeight = ReadLE32(avih + 44);
-    for (int i = 0; i < 4; ++i) mainHeader.dwReserved[i] = ReadLE32(avih + 48 + 4 * i);
+    for (size_t i = 0; i < 4; ++i) mainHeader.dwReserved[i] = ReadLE32(avih + 48 + 4 * i);
     // The flag word is read big-endian, so the bits come from its swapped form.
     mainHeader.bHasIndex = (mainHeader.dwFlags >> 4) & 1;
     mainHeader.bMustUseIndex = (mainHeader.dwFlags >> 5) & 1;

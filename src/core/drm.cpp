@@ -1,6 +1,6 @@
 #include "core/drm.h"
 
-#include <cstdio>
+#include <cstdlib>
 #include <cstring>
 #include <mutex>
 #include <string>
@@ -27,10 +27,10 @@ void CopyText(char* dst, size_t capacity, const std::string& value) {
     dst[n] = '\0';
 }
 
+// A hexadecimal number (blanks, sign and "0x" allowed, as a "%x" conversion
+// takes them); its low 32 bits, the same on every target; 0 without digits.
 uint32_t ParseHex(const std::string& value) {
-    unsigned int parsed = 0;
-    if (std::sscanf(value.c_str(), "%x", &parsed) != 1) return 0;
-    return parsed;
+    return static_cast<uint32_t>(std::strtoull(value.c_str(), nullptr, 16));
 }
 
 void StoreMetadata(const MetadataPairs& pairs, _DRM_METADATA* meta) {

@@ -158,7 +158,7 @@ int MEx_fopen(const char* path, const char* mode) {
     }
     int h = opened ? Register(handle) : 0;
     if (h == 0) {
-        if (handle->stream != nullptr) std::fclose(handle->stream);
+        if (handle->stream != nullptr) (void)std::fclose(handle->stream);
         CloseProtected(handle);
         delete handle;
     }
@@ -176,14 +176,14 @@ int MEx_fdopen(int fd, const char* mode) {
     }
     MexHandle* handle = new (std::nothrow) MexHandle();
     if (handle == nullptr) {
-        std::fclose(stream);
+        (void)std::fclose(stream);
         return 0;
     }
     handle->drmKind = 0;
     handle->stream = stream;
     int h = Register(handle);
     if (h == 0) {
-        std::fclose(stream);
+        (void)std::fclose(stream);
         delete handle;
     }
     return h;

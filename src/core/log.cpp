@@ -24,7 +24,7 @@ void LogPrint(int priority, const char* tag, const char* fmt, ...) {
     MM_LogSink sink = g_sink.load(std::memory_order_acquire);
     if (sink != nullptr) {
         char message[1024];
-        vsnprintf(message, sizeof message, fmt, args);
+        (void)vsnprintf(message, sizeof message, fmt, args);
         sink(priority, tag, message);
     }
 #endif

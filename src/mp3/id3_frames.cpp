@@ -25,7 +25,7 @@ struct FrameRule {
     bool v24Text;  // encoding byte decides the item's code in v2.4
 };
 
-const FrameRule kFrameRules[] = {
+constexpr FrameRule kFrameRules[] = {
     {FrameId("TIT2"), FrameId("TT2"), FrameKind::kText, META_TITLE, true},
     {FrameId("TPE1"), FrameId("TP1"), FrameKind::kText, META_ARTIST, true},
     {FrameId("TALB"), FrameId("TAL"), FrameKind::kText, META_ALBUM, true},

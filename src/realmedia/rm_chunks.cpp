@@ -54,7 +54,7 @@ const CodecRow kRmCodecs[] = {
 
 }  // namespace
 
-_MEDIA_PROPERTIES::_MEDIA_PROPERTIES() { std::memset(static_cast<void*>(this), 0, sizeof *this); }
+_MEDIA_PROPERTIES::_MEDIA_PROPERTIES() : MediaPropertiesFields() {}
 
 _MEDIA_PROPERTIES::~_MEDIA_PROPERTIES() {
     delete[] stream_name;
@@ -67,8 +67,8 @@ void _MEDIA_PROPERTIES::TakeFrom(_MEDIA_PROPERTIES* other) {
     delete[] stream_name;
     delete[] mime_type;
     delete[] type_specific_data;
-    std::memcpy(static_cast<void*>(this), other, sizeof *this);
-    std::memset(static_cast<void*>(other), 0, sizeof *other);
+    static_cast<MediaPropertiesFields&>(*this) = *other;
+    static_cast<MediaPropertiesFields&>(*other) = MediaPropertiesFields();
 }
 
 uint32_t RmCodecCode(const unsigned char fourcc[4]) {
@@ -144,7 +144,7 @@ int32_t anaContentHdr(const unsigned char* chunk, uint32_t size, _MMMetaInfo* me
         uint32_t n = FieldAt(chunk, size, at, 2);
         at += 2;
         // The text and every length word still to come must fit in the chunk.
-        if (at + n + 2u * (3 - k) > size) return kRmBadChunk;
+        if (at + n + uint64_t{2} * (3 - k) > size) return kRmBadChunk;
         SetItem(&meta->aItems[kItems[k]], chunk + at, n);
         at += n;
     }

@@ -31,7 +31,8 @@ struct _PROPERTIES {
     uint16_t flags;
 };
 
-struct _MEDIA_PROPERTIES {
+// The media properties' fields, plain so that they move as one block.
+struct MediaPropertiesFields {
     uint32_t object_id;
     uint32_t size;
     uint16_t object_version;
@@ -49,7 +50,9 @@ struct _MEDIA_PROPERTIES {
     unsigned char* mime_type;  // same rule
     uint32_t type_specific_len;
     unsigned char* type_specific_data;  // type_specific_len + 2 bytes
+};
 
+struct _MEDIA_PROPERTIES : MediaPropertiesFields {
     _MEDIA_PROPERTIES();
     ~_MEDIA_PROPERTIES();
     _MEDIA_PROPERTIES(const _MEDIA_PROPERTIES&) = delete;
