@@ -25,4 +25,40 @@ std::string CodecSummary(const _MM_CODECTYPE& c) {
     return text;
 }
 
+namespace {
+
+std::string Item(const char* name, const _MMMetaItem& item) {
+    std::string out = std::string(" ") + name + "=" + std::to_string(item.nEncoding) + ":";
+    for (uint32_t i = 0; i < item.nLength && i < sizeof item.szData; ++i) {
+        const unsigned char b = item.szData[i];
+        if (b >= 0x20 && b < 0x7F && b != '\\') {
+            out += static_cast<char>(b);
+        } else {
+            char hex[8];
+            std::snprintf(hex, sizeof hex, "\\x%02X", b);
+            out += hex;
+        }
+    }
+    return out;
+}
+
+}  // namespace
+
+std::string MetaSummary(const _MMMetaInfo& m) {
+    static const char* const kNames[MM_META_ITEMS] = {
+        "title", "artist", "album", "genre", "year", "copyright", "reserved6", "composer", "track",
+        "language", "comment", "filetype", "conductor", "publisher", "date", "time", "picformat"};
+    std::string out;
+    for (int k = 0; k < MM_META_ITEMS; ++k) {
+        if (m.aItems[k].nLength != 0) out += Item(kNames[k], m.aItems[k]);
+    }
+    if (m.pPicture != nullptr || m.nPictureSize != 0) {
+        out += (m.pPicture != nullptr ? " pic=" : " picsize=") + std::to_string(m.nPictureSize);
+    }
+    if (m.nRating != 0) out += " rating=" + std::to_string(m.nRating);
+    if (m.nPlayCount != 0) out += " plays=" + std::to_string(m.nPlayCount);
+    if (m.stAlbumArtist.nLength != 0) out += Item("albumartist", m.stAlbumArtist);
+    return out.empty() ? out : out.substr(1);
+}
+
 }  // namespace testing_support

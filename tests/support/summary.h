@@ -15,4 +15,9 @@ std::string ClipSummary(const _MMClipInfo& clip);
 // Codes in hex, "a=codec/profile/subtype v=codec/profile/level", e.g. "a=6001/6010/0 v=5003/5010/5020".
 std::string CodecSummary(const _MM_CODECTYPE& codec);
 
+// The items that are not empty as name=encoding:text, text bytes outside
+// printable ASCII as \xNN, then the picture ("pic" with its buffer, "picsize"
+// without), rating, play count and album artist, e.g. "title=3:Name genre=3:Rock pic=300".
+std::string MetaSummary(const _MMMetaInfo& meta);
+
 }  // namespace testing_support

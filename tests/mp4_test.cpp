@@ -1,0 +1,464 @@
+// MP4 files built box by box: the walk and its size rules, the movie, media
+// and track headers, sample descriptions, user-data metadata and the maker box.
+#include <fcntl.h>
+#include <gtest/gtest.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <cstdio>
+#include <cstring>
+#include <string>
+
+#include "core/file_access.h"
+#include "core/thread_state.h"
+#include "metainfo/metainfo.h"
+#include "metainfo/mp4.h"
+#include "mp4/mp4_file.h"
+#include "mp4/mp4_internal.h"
+#include "support/aac_builder.h"
+#include "support/id3_builder.h"
+#include "support/mp4_builder.h"
+#include "support/summary.h"
+
+using namespace testing_support;
+using namespace metainfo;
+
+namespace {
+
+ByteVec AacEntry() { return AudioEntry("mp4a", 2, 16, 44100, Esds(0x40, 128000, {0x12, 0x10})); }
+ByteVec AudioTrak(uint32_t duration = 10000) {
+    return Trak("soun", 1000, duration, Join({Stsd({AacEntry()}), Stsz(100, 10)}));
+}
+ByteVec VideoTrak() {
+    return Trak("vide", 1000, 10000, Join({Stsd({VisualEntry("mp4v", 320, 240, Esds(0x20, 500000))}), Stsz(1000, 300)}),
+                320, 240);
+}
+
+// A movie of one track of the sample entry (and what follows it in "stbl").
+ByteVec Audio(const ByteVec& entry, const ByteVec& extra = {}) {
+    return Movie(Join({Mvhd(0, 1000, 10000), Trak("soun", 1000, 10000, Join({Stsd({entry}), extra}))}));
+}
+ByteVec Video(const ByteVec& entry, const ByteVec& extra = {}, uint32_t movieMs = 10000) {
+    return Movie(Join({Mvhd(0, 1000, movieMs), Trak("vide", 1000, 1000, Join({Stsd({entry}), extra}), 1, 1)}));
+}
+ByteVec OneTrak(const ByteVec& trak) { return Movie(Join({Mvhd(0, 1000, 10000), trak})); }
+
+// objectType, frequency index, channels of an audio configuration; more fields may follow.
+BitWriter Asc(uint32_t objectType, uint32_t frequencyIndex, uint32_t channels) {
+    BitWriter w;
+    w.put(objectType, 5).put(frequencyIndex, 4).put(channels, 4);
+    return w;
+}
+ByteVec AacWith(const BitWriter& config) { return Audio(AudioEntry("mp4a", 2, 16, 44100, Esds(0x40, 96000, config.bytes()))); }
+
+// The clip record, then each track node: kind, codec/detail in hex, bit rate.
+std::string Summary(const Mp4ClipWalk& w) {
+    std::string s = ClipSummary(w.clip);
+    for (const auto& n : w.nodes) {
+        char text[64];
+        std::snprintf(text, sizeof text, " | %u %x/%x %u", n.kind, n.codec, n.codecDetail, n.bitrate);
+        s += text;
+    }
+    return s;
+}
+
+ByteVec MetaBox(const ByteVec& children) { return FullBox("meta", 0, 0, Join({Hdlr("mdir"), children})); }
+ByteVec Ilst(const ByteVec& items) { return Box("ilst", items); }
+ByteVec Item(const std::string& type, const std::string& s) { return IlstItem(type, 1, ByteVec(s.begin(), s.end())); }
+ByteVec Udta(const ByteVec& children) { return Box("udta", children); }
+
+ByteVec Modl(const std::string& body) { return FullBox("modl", 0, 0, ByteVec(body.begin(), body.end())); }
+ByteVec Thub(const ByteVec& image, uint32_t declared) { return FullBox("thub", 0, 0, Bytes().be32(0xCAFE).be32(declared).raw(image)); }
+ByteVec Thub(const ByteVec& image) { return Thub(image, static_cast<uint32_t>(image.size())); }
+ByteVec Salb(const std::string& text) { return FullBox("salb", 0, 0, Bytes().be16(0x15C7).str(text)); }
+ByteVec Mkr(const ByteVec& children) { return FullBox("@mkr", 0, 0, children); }
+const ByteVec kImage = {0xFF, 0xD8, 0xFF, 0xE0, 1, 2, 3, 4, 5, 0xFF, 0xD9};
+
+std::string Str(const unsigned char* p, uint32_t n) { return p ? std::string(reinterpret_cast<const char*>(p), n) : ""; }
+
+class Mp4 : public ::testing::Test {
+protected:
+    TempDir dir;
+    _MMClipInfo clip{};
+    _MMMetaInfo meta{};
+    _MAKERINFO maker{};
+
+    int32_t Clip(const ByteVec& file, const std::string& name = "clip.mp4") {
+        std::memset(&clip, 0, sizeof clip);
+        return MP4_GetClipInfo(dir.Write(name, file).c_str(), &clip);
+    }
+    std::string Walk(const ByteVec& file) { return Summary(WalkClip(dir.Write("s.mp4", file))); }
+    std::string Meta(const ByteVec& moovChildren, const ByteVec& topLevel = {}) {
+        MM_MediaExtractor_FreeMetaInfo(&meta);
+        std::memset(&meta, 0, sizeof meta);
+        ByteVec file = Movie(Join({Mvhd(0, 1000, 1000), moovChildren}), Join({topLevel, Box("mdat", ByteVec(16, 0))}));
+        const int32_t result = MP4_GetMetaInfo(dir.Write("m.m4a", file).c_str(), &meta, 1);
+        return result == MM_OK ? MetaSummary(meta) : std::to_string(result);
+    }
+    // The maker box in the movie's user data, or in a top-level one.
+    int32_t Maker(const ByteVec& mkr, bool topLevel = false) {
+        FreeMaker();
+        ByteVec udta = Udta(mkr);
+        return MP4_GetMakerInfo(dir.Write("cam.3gp", Movie(Join({Mvhd(0, 1000, 1000), topLevel ? ByteVec{} : udta}),
+                                                           Join({topLevel ? udta : ByteVec{}, Box("mdat", ByteVec(16, 0))})))
+                                    .c_str(),
+                                &maker);
+    }
+    std::string MakerText() const {
+        return "valid=" + std::to_string(maker.nValid) + " model=" + Str(maker.pPhoneModel, maker.nPhoneModelSize) +
+               " thumb=" + std::to_string(maker.pThumbnail != nullptr ? maker.nThumbnailSize : 0) +
+               " album=" + Str(maker.pSmartAlbum, maker.nSmartAlbumSize);
+    }
+    void FreeMaker() {
+        MM_MediaExtractor_FreeBuffer(maker.pPhoneModel);
+        MM_MediaExtractor_FreeBuffer(maker.pThumbnail);
+        MM_MediaExtractor_FreeBuffer(maker.pSmartAlbum);
+        std::memset(&maker, 0, sizeof maker);
+    }
+    void TearDown() override {
+        MM_MediaExtractor_FreeMetaInfo(&meta);
+        FreeMaker();
+    }
+};
+
+}  // namespace
+
+TEST_F(Mp4, ClipOfEachFileShape) {
+    const ByteVec song = Movie(Join({Mvhd(0, 1000, 2000), AudioTrak(2000)}));
+    const struct { const char* name; ByteVec file; const char* path; int32_t result; const char* clip; } cases[] = {
+        // The first box must be ftyp or mdat; a file starting with mdat is walked from offset 0.
+        {"free first", Join({Box("free", ByteVec(8, 0)), Box("moov", Mvhd(0, 1000, 5000))}), "clip.mp4", -2, ""},
+        {"mdat first", Join({Box("mdat", ByteVec(8, 0)), Box("moov", Mvhd(0, 1000, 5000)), Box("free")}), "clip.mp4", MM_OK,
+         "mp4 size=140 dur=5 bps=224"},
+        // Box sizes stay below the file size: a box as long as the file, or of size 0, is refused;
+        // a top-level box claiming more than the file ends the walk quietly.
+        {"as long as the file", Box("ftyp", ByteVec(24, 0)), "clip.mp4", MM_E_FAIL, ""},
+        {"size 0", Bytes().be32(0).str("ftyp").zeros(24), "clip.mp4", MM_E_FAIL, ""},
+        {"beyond the file", Movie(Mvhd(0, 1000, 7000), Bytes().be32(0x7FFFFFF0).str("mdat").zeros(8)), "clip.mp4", MM_OK,
+         "mp4 size=156 dur=7 bps=178"},
+        // A 64-bit size's upper word of 1 is ignored: the box ends after its lower word.
+        {"64-bit size", Join({Ftyp(), Bytes().be32(1).str("mdat").be32(1).be32(24).zeros(8).data(),
+                              Box("moov", Join({Mvhd(0, 1000, 6000), AudioTrak(6000)})), Box("free", ByteVec(8, 0))}),
+         "clip.mp4", MM_OK, "mp4 size=503 dur=6 bps=670 audio=1 abps=128000 hz=44100 ch=2 bits=16"},
+        // Version 1 takes the upper words: below 2^32 units a duration is 0; c1 is the creation time.
+        {"version 1", Movie(Mvhd(1, 1, 0xFFFFFFFFull, 0x1234567800000000ull)), "clip.mp4", MM_OK,
+         "mp4 size=192 c1=305419896"},
+        // The largest of movie and media durations; the creation time of the last header read (the mdhd's).
+        {"media longer", Movie(Join({Mvhd(0, 1000, 4000, 11), AudioTrak(12500)})), "clip.mp4", MM_OK,
+         "mp4 size=503 dur=12 bps=335 audio=1 abps=128000 hz=44100 ch=2 bits=16"},
+        {"timescale 0 leaves the raw duration", Movie(Mvhd(0, 0, 17)), "clip.mp4", MM_OK, "mp4 size=180 dur=17 bps=84"},
+        // Bit rate from the file size, format from the extension; the esds bit rate comes first and is kept.
+        {"format", song, "Song.M4A", MM_OK, "M4A size=503 dur=2 bps=2012 audio=1 abps=128000 hz=44100 ch=2 bits=16"},
+        {"no extension: the copied fields stay", song, "noextension", MM_E_FAIL,
+         "size=503 dur=2 bps=2012 audio=1 abps=128000 hz=44100 ch=2 bits=16"},
+        // The first track declaring a size sets it.
+        {"sized tracks", Movie(Join({Mvhd(0, 1000, 1000), Trak("soun", 1000, 1000, {}),
+                                     Trak("hint", 1000, 1000, {}, 176, 144), Trak("hint", 1000, 1000, {}, 640, 480)})),
+         "clip.mp4", MM_OK, "mp4 size=816 dur=1 bps=6528 w=176 h=144"},
+    };
+    for (const auto& c : cases) {
+        EXPECT_EQ(Clip(c.file, c.path), c.result) << c.name;
+        EXPECT_EQ(ClipSummary(clip), c.clip) << c.name;
+    }
+}
+
+TEST_F(Mp4, TrackTypesCodecsAndTheDescriptorForm) {
+    std::string path = dir.Write("av.mp4", Movie(Join({Mvhd(0, 1000, 10000), VideoTrak(), AudioTrak()})));
+    int bits = 0;
+    EXPECT_EQ(MP4_GetTrackType(path.c_str(), &bits), MM_OK);
+    EXPECT_EQ(bits, 17);
+    _MM_CODECTYPE codec;
+    std::memset(&codec, 0xFF, sizeof codec);
+    ASSERT_EQ(MP4_GetCodecType(path.c_str(), &codec), MM_OK);
+    EXPECT_EQ(CodecSummary(codec), "a=4008/0/2102 v=4001/0/0");  // cleared first
+    EXPECT_EQ(MP4_GetCodecType(dir.Write("bare.mp4", Movie(Mvhd(0, 1000, 1000))).c_str(), &codec), MM_E_FAIL) << "no track";
+    // The descriptor form walks and leaves the caller's descriptor open.
+    int fd = ::open(path.c_str(), O_RDONLY);
+    ASSERT_GT(fd, 0);
+    EXPECT_EQ(MP4_GetCodecTypeEx(fd, &codec), MM_OK);
+    EXPECT_EQ(codec.nVideoCodec, 0x4001u);
+    EXPECT_EQ(::lseek(fd, 0, SEEK_SET), 0);
+    ::close(fd);
+    EXPECT_EQ(MP4_GetMediaInfoFd(0, kModeClip, nullptr), -1) << "0 is no descriptor";
+    // Refining numbers tracks only with a second entry of a kind.
+    for (const auto& n : WalkClip(path, true).nodes) EXPECT_EQ(n.ordinal, 0u);
+    Mp4ClipWalk three = WalkClip(dir.Write("three.mp4", Movie(Join({Mvhd(0, 1000, 10000), AudioTrak(), VideoTrak(),
+                                                                     AudioTrak()}))), true);
+    ASSERT_EQ(three.nodes.size(), 3u);
+    for (uint32_t i = 0; i < 3; ++i) EXPECT_EQ(three.nodes[i].ordinal, i);
+    EXPECT_EQ(three.nodes[1].kind, 16u);
+    EXPECT_EQ(three.clip.bHasAudio, 2u);
+}
+
+// Which entry is read, the codec codes of the decoder configurations, and what "stsz" adds.
+TEST_F(Mp4, SampleDescriptions) {
+    BitWriter lc = Asc(2, 3, 2).put(0, 3), main = Asc(1, 3, 2).put(0, 3), ssr = Asc(3, 3, 2).put(0, 3),
+              ltp = Asc(4, 3, 2).put(0, 3), er = Asc(17, 3, 2).put(0, 3),
+              explicitSbr = Asc(5, 6, 2).put(3, 4).put(2, 5).put(0, 3), implicitSbr = Asc(2, 7, 2).put(0, 3),
+              syncSbr = Asc(2, 7, 2).put(0, 3).put(0x2B7, 11).put(5, 5).put(1, 1).put(3, 4),
+              syncNoSbr = Asc(2, 7, 2).put(0, 3).put(0x2B7, 11).put(5, 5).put(0, 1), badRate = Asc(2, 13, 2),
+              badChannels = Asc(2, 4, 9),
+              // A program configuration whose long comment runs past the bytes given.
+              pce = Asc(2, 4, 0).put(0, 3).put(0, 4).put(1, 2).put(4, 4).put(15, 4).put(15, 4).put(15, 4).put(3, 2)
+                        .put(7, 3).put(15, 4).put(1, 1).put(3, 4);
+    const ByteVec mp4v = VisualEntry("mp4v", 176, 144, Esds(0x20, 64000));
+    const ByteVec avcC = Box("avcC", Bytes().u8(1).u8(66).u8(0).u8(30).u8(0xFF).u8(0xE1).be16(4).be32(0x6742001E)
+                                         .u8(1).be16(2).be16(0x68CE));
+    // A QCP format chunk after three bytes: its rate, bit rate and sample size replace the configuration's.
+    const ByteVec qcp = Bytes().u8(0).u8(0).u8(0).str("fmt ").le32(150).u8(1).u8(0).zeros(16).le16(1).zeros(80)
+                            .le16(13300).le16(35).le16(160).le16(8000).le16(16).le32(0).zeros(36).data();
+    const ByteVec stbl = Box("stbl", Stsd({AacEntry()}));
+    const struct { const char* name; ByteVec file; const char* summary; } cases[] = {
+        // Only the first entry counts and is read (damr: frames per sample as bits).
+        {"samr then mp4a",
+         OneTrak(Trak("soun", 1000, 10000,
+                      Stsd({AudioEntry("samr", 1, 16, 8000, Box("damr", Bytes().str("vndr").u8(0).be16(0x81FF).u8(0).u8(3))),
+                            AudioEntry("mp4a", 2, 16, 48000, Esds(0x40, 1, {0x11, 0x90}))}))),
+         "size=536 dur=10 bps=428 audio=1 hz=8000 ch=1 bits=3 | 1 4005/0 0"},
+        {"aac lc", AacWith(lc), "size=483 dur=10 bps=386 audio=1 abps=96000 hz=44100 ch=2 bits=16 | 1 4008/2102 96000"},
+        {"aac main", AacWith(main),
+         "size=483 dur=10 bps=386 audio=1 abps=96000 hz=44100 ch=2 bits=16 | 1 4008/2101 96000"},
+        {"aac ssr", AacWith(ssr),
+         "size=483 dur=10 bps=386 audio=1 abps=96000 hz=44100 ch=2 bits=16 | 1 4008/2103 96000"},
+        {"aac ltp", AacWith(ltp),
+         "size=483 dur=10 bps=386 audio=1 abps=96000 hz=44100 ch=2 bits=16 | 1 4008/ffff 96000"},
+        {"aac er", AacWith(er), "size=483 dur=10 bps=386 audio=1 abps=96000 hz=44100 ch=2 bits=16 | 1 4008/ffff 96000"},
+        {"explicit sbr", AacWith(explicitSbr),
+         "size=485 dur=10 bps=388 audio=1 abps=96000 hz=44100 ch=2 bits=16 | 1 4009/2102 96000"},
+        // Implicit SBR only doubles the rate; the sync extension with sbrPresentFlag 1 signals it.
+        {"implicit sbr", AacWith(implicitSbr),
+         "size=483 dur=10 bps=386 audio=1 abps=96000 hz=44100 ch=2 bits=16 | 1 4008/2102 96000"},
+        {"sync sbr", AacWith(syncSbr),
+         "size=486 dur=10 bps=388 audio=1 abps=96000 hz=44100 ch=2 bits=16 | 1 4009/2102 96000"},
+        {"sync no sbr", AacWith(syncNoSbr),
+         "size=486 dur=10 bps=388 audio=1 abps=96000 hz=44100 ch=2 bits=16 | 1 4008/2102 96000"},
+        // Bad configurations still name AAC.
+        {"frequency index 13", AacWith(badRate),
+         "size=483 dur=10 bps=386 audio=1 abps=96000 hz=44100 ch=2 bits=16 | 1 4008/2102 96000"},
+        {"channels 9", AacWith(badChannels),
+         "size=483 dur=10 bps=386 audio=1 abps=96000 hz=44100 ch=2 bits=16 | 1 4008/2102 96000"},
+        {"long pce comment", AacWith(pce),
+         "size=488 dur=10 bps=390 audio=1 abps=96000 hz=44100 ch=2 bits=16 | 1 4008/2102 96000"},
+        // Frame rate is samples per whole second; stsz replaces the node's bit rate, not the clip's.
+        {"frame rate 10 s", Video(mp4v, Stsz(500, 300)),
+         "size=553 dur=10 bps=442 video=1 vbps=64000 w=176 h=144 fps=30 | 16 4001/0 120000"},
+        {"frame rate 9.9 s", Video(mp4v, Stsz(500, 300), 9900),
+         "size=553 dur=9 bps=491 video=1 vbps=64000 w=176 h=144 fps=33 | 16 4001/0 133333"},
+        // A zero sample size sums the entries; a count far beyond the table sums what the box holds.
+        {"stsz entries", Audio(AudioEntry("mp4a", 1, 16, 8000, Esds(0x40, 0, {0x15, 0x88})), Stsz(0, 3, {1000, 2000, 2000})),
+         "size=515 dur=10 bps=412 audio=1 abps=4000 hz=8000 ch=1 bits=16 | 1 4008/2102 4000"},
+        {"stsz hostile count", Audio(AudioEntry("mp4a", 1, 16, 8000), Stsz(0, 0xFFFFFFF0u, {800})),
+         "size=468 dur=10 bps=374 audio=1 abps=640 hz=8000 ch=1 bits=16 | 1 0/0 640"},
+        // Speech entries have fixed values.
+        {"secw", Audio(AudioEntry("secw", 2, 8, 44100)),
+         "size=444 dur=10 bps=355 audio=1 hz=8000 ch=1 bits=16 | 1 8001/0 0"},
+        {"sevc", Audio(AudioEntry("sevc", 2, 8, 44100)),
+         "size=444 dur=10 bps=355 audio=1 hz=8000 ch=1 bits=16 | 1 8001/0 0"},
+        {"secb", Audio(AudioEntry("secb", 2, 8, 44100)),
+         "size=444 dur=10 bps=355 audio=1 hz=8000 ch=1 bits=16 | 1 8001/0 0"},
+        {"sqcp", Audio(AudioEntry("sqcp", 1, 16, 8000)),
+         "size=444 dur=10 bps=355 audio=1 hz=8000 ch=1 bits=16 | 1 7001/0 0"},
+        {"sawp", Audio(AudioEntry("sawp", 2, 16, 16000)), "size=444 dur=10 bps=355 audio=1 hz=16000 ch=1 | 1 4007/0 0"},
+        {"qcelp in esds", Audio(AudioEntry("mp4a", 1, 16, 44100, Esds(0xE1, 13000, qcp))),
+         "size=645 dur=10 bps=516 audio=1 abps=13300 hz=8000 ch=1 bits=16 | 1 7001/0 13300"},
+        // avc1 needs avcC for its codec but always gives the size; btrt's average bit rate.
+        {"avc1 bare", Video(VisualEntry("avc1", 640, 360)), "size=498 dur=10 bps=398 video=1 w=640 h=360 | 16 0/0 0"},
+        {"avc1 full", Video(VisualEntry("avc1", 1280, 720, Join({Box("pasp", Bytes().be32(1).be32(1)), avcC,
+                                                               Box("btrt", Bytes().be32(0).be32(900000).be32(750000))}))),
+         "size=559 dur=10 bps=447 video=1 vbps=750000 w=1280 h=720 | 16 4004/0 750000"},
+        {"avc1 wild lengths", Video(VisualEntry("avc1", 320, 240, Box("avcC", Bytes().u8(1).u8(66).u8(0).u8(30).u8(0xFF)
+                                                                              .u8(0xFF).be16(0xFFFF).zeros(4)))),
+         "size=518 dur=10 bps=414 video=1 w=320 h=240 | 16 4004/0 0"},
+        {"avc1 child of size 0", Video(VisualEntry("avc1", 320, 240, Bytes().be32(0).str("pasp").zeros(8))),
+         "size=514 dur=10 bps=411 video=1 w=320 h=240 | 16 0/0 0"},
+        {"s263 bitr", Video(VisualEntry("s263", 176, 144, Box("d263", Join({Bytes().str("vndr").u8(0).u8(10).u8(0).data(),
+                                                                          Box("bitr", Bytes().be32(64000).be32(128000))})))),
+         "size=529 dur=10 bps=423 video=1 vbps=64000 w=176 h=144 | 16 4003/0 64000"},
+        // Malformed configurations leave no codec; unknown entries are neither read nor counted.
+        {"wave instead of esds", Audio(AudioEntry("mp4a", 2, 16, 44100, Box("wave", ByteVec(20, 0)))),
+         "size=472 dur=10 bps=377 audio=1 hz=44100 ch=2 bits=16 | 1 0/0 0"},
+        {"endless descriptor length", Audio(AudioEntry("mp4a", 2, 16, 44100, FullBox("esds", 0, 0, ByteVec(40, 0x80)))),
+         "size=496 dur=10 bps=396 audio=1 hz=44100 ch=2 bits=16 | 1 0/0 0"},
+        {"tx3g", OneTrak(Trak("text", 1000, 1000, Stsd({Box("tx3g", ByteVec(40, 0))}))),
+         "size=456 dur=10 bps=364 | 0 0/0 0"},
+        // A handler after stbl still decides the kind; without one the sample table is not read.
+        {"late handler", OneTrak(Box("trak", Box("mdia", Join({Box("minf", stbl), Mdhd(0, 1000, 3000), Hdlr("soun")})))),
+         "size=375 dur=10 bps=300 audio=1 abps=128000 hz=44100 ch=2 bits=16 | 1 4008/2102 128000"},
+        {"no handler", OneTrak(Box("trak", Box("mdia", Join({Mdhd(0, 1000, 3000), Box("minf", stbl)})))),
+         "size=335 dur=10 bps=268 | 0 0/0 0"},
+    };
+    for (const auto& c : cases) EXPECT_EQ(Walk(c.file), c.summary) << c.name;
+    // Entries whose fixed fields lie past the end of the stsd box.
+    for (const char* type : {"mp4a", "samr", "sawp", "mp4v", "s263", "avc1"}) {
+        ByteVec stsd = FullBox("stsd", 0, 0, Bytes().be32(1).be32(200).str(type).zeros(4));
+        EXPECT_EQ(WalkClip(dir.Write("short.mp4", OneTrak(Trak("soun", 1000, 1000, stsd)))).result, MM_OK) << type;
+    }
+}
+
+TEST_F(Mp4, BitrateProductWrapsAt512MiBAndFilesOf2GiBAreRefused) {
+    std::string path = dir.Write("big.mp4", Movie(Mvhd(0, 1, 100)));
+    ASSERT_EQ(::truncate(path.c_str(), 512ll << 20), 0);
+    ASSERT_EQ(MP4_GetClipInfo(path.c_str(), &clip), MM_OK);
+    EXPECT_EQ(clip.nFileSize, 512u << 20);
+    EXPECT_EQ(clip.nBitrate, 0u) << "size x 8 is 2^32, which wraps to 0";
+    ASSERT_EQ(::truncate(path.c_str(), 2048ll << 20), 0);
+    EXPECT_EQ(MP4_GetClipInfo(path.c_str(), &clip), MM_E_FAIL);
+}
+
+TEST_F(Mp4, HostileSizesNeverReachPastTheFile) {
+    // Children that claim nearly the whole file, inside a small file: each
+    // reader reads what the file holds and no more.
+    const uint32_t big = 0x7FFFFFF0;
+    const ByteVec files[] = {
+        Join({Ftyp(), Bytes().be32(200).str("moov").be32(180).str("mvhd").zeros(20).data(), ByteVec(300, 0)}),
+        Movie(Bytes().be32(60).str("trak").be32(52).str("mdia").be32(44).str("mdhd").u8(1).zeros(20), ByteVec(200, 0)),
+        Bytes().be32(big).str("ftyp").zeros(16).data(),
+        Movie(Join({Mvhd(0, 1000, 1000), Trak("soun", 1000, 1000, Bytes().be32(100).str("stsz").zeros(12).be32(big))}),
+              ByteVec(100, 0)),
+        Movie(Join({Mvhd(0, 1000, 1000), Trak("vide", 1000, 1000, Stsd({Bytes().be32(big).str("avc1").zeros(90)}))}),
+              ByteVec(100, 0)),
+    };
+    for (const ByteVec& file : files) {
+        std::string path = dir.Write("hostile.mp4", file);
+        _MM_CODECTYPE codec;
+        int bits = 0;
+        MP4_GetClipInfo(path.c_str(), &clip);
+        MP4_GetCodecType(path.c_str(), &codec);
+        MP4_GetTrackType(path.c_str(), &bits);
+        MP4_GetMetaInfo(path.c_str(), &meta, 1);
+        MM_MediaExtractor_FreeMetaInfo(&meta);
+        FreeMaker();
+        MP4_GetMakerInfo(path.c_str(), &maker);
+        EXPECT_EQ(maker.nValid, 0u) << &file - files;
+    }
+}
+
+TEST(Mp4Boxes, HeaderLengthsAndFileTypeBrandsAreBoundedByTheBox) {
+    _MP4BOX box;
+    ByteVec uuid = Box("uuid", ByteVec(20, 0x11));
+    EXPECT_EQ(AnaBox(uuid.data(), uuid.size(), &box), 12) << "the 16-byte user type counts as 4";
+    ByteVec empty = Bytes().be32(0).str("free").data();
+    EXPECT_EQ(AnaBox(empty.data(), empty.size(), &box), 1) << "nothing read after a size of 0";
+    EXPECT_EQ(AnaBox(uuid.data(), 7, &box), 0) << "too short to hold a header";
+    s_mp4FileSize = 1000;
+    const struct { ByteVec box; int32_t result; uint32_t brands; } cases[] = {
+        {Box("ftyp", Bytes().str("M4A ").be32(0).str("M4A ").str("mp42").str("is")), MM_OK, 2},  // a partial brand is not read
+        {Box("ftyp", Bytes().str("isom").be32(0)), MM_E_FAIL, 0},                                // no room for brands
+        {Bytes().be32(900).str("ftyp").str("isom").be32(0).str("mp41").data(), MM_OK, 1},       // a size beyond the bytes
+    };
+    for (const auto& c : cases) {
+        _FILETYPEBOX ftyp{};
+        EXPECT_EQ(AnaFileType(c.box.data(), c.box.size(), &ftyp), c.result);
+        EXPECT_EQ(ftyp.brandCount, c.brands);
+        delete[] ftyp.compatibleBrands;
+    }
+}
+
+// User data: 3GPP text boxes, iTunes items and the order in which they overwrite each other.
+TEST_F(Mp4, UserDataMetadata) {
+    const ByteVec ilst = MetaBox(Ilst(Item("\xA9" "nam", "From ilst")));
+    const ByteVec titl = Udta(TextBox("titl", "From titl"));
+    const ByteVec tag = Id3Tag(4, {Id3Frame(4, "TIT2", TextBody(3, "Embedded")), Id3Frame(4, "TPE1", TextBody(0, "Band"))});
+    const struct { const char* name; ByteVec moov, topLevel; std::string meta; } cases[] = {
+        // The performer beats the author unless empty.
+        {"perf", Udta(Join({TextBox("auth", "Writer"), TextBox("perf", "Singer")})), {}, "artist=5:Singer"},
+        {"empty perf", Udta(Join({TextBox("perf", ""), TextBox("auth", "Writer")})), {}, "artist=5:Writer"},
+        // albm's last byte is its track number; yrrc is a 16-bit year read little-endian; dscp is dropped.
+        {"text boxes", Udta(Join({TextBox("titl", "Name"), FullBox("albm", 0, 0, Bytes().be16(0x15C7).str("Record").u8(0).u8(4)),
+                                  TextBox("gnre", "Jazz"), FullBox("yrrc", 0, 0, Bytes().be16(2009)),
+                                  TextBox("dscp", "dropped"), FullBox("loci", 0, 0, ByteVec(20, 0))})),
+         {}, "title=5:Name album=5:Record\\x00 genre=5:Jazz year=5:\\xD9\\x07"},
+        // Byte order marks choose the encoding and stay.
+        {"marks", Udta(Join({FullBox("titl", 0, 0, Bytes().be16(0).u8(0xFE).u8(0xFF).be16('A')),
+                             FullBox("cprt", 0, 0, Bytes().be16(0).u8(0xFF).u8(0xFE).le16('B'))})),
+         {}, "title=4:\\xFE\\xFF\\x00A copyright=6:\\xFF\\xFEB\\x00"},
+        // Long texts are cut to 128 bytes.
+        {"long titl", Udta(TextBox("titl", std::string(200, 'x'))), {}, "title=5:" + std::string(128, 'x')},
+        {"long nam", MetaBox(Ilst(Item("\xA9" "nam", std::string(300, 'y')))), {}, "title=5:" + std::string(128, 'y')},
+        // Artist, year, genre and a 4-byte binary track; cmt and covr are not read; a later
+        // item replaces an earlier one whole.
+        {"itunes", Udta(MetaBox(Ilst(Join({Item("\xA9" "ART", "Band"), Item("\xA9" "day", "2001-02-03"),
+                                           IlstItem("gnre", 0, {0, 1}), IlstItem("trkn", 0, {0, 0, 0, 7, 0, 12, 0, 0}),
+                                           Item("\xA9" "cmt", "skipped"), IlstItem("covr", 13, ByteVec(50, 0xFF)),
+                                           Item("\xA9" "nam", "First longer"), Item("\xA9" "nam", "Second")})))),
+         {}, "title=5:Second artist=5:Band genre=5:Blues year=5:2001-02-03 track=0:\\x07\\x00\\x00\\x00"},
+        // Genre numbers count from 1: 0 and 148 stay raw, the last name is out of reach.
+        {"gnre 0", MetaBox(Ilst(IlstItem("gnre", 0, {0, 0}))), {}, "genre=5:\\x00\\x00"},
+        {"gnre 148", MetaBox(Ilst(IlstItem("gnre", 0, {0, 148}))), {}, "genre=5:\\x00\\x94"},
+        {"gnre 147", MetaBox(Ilst(IlstItem("gnre", 0, {0, 147}))), {}, "genre=5:JPop"},
+        // User data overwrites items read before it, a top-level udta too.
+        {"ilst then udta", Join({ilst, titl}), {}, "title=5:From titl"},
+        {"udta then ilst", Join({titl, ilst}), {}, "title=5:From ilst"},
+        {"top-level udta", ilst, titl, "title=5:From titl"},
+        // An embedded ID3 tag fills the items; an empty tag or box fails alone.
+        {"ID32", MetaBox(FullBox("ID32", 0, 0, Join({Bytes().be16(0x15C7).data(), tag}))), {},
+         "title=5:Embedded artist=3:Band"},
+        {"empty ID32 tag", MetaBox(Join({FullBox("ID32", 0, 0, Bytes().be16(0x15C7).str("ID3").u8(4).u8(0).u8(0).syncsafe32(0)),
+                                         Ilst(Item("\xA9" "ART", "Kept"))})),
+         {}, "artist=5:Kept"},
+        {"empty ID32 box", MetaBox(Join({FullBox("ID32", 0, 0, {}), Ilst(Item("\xA9" "ART", "Kept"))})), {},
+         "artist=5:Kept"},
+        // A child of size 0 ends the udta walk with a failure: nothing is copied.
+        {"udta child of size 0", Udta(Join({TextBox("titl", "Lost"), Bytes().be32(0).str("junk").data()})), {}, ""},
+        // Boxes too short for their language field are skipped.
+        {"short text boxes", Udta(Join({FullBox("titl", 0, 0, {}), FullBox("albm", 0, 0, {1}), TextBox("perf", "P")})), {},
+         "artist=5:P"},
+        // data shorter than its header, trkn without its bytes, data claiming more than the
+        // file, an item of size 0.
+        {"hostile items", MetaBox(Ilst(Join({Box("\xA9" "nam", Box("data", {1, 2})), IlstItem("trkn", 0, {0, 0}),
+                                            Box("\xA9" "alb", Bytes().be32(0x7FFFFF00).str("data").zeros(8)),
+                                            Bytes().be32(0).str("\xA9" "ART").data()}))),
+         {}, ""},
+        // A meta without its version word (QuickTime style) is misread, harmlessly.
+        {"quicktime meta", Udta(Box("meta", Join({Hdlr("mdir"), Ilst(Item("\xA9" "nam", "x"))}))), {}, ""},
+    };
+    for (const auto& c : cases) {
+        EXPECT_EQ(Meta(c.moov, c.topLevel), c.meta) << c.name;
+        if (&c == cases + 6) { EXPECT_EQ(meta.aItems[META_TITLE].szData[6], 0) << "nothing of the earlier title is left"; }
+    }
+}
+
+// The maker box "@mkr": phone model, thumbnail and smart album.
+TEST_F(Mp4, MakerBox) {
+    std::vector<ByteVec> children = {Modl("PX-100"), Thub(kImage), Salb("Holiday")};
+    std::vector<size_t> order = {0, 1, 2};
+    do {  // children in any order
+        ASSERT_EQ(Maker(Mkr(Join({children[order[0]], children[order[1]], children[order[2]]}))), MM_OK);
+        EXPECT_EQ(MakerText(), "valid=1 model=PX-100 thumb=11 album=Holiday");
+        EXPECT_EQ(ByteVec(maker.pThumbnail, maker.pThumbnail + maker.nThumbnailSize), kImage);
+    } while (std::next_permutation(order.begin(), order.end()));
+    const struct { const char* name; ByteVec mkr; bool topLevel; const char* maker; } cases[] = {
+        {"top-level user data", Mkr(Modl("M")), true, "valid=1 model=M thumb=0 album="},
+        {"no maker box", {}, false, "valid=0 model= thumb=0 album="},
+        {"thumbnail larger than its box", Join({Mkr(Join({Thub(kImage, 200), Modl("PX")})), Box("free", ByteVec(400, 0))}),
+         false, "valid=1 model=PX thumb=0 album="},
+        {"short children", Mkr(Join({FullBox("salb", 0, 0, {0}), FullBox("thub", 0, 0, {1, 2}), FullBox("modl", 0, 0, {}),
+                                     Salb("ok")})),
+         false, "valid=1 model= thumb=0 album=ok"},
+        // A child of size 0 ends the box with a failure: the record stays as it was.
+        {"child of size 0", Mkr(Join({Modl("PX"), Bytes().be32(0).str("salb").data()})), false,
+         "valid=0 model= thumb=0 album="},
+    };
+    for (const auto& c : cases) {
+        ASSERT_EQ(Maker(c.mkr, c.topLevel), MM_OK) << c.name;
+        EXPECT_EQ(MakerText(), c.maker) << c.name;
+    }
+    // Two maker boxes: the later one replaces the earlier, nothing leaks.
+    FreeMaker();
+    std::string two = dir.Write("two.mp4", Movie(Join({Mvhd(0, 1000, 1000), Udta(Mkr(Modl("first")))}),
+                                                 Join({Udta(Mkr(Thub(kImage))), Box("mdat", {})})));
+    ASSERT_EQ(MM_MediaExtractor_GetMakerInfo(two.c_str(), &maker), MM_OK);
+    EXPECT_EQ(MakerText(), "valid=1 model= thumb=11 album=");
+    // An unknown child spoils the whole box: the record is untouched; the box reader reports -9.
+    _MAKERINFO marked;
+    std::memset(&marked, 0x5A, sizeof marked);
+    const _MAKERINFO before = marked;
+    ByteVec mkr = Mkr(Join({Box("zzzz", ByteVec(4, 0)), Modl("PX"), Thub(kImage)}));
+    EXPECT_EQ(MP4_GetMakerInfo(dir.Write("zzzz.3gp", Movie(Join({Mvhd(0, 1000, 1000), Udta(mkr)}))).c_str(), &marked), MM_OK);
+    EXPECT_EQ(std::memcmp(&marked, &before, sizeof marked), 0);
+    ByteVec raw = Join({Mkr(Join({Modl("PX"), Box("zzzz", ByteVec(4, 0))})), ByteVec(64, 0)});
+    const int h = MEx_fopen(dir.Write("raw.bin", raw).c_str(), "rb");
+    s_mp4FileSize = static_cast<uint32_t>(raw.size());
+    EXPECT_EQ(AnaMaker(h, &maker), -9);
+    MEx_fclose(h);
+}
