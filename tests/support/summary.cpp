@@ -28,8 +28,12 @@ std::string CodecSummary(const _MM_CODECTYPE& c) {
 namespace {
 
 std::string Item(const char* name, const _MMMetaItem& item) {
-    std::string out = std::string(" ") + name + "=" + std::to_string(item.nEncoding) + ":";
-    for (uint32_t i = 0; i < item.nLength && i < sizeof item.szData; ++i) {
+    const uint32_t length = item.nLength < sizeof item.szData ? item.nLength : sizeof item.szData;
+    // UTF-16LE text of ASCII characters shows its low bytes only, marked "~".
+    bool ascii16 = item.nEncoding == ENCODING_UTF16LE && length % 2 == 0;
+    for (uint32_t i = 1; ascii16 && i < length; i += 2) ascii16 = item.szData[i] == 0;
+    std::string out = std::string(" ") + name + "=" + std::to_string(item.nEncoding) + (ascii16 ? "~" : ":");
+    for (uint32_t i = 0; i < length; i += ascii16 ? 2 : 1) {
         const unsigned char b = item.szData[i];
         if (b >= 0x20 && b < 0x7F && b != '\\') {
             out += static_cast<char>(b);

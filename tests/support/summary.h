@@ -16,7 +16,8 @@ std::string ClipSummary(const _MMClipInfo& clip);
 std::string CodecSummary(const _MM_CODECTYPE& codec);
 
 // The items that are not empty as name=encoding:text, text bytes outside
-// printable ASCII as \xNN, then the picture ("pic" with its buffer, "picsize"
+// printable ASCII as \xNN (UTF-16LE text whose high bytes are all zero as its low
+// bytes, after "~" in place of ":"), then the picture ("pic" with its buffer, "picsize"
 // without), rating, play count and album artist, e.g. "title=3:Name genre=3:Rock pic=300".
 std::string MetaSummary(const _MMMetaInfo& meta);
 
