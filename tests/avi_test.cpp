@@ -1,0 +1,359 @@
+// AVI files built chunk by chunk: the header list and the clip and track
+// records built from it; the index, its entry times, neighbour searches,
+// seeking and frame delivery through the parser object.
+#include <gtest/gtest.h>
+
+#include <cstring>
+#include <vector>
+
+#include "avi/avi_queries.h"
+#include "metainfo/avi_parser.h"
+#include "metainfo/metainfo.h"
+#include "support/avi_builder.h"
+#include "support/bytes.h"
+
+using namespace testing_support;
+
+namespace {
+
+Bytes VideoStrl(uint32_t rate = 25, uint32_t length = 50, uint32_t width = 64) {
+    return AviStrl(AviVideoStream(1, rate, length), AviVideoFormat(width, 48, "FMP4"));
+}
+
+Bytes AudioStrl(uint32_t length = 48000) {
+    return AviStrl(AviAudioStream(16000, length), AviAudioFormat(1, 1, 8000, 16000, 2, 16));
+}
+
+class AviHeaders : public ::testing::Test {
+protected:
+    TempDir dir;
+    AviParserHandle parser;
+    _MMClipInfo clip{};
+
+    // A file of the header list alone, without movi frames or index.
+    std::string Write(const std::vector<Bytes>& lists, const AviMainFields& main = AviMainFields(),
+                      const std::string& name = "clip.avi") {
+        return dir.Write(name, AviFile(AviHdrl(main, lists), {}, false));
+    }
+};
+
+}  // namespace
+
+TEST_F(AviHeaders, DurationComesFromScaleRateAndLengthAndFrameRateFromTotalFrames) {
+    AviMainFields main;
+    main.totalFrames = 300;
+    main.flags = 0x10;  // AVIF_HASINDEX as written in the file
+    std::string path = Write({AviStrl(AviVideoStream(1001, 30000, 300), AviVideoFormat(320, 240, "FMP4"))}, main);
+    EXPECT_EQ(parser->init(path.c_str(), &clip), MM_OK);
+    EXPECT_EQ(parser->getDuration(), 10010u);
+    EXPECT_EQ(clip.nDuration, 10u);
+    EXPECT_EQ(clip.nFrameRate, 30u);
+    EXPECT_EQ(clip.nWidth, 320u);
+    EXPECT_EQ(clip.bHasVideo, 1u);
+    EXPECT_STREQ(clip.szFormat, "avi");
+    EXPECT_EQ(parser->getMainHeader()->dwFlags, 0x10000000u) << "flags are read byte-swapped";
+    EXPECT_EQ(parser->getMainHeader()->bHasIndex, 0u);
+
+    _MMClipInfo pub{};
+    EXPECT_EQ(MM_MediaExtractor_GetClipInfo(path.c_str(), MEDIA_TYPE_AVI, &pub), MM_OK);
+    EXPECT_EQ(pub.nDuration, 10000u) << "whole seconds, then milliseconds";
+}
+
+TEST_F(AviHeaders, AudioBitRateIsBytesPerSecondAndVideoGetsTheDifference) {
+    AviMainFields main;
+    main.totalFrames = 2500;
+    main.streams = 2;
+    Bytes padded(AviFile(AviHdrl(main, {VideoStrl(25, 2500), AudioStrl(1600000)}), {}, false));
+    // Fill up to exactly 2,000,000 bytes with a JUNK chunk inside the RIFF form.
+    padded.raw(RiffChunk("JUNK", Bytes().zeros(2000000 - padded.size() - 8)));
+    padded.patch_le32(4, static_cast<uint32_t>(padded.size() - 8));
+    ASSERT_EQ(padded.size(), 2000000u);
+    std::string path = dir.Write("hundred.avi", padded);
+
+    EXPECT_EQ(metainfo::AVI_GetClipInfo(path.c_str(), &clip), MM_OK);
+    EXPECT_EQ(clip.nDuration, 100u);
+    EXPECT_EQ(clip.nBitrate, 160000u);
+    EXPECT_EQ(clip.nAudioBitrate, 16000u);
+    EXPECT_EQ(clip.nVideoBitrate, 144000u);
+    EXPECT_EQ(clip.nSampleRate, 8000u);
+    EXPECT_EQ(clip.nBitsPerSample, 16u);
+    int mask = 0;
+    EXPECT_EQ(MM_MediaExtractor_GetTrackType(path.c_str(), MEDIA_TYPE_AVI, &mask), MM_OK);
+    EXPECT_EQ(mask, TRACK_AUDIO | TRACK_VIDEO);
+}
+
+TEST_F(AviHeaders, JunkInsideTheHeaderListEndsTheStreamWalkButKeepsEarlierStreams) {
+    std::string path = Write({VideoStrl(), RiffChunk("JUNK", Bytes().zeros(24)), AudioStrl()});
+    EXPECT_EQ(parser->init(path.c_str(), &clip), MM_OK) << "header-list damage is not reported";
+    EXPECT_EQ(parser->getStreamNum(), 1u);
+    EXPECT_EQ(clip.bHasVideo, 1u);
+    EXPECT_EQ(clip.bHasAudio, 0u);
+    EXPECT_EQ(clip.nDuration, 2u);
+}
+
+TEST_F(AviHeaders, StreamWithoutRateLeavesTheDurationToTheNextStream) {
+    EXPECT_EQ(parser->init(Write({VideoStrl(0), AudioStrl(48000)}).c_str(), nullptr), MM_OK);
+    EXPECT_EQ(parser->getDuration(), 3000u);
+}
+
+TEST_F(AviHeaders, StreamListsBeyondTheTwoSlotsAreIgnored) {
+    AviStreamFields xvid = AviVideoStream(1, 25, 50);
+    xvid.handler = "XVID";
+    std::string path = Write({AviStrl(xvid, AviVideoFormat(64, 48, "XVID")), AudioStrl(),
+                              AviStrl(AviVideoStream(1, 30, 90), AviVideoFormat(999, 999, "DIVX"))});
+    EXPECT_EQ(parser->init(path.c_str(), &clip), MM_OK);
+    EXPECT_EQ(parser->getStreamNum(), 2u);
+    EXPECT_EQ(clip.nWidth, 64u) << "the third stream did not replace the video format";
+    EXPECT_EQ(parser->getStreamType(0), 0x58564944) << "XVID";
+    EXPECT_EQ(parser->getStreamType(1), 1);
+    EXPECT_EQ(parser->getStreamType(2), -1);
+}
+
+TEST_F(AviHeaders, ArgumentAndOpenFailures) {
+    int mask = 0;
+    EXPECT_EQ(metainfo::AVI_GetClipInfo(nullptr, &clip), MM_E_INVALIDARG);
+    EXPECT_EQ(metainfo::AVI_GetClipInfo(dir.PathOf("missing.avi").c_str(), &clip), -1);
+    EXPECT_EQ(metainfo::AVI_GetTrackType(dir.PathOf("missing.avi").c_str(), &mask), -1);
+    EXPECT_EQ(CreateAVIParserObject(nullptr), MM_E_INVALIDARG);
+    EXPECT_EQ(FreeAVIParserObject(nullptr), MM_E_INVALIDARG);
+    std::string notRiff = dir.Write("form.avi", Bytes().str("RIFX").le32(100).str("AVI ").zeros(100));
+    EXPECT_EQ(metainfo::AVI_GetClipInfo(notRiff.c_str(), &clip), MM_E_FAIL);
+}
+
+TEST_F(AviHeaders, PathWithoutExtensionFailsAfterFillingTheRecord) {
+    std::string path = Write({VideoStrl()}, AviMainFields(), "noext");
+    // The temporary directory's name has no dot either.
+    if (path.find('.') != std::string::npos) GTEST_SKIP() << "temporary path holds a dot";
+    EXPECT_EQ(metainfo::AVI_GetClipInfo(path.c_str(), &clip), MM_E_FAIL);
+    EXPECT_EQ(clip.nWidth, 64u);
+}
+
+TEST_F(AviHeaders, OversizedAndTruncatedChunksAreRejectedWithoutFaults) {
+    std::vector<uint8_t> good = AviFile(AviHdrl(AviMainFields(), {VideoStrl()}), {}, false);
+    // The header list claims far more than the file holds.
+    Bytes big(good);
+    big.patch_le32(16, 0x7FFFFFF0);
+    EXPECT_EQ(metainfo::AVI_GetClipInfo(dir.Write("big.avi", big).c_str(), &clip), MM_E_FAIL);
+    // A stream list that reaches past its header list.
+    Bytes strl(good);
+    strl.patch_le32(12 + 12 + 64 + 4, 0x00100000);
+    EXPECT_EQ(metainfo::AVI_GetClipInfo(dir.Write("strl.avi", strl).c_str(), &clip), MM_OK);
+    EXPECT_EQ(clip.bHasVideo, 0u);
+    // A strh with a tiny size and a strf whose size claims more than the list holds.
+    Bytes odd = Bytes().raw(RiffChunk("strh", Bytes().str("vids").str("DIVX"))).str("strf").le32(0x10000).zeros(8);
+    EXPECT_EQ(metainfo::AVI_GetClipInfo(Write({RiffList("strl", {odd})}).c_str(), &clip), MM_OK);
+    // Every truncation of a valid file.
+    for (size_t n = 0; n < good.size(); ++n) {
+        std::string path = dir.Write("cut.avi", std::vector<uint8_t>(good.begin(), good.begin() + static_cast<long>(n)));
+        metainfo::AVI_GetClipInfo(path.c_str(), &clip);
+        int mask = 0;
+        metainfo::AVI_GetTrackType(path.c_str(), &mask);
+    }
+}
+
+TEST_F(AviHeaders, InitTwiceStartsAfresh) {
+    EXPECT_EQ(parser->init(Write({VideoStrl(), AudioStrl()}, AviMainFields(), "a.avi").c_str(), nullptr), MM_OK);
+    EXPECT_EQ(parser->getStreamNum(), 2u);
+    EXPECT_EQ(parser->init(Write({VideoStrl(25, 100, 32)}, AviMainFields(), "b.avi").c_str(), &clip), MM_OK);
+    EXPECT_EQ(parser->getStreamNum(), 1u);
+    EXPECT_EQ(parser->getDuration(), 4000u);
+    EXPECT_EQ(clip.bHasAudio, 0u);
+    EXPECT_EQ(parser->free(), MM_OK);
+    EXPECT_EQ(parser->free(), MM_OK);
+}
+
+namespace {
+
+// A parser over the file, its index already read.
+class Indexed {
+public:
+    explicit Indexed(const std::vector<uint8_t>& file) : path_(dir_.Write("clip.avi", file)) {}
+    int32_t Open() { return p_.OpenIndexed(path_); }
+    CAVIParser* operator->() const { return p_.operator->(); }
+    const _AVIIndexEntry& Entry(uint32_t i) const { return p_->getIndexEntries()[i]; }
+    std::vector<uint32_t> TimesOf(uint32_t stream) const {
+        std::vector<uint32_t> times;
+        for (uint32_t i = 0; i < p_->getIndexCount(); ++i) {
+            if (Entry(i).wStream == stream) times.push_back(Entry(i).dwTimeMs);
+        }
+        return times;
+    }
+
+private:
+    TempDir dir_;
+    std::string path_;
+    AviParserHandle p_;
+};
+
+// Video at 25 fps interleaved with 4000-byte audio chunks at 16000 bytes/s.
+std::vector<uint8_t> Interleaved(uint32_t videoFrames, uint32_t audioChunks) {
+    AviMainFields main;
+    main.totalFrames = videoFrames;
+    main.streams = 2;
+    Bytes hdrl = AviHdrl(main, {AviStrl(AviVideoStream(1, 25, videoFrames), AviVideoFormat(16, 16, "FMP4")),
+                                AviStrl(AviAudioStream(16000, audioChunks * 4000), AviAudioFormat(1, 1, 8000, 16000, 2, 16))});
+    std::vector<AviFrame> frames;
+    for (uint32_t i = 0; i < videoFrames || i < audioChunks; ++i) {
+        if (i < videoFrames) frames.push_back({0, "dc", Bytes().be32(i).zeros(5), i % 10 == 0 ? 0x10u : 0u});
+        if (i < audioChunks) frames.push_back({1, "wb", Bytes().fill(4000, static_cast<uint8_t>(i)), 0x10u});
+    }
+    return AviFile(hdrl, frames);
+}
+
+// One video stream whose frames carry the given index flags.
+std::vector<uint8_t> VideoWithFlags(const std::vector<uint32_t>& flags) {
+    Bytes hdrl = AviHdrl(AviMainFields(), {AviStrl(AviVideoStream(1, 25, 6), AviVideoFormat(16, 16, "FMP4"))});
+    std::vector<AviFrame> frames;
+    for (uint32_t f : flags) frames.push_back({0, "dc", Bytes().zeros(4), f});
+    return AviFile(hdrl, frames);
+}
+
+}  // namespace
+
+// Video entries step by the frame time, audio ones by the previous chunk's
+// length; entries keep their fields; an entry of a stream without a slot stops
+// the index, keeping the earlier entries.
+TEST(AviIndex, EntryTimesAndFields) {
+    const struct { std::vector<uint8_t> file; uint32_t stream; std::vector<uint32_t> times; } cases[] = {
+        {AviVideoOnly(5, 1), 0, {0, 40, 80, 120, 160}},
+        {AviVideoOnly(4, 1, 1001, 30000), 0, {0, 33, 66, 99}},
+        {Interleaved(10, 4), 1, {0, 250, 500, 750}}};
+    for (const auto& c : cases) {
+        Indexed f(c.file);
+        ASSERT_EQ(f.Open(), MM_OK);
+        EXPECT_EQ(f.TimesOf(c.stream), c.times);
+    }
+    Indexed f(Interleaved(2, 1));
+    ASSERT_EQ(f.Open(), MM_OK);
+    ASSERT_EQ(f->getIndexCount(), 3u);
+    EXPECT_EQ(f.Entry(0).ckid, 0x30306463u) << "00dc, read big-endian";
+    EXPECT_EQ(f.Entry(0).dwChunkOffset, 4u);
+    EXPECT_EQ(f.Entry(1).wStream, 1u);
+    EXPECT_EQ(f.Entry(1).wType, 0x7762u) << "wb";
+    Bytes hdrl = AviHdrl(AviMainFields(), {AviStrl(AviVideoStream(1, 25, 3), AviVideoFormat(16, 16, "FMP4"))});
+    std::vector<AviFrame> frames{{0, "dc", Bytes().zeros(4), 0x10}, {0, "dc", Bytes().zeros(4), 0},
+                                 {5, "tx", Bytes().zeros(4), 0}, {0, "dc", Bytes().zeros(4), 0}};
+    Indexed stopped(AviFile(hdrl, frames));
+    EXPECT_EQ(stopped.Open(), MM_E_FAIL);
+    ASSERT_EQ(stopped->getIndexCount(), 4u);
+    EXPECT_EQ(stopped.Entry(1).dwTimeMs, 40u);
+    EXPECT_EQ(stopped.Entry(3).ckid, 0u) << "entries after the failure stay unread";
+}
+
+TEST(AviIndexSearch, NextAndPreviousEntriesOfAStream) {
+    Indexed f(Interleaved(3, 3));  // v a v a v a
+    ASSERT_EQ(f.Open(), MM_OK);
+    EXPECT_EQ(f->searchNextIndex(0, 0), 2u);
+    EXPECT_EQ(f->searchNextIndex(0, 4), 6u) << "none after: the entry count";
+    EXPECT_EQ(f->searchNextIndex(0, 5), 5u) << "already the last entry";
+    EXPECT_EQ(f->searchPreIndex(1, 5), 3u);
+    EXPECT_EQ(f->searchPreIndex(0, 2), 0u) << "entry 0 is never examined";
+}
+
+TEST(AviSeek, VideoLandsOnTheEarlierKeyFrame) {
+    Indexed f(AviVideoOnly(50, 10));  // key frames at 0, 400, 800, 1200, 1600 ms
+    ASSERT_EQ(f.Open(), MM_OK);
+    uint32_t actual = 1;
+    EXPECT_EQ(f->setMediaTime(0, 1000, &actual), MM_OK);
+    EXPECT_EQ(actual, 800u);
+    _FrameInfo frame{};
+    ASSERT_EQ(f->getNextFrame(0, &frame), MM_OK);
+    EXPECT_EQ(frame.dwTimeMs, 800u);
+    EXPECT_EQ(frame.dwFlags, AVI_KEYFRAME_FLAGS);
+    MM_MediaExtractor_FreeBuffer(frame.pData);
+    EXPECT_EQ(f->setMediaTime(0, 2000, &actual), MM_OK) << "the very end stays inside the index";
+    EXPECT_EQ(actual, 1600u);
+}
+
+TEST(AviSeek, KeyFlagWithAnotherBitIsNotAKeyFrame) {
+    Indexed f(VideoWithFlags({0x10, 0, 0, 0x11, 0, 0}));
+    ASSERT_EQ(f.Open(), MM_OK);
+    EXPECT_EQ(f.Entry(3).dwFlags, 0x11000000u);
+    uint32_t actual = 1;
+    EXPECT_EQ(f->setMediaTime(0, 150, &actual), MM_OK);
+    EXPECT_EQ(actual, 0u);
+}
+
+TEST(AviSeek, AudioSeeksToTheFirstEntryAtOrAfterTheTime) {
+    Indexed f(Interleaved(25, 4));
+    ASSERT_EQ(f.Open(), MM_OK);
+    uint32_t actual = 0;
+    EXPECT_EQ(f->setMediaTime(1, 600, &actual), MM_OK);
+    EXPECT_EQ(actual, 750u);
+}
+
+TEST(AviFrames, EveryFrameButTheStreamsLastIsDeliveredWithItsBytes) {
+    Indexed f(Interleaved(6, 3));
+    ASSERT_EQ(f.Open(), MM_OK);
+    std::vector<uint32_t> times;
+    _FrameInfo frame{};
+    while (f->getNextFrame(0, &frame) == MM_OK) {
+        ASSERT_EQ(frame.dwSize, 9u);
+        EXPECT_EQ(frame.pData[3] * 40u, frame.dwTimeMs) << "the bytes are those of the indexed chunk";
+        times.push_back(frame.dwTimeMs);
+        MM_MediaExtractor_FreeBuffer(frame.pData);
+    }
+    EXPECT_EQ(times, (std::vector<uint32_t>{0, 40, 80, 120, 160}));
+    EXPECT_EQ(f->getNextFrame(0, &frame), 1) << "the end stays the end";
+    int audio = 0;
+    for (; f->getNextFrame(1, &frame) == MM_OK; ++audio) MM_MediaExtractor_FreeBuffer(frame.pData);
+    EXPECT_EQ(audio, 2);
+}
+
+TEST(AviFrames, SeekingAndReadingNeedTheIndexAndValidArguments) {
+    Indexed f(AviVideoOnly(10, 5));
+    uint32_t actual = 0;
+    _FrameInfo frame{};
+    EXPECT_EQ(f->setMediaTime(0, 0, &actual), MM_E_INVALIDARG) << "nothing read yet";
+    EXPECT_EQ(f->getNextFrame(0, &frame), MM_E_FAIL);
+    EXPECT_EQ(f->getNextFrame(0, nullptr), MM_E_INVALIDARG);
+    EXPECT_EQ(f->init(nullptr, nullptr), MM_E_INVALIDARG);
+    ASSERT_EQ(f.Open(), MM_OK);
+    EXPECT_EQ(f->setMediaTime(0, 100, nullptr), MM_E_INVALIDARG);
+    EXPECT_EQ(f->setMediaTime(0, 401, &actual), MM_E_INVALIDARG) << "past the stream's end";
+    EXPECT_EQ(f->setMediaTime(1, 0, &actual), MM_E_INVALIDARG);
+    EXPECT_EQ(f->getNextFrame(1, &frame), MM_E_FAIL);
+    EXPECT_EQ(f->locateChunk("strl"), MM_E_FAIL) << "only top-level chunks are located";
+}
+
+TEST(AviFrames, OffsetsAndLengthsOutsideMoviAreRefused) {
+    Bytes file(VideoWithFlags({0x10, 0x10, 0x10, 0x10}));
+    size_t idx1 = file.size() - 4 * 16;
+    file.patch_le32(idx1 + 8, 0x7FFFFFF0);                               // entry 0: offset far past movi
+    file.patch_le32(idx1 + 16 + 12, 0x7FFFFFF0);                         // entry 1: length above movi
+    file.patch_le32(idx1 + 32 + 8, static_cast<uint32_t>(file.size()));  // entry 2: data past the file
+    Indexed f(file.data());
+    ASSERT_EQ(f.Open(), MM_OK);
+    _FrameInfo frame{};
+    EXPECT_EQ(f->getNextFrame(0, &frame), MM_E_FAIL);
+    uint32_t actual = 0;
+    ASSERT_EQ(f->setMediaTime(0, 40, &actual), MM_OK);
+    EXPECT_EQ(f->getNextFrame(0, &frame), MM_E_FAIL);
+}
+
+TEST(AviHostile, IndexSizesAndTruncationsStayBounded) {
+    std::vector<uint8_t> good = Interleaved(8, 4);
+    // An idx1 that claims almost the whole file while holding few entries.
+    Bytes big(good);
+    size_t idx1 = good.size() - 12 * 16 - 8;
+    ASSERT_EQ(std::memcmp(good.data() + idx1, "idx1", 4), 0);
+    big.patch_le32(idx1 + 4, static_cast<uint32_t>(good.size() - 1));
+    {
+        Indexed f(big.data());
+        EXPECT_EQ(f.Open(), MM_E_FAIL) << "the header walk sees the chunk pass the end of the file";
+        ASSERT_EQ(f->locateChunk("movi"), MM_OK);
+        ASSERT_EQ(f->parseMovi(f->getFileHandle()), MM_OK);
+        ASSERT_EQ(f->locateChunk("idx1"), MM_OK);
+        EXPECT_EQ(f->parseIdx1(f->getFileHandle()), MM_OK);
+        EXPECT_EQ(f->getIndexCount(), 12u) << "no more entries than the file holds";
+    }
+    // Every truncation of the file runs through the whole sequence.
+    for (size_t n = 0; n < good.size(); n += 11) {
+        Indexed f(std::vector<uint8_t>(good.begin(), good.begin() + static_cast<long>(n)));
+        f.Open();
+        uint32_t actual = 0;
+        f->setMediaTime(0, 100, &actual);
+        _FrameInfo frame{};
+        for (int i = 0; i < 20 && f->getNextFrame(0, &frame) == MM_OK; ++i) MM_MediaExtractor_FreeBuffer(frame.pData);
+    }
+}
