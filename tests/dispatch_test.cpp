@@ -1,10 +1,19 @@
+// The exported interface: argument checks, the records it clears, the answer of
+// each type's slots, freeing; the records' layout and the codec names.
 #include <gtest/gtest.h>
 
+#include <cstddef>
 #include <cstring>
+#include <string>
+#include <vector>
 
+#include "core/byte_reader.h"
+#include "core/codes.h"
+#include "core/unsync.h"
 #include "metainfo/metainfo.h"
 #include "support/bytes.h"
 
+using namespace metainfo;
 using testing_support::Bytes;
 using testing_support::TempDir;
 
@@ -16,26 +25,10 @@ protected:
     std::string midi = dir.Write("tune.mid", Bytes().str("MThd").be32(6).zeros(120));
     std::string wave = dir.Write("tone.wav", Bytes().str("RIFF").le32(120).str("WAVE").zeros(116));
     std::string mp4 = dir.Write("clip.mp4", Bytes().be32(16).str("ftypisom").zeros(112));
-    std::string avi = dir.Write("clip.avi", Bytes().str("RIFF").le32(120).str("AVI ").zeros(116));
     std::string missing = dir.PathOf("missing.wav");
 };
 
 }  // namespace
-
-TEST(DispatchTables, SlotsWithoutAFormatStayEmpty) {
-    for (int slot : {0, 10, 14, 15}) {
-        EXPECT_EQ(MM_GetTrackType[slot], nullptr) << slot;
-        EXPECT_EQ(MM_GetMetaInfo[slot], nullptr) << slot;
-        EXPECT_EQ(MM_GetClipInfo[slot], nullptr) << slot;
-        EXPECT_EQ(MM_GetMIMEType[slot], nullptr) << slot;
-        EXPECT_EQ(MM_GetAudioData[slot], nullptr) << slot;
-        EXPECT_EQ(MM_GetCodecType[slot], nullptr) << slot;
-    }
-    for (int slot = 0; slot < MM_MEDIA_SLOTS; ++slot) EXPECT_EQ(MM_GetVideoData[slot], nullptr);
-    EXPECT_EQ(MM_GetMIMEType[MEDIA_TYPE_MP4], nullptr);
-    EXPECT_EQ(MM_GetCodecType[MEDIA_TYPE_AVI], nullptr);
-    EXPECT_EQ(MM_GetCodecType[MEDIA_TYPE_MIDI], nullptr);
-}
 
 TEST_F(Dispatch, NullArgumentsAreInvalid) {
     int mask = 0;
@@ -62,54 +55,60 @@ TEST_F(Dispatch, NullArgumentsAreInvalid) {
     EXPECT_EQ(MM_MediaExtractor_GetMakerInfo(nullptr, nullptr), MM_E_INVALIDARG);
 }
 
-TEST_F(Dispatch, UnknownTypeIsUnsupportedAndEmptyTrackSlotMeansAudio) {
-    int mask = 0;
-    EXPECT_EQ(MM_MediaExtractor_GetTrackType(midi.c_str(), MEDIA_TYPE_UNKNOWN, &mask), MM_E_UNSUPPORTED);
-    EXPECT_EQ(MM_MediaExtractor_GetTrackType(midi.c_str(), MEDIA_TYPE_SND, &mask), MM_OK);
-    EXPECT_EQ(mask, TRACK_AUDIO);
-    mask = 0;
-    EXPECT_EQ(MM_MediaExtractor_GetTrackType(midi.c_str(), MEDIA_TYPE_MIDI, &mask), MM_OK);
-    EXPECT_EQ(mask, TRACK_AUDIO);
-    for (int bad : {-1, 16, 254, 256}) {
-        EXPECT_EQ(MM_MediaExtractor_GetTrackType(midi.c_str(), bad, &mask), MM_E_UNSUPPORTED) << bad;
+// What each type's slots answer for a MIDI file, records filled with garbage first:
+// track result/mask, codec result/audio codec/video level, clip result/duration
+// (milliseconds, at least one second once a slot ran)/file size, metadata
+// result/title length/picture: every record is cleared first. Empty slots
+// answer "not supported", except the track type, which answers audio.
+TEST_F(Dispatch, EachTypeSlotAnswers) {
+    std::string answers;
+    for (int type : {-1, 0, 1, 2, 3, 4, 5, 6, 7, 8, 9, 10, 11, 12, 13, 14, 15, 16, 254, 255, 256}) {
+        int mask = 0x5A;
         _MM_CODECTYPE codec;
-        EXPECT_EQ(MM_MediaExtractor_GetCodecType(midi.c_str(), bad, &codec), MM_E_UNSUPPORTED) << bad;
+        _MMClipInfo clip;
+        _MMMetaInfo meta;
+        std::memset(&codec, 0xFF, sizeof codec);
+        std::memset(&clip, 0xAB, sizeof clip);
+        std::memset(&meta, 0x11, sizeof meta);
+        const int32_t track = MM_MediaExtractor_GetTrackType(midi.c_str(), type, &mask);
+        const int32_t codecResult = MM_MediaExtractor_GetCodecType(midi.c_str(), type, &codec);
+        const int32_t clipResult = MM_MediaExtractor_GetClipInfo(midi.c_str(), type, &clip);
+        const int32_t metaResult = MM_MediaExtractor_GetMetaInfo(midi.c_str(), type, &meta);
+        char line[160];
+        std::snprintf(line, sizeof line, "%d: %x/%x %x/%x/%x %x/%u/%u %x/%u/%d\n", type, static_cast<unsigned>(track),
+                      static_cast<unsigned>(mask), static_cast<unsigned>(codecResult), codec.nAudioCodec,
+                      codec.nVideoLevel, static_cast<unsigned>(clipResult), clip.nDuration, clip.nFileSize,
+                      static_cast<unsigned>(metaResult), meta.aItems[0].nLength, meta.pPicture != nullptr);
+        answers += line;
+        MM_MediaExtractor_FreeMetaInfo(&meta);
     }
-}
-
-TEST_F(Dispatch, ClipInfoTurnsSecondsIntoMillisecondsOnlyAfterASlotRan) {
-    _MMClipInfo clip;
-    std::memset(&clip, 0xAB, sizeof clip);
-    EXPECT_EQ(MM_MediaExtractor_GetClipInfo(midi.c_str(), MEDIA_TYPE_MIDI, &clip), MM_E_NOTIMPL);
-    EXPECT_EQ(clip.nDuration, 1000u) << "a failed slot still reports at least one second";
-    EXPECT_EQ(clip.nFileSize, 0u) << "the record was cleared first";
-
-    std::memset(&clip, 0xAB, sizeof clip);
-    EXPECT_EQ(MM_MediaExtractor_GetClipInfo(midi.c_str(), MEDIA_TYPE_IMELODY, &clip), MM_E_UNSUPPORTED);
-    EXPECT_EQ(clip.nDuration, 0u);
-    EXPECT_EQ(MM_MediaExtractor_GetClipInfo(midi.c_str(), MEDIA_TYPE_UNKNOWN, &clip), MM_E_UNSUPPORTED);
-    EXPECT_EQ(clip.nDuration, 0u);
-}
-
-TEST_F(Dispatch, CodecAndMetadataRecordsAreClearedEvenWhenUnsupported) {
-    _MM_CODECTYPE codec;
-    std::memset(&codec, 0xFF, sizeof codec);
-    EXPECT_EQ(MM_MediaExtractor_GetCodecType(avi.c_str(), MEDIA_TYPE_AVI, &codec), MM_E_UNSUPPORTED);
-    EXPECT_EQ(codec.nAudioCodec, 0u);
-    EXPECT_EQ(codec.nVideoLevel, 0u);
-    EXPECT_EQ(MM_MediaExtractor_GetCodecType(midi.c_str(), MEDIA_TYPE_MIDI, &codec), MM_E_UNSUPPORTED);
-
-    _MMMetaInfo meta;
-    std::memset(&meta, 0x11, sizeof meta);
-    EXPECT_EQ(MM_MediaExtractor_GetMetaInfo(midi.c_str(), MEDIA_TYPE_MIDI, &meta), MM_E_NOTIMPL);
-    EXPECT_EQ(meta.pPicture, nullptr);
-    EXPECT_EQ(meta.aItems[0].nLength, 0u);
-    EXPECT_EQ(MM_MediaExtractor_GetCodecTypeEx(midi.c_str(), MEDIA_TYPE_MIDI, &codec), MM_E_UNSUPPORTED);
+    EXPECT_EQ(answers,
+              "-1: 800700e7/5a 800700e7/0/0 800700e7/0/0 800700e7/0/0\n"
+              "0: 0/1 800700e7/0/0 800700e7/0/0 800700e7/0/0\n"
+              "1: 0/1 800700e7/0/0 800700e7/1000/0 1/0/0\n"
+              "2: 1/0 1/0/0 ffffffff/1000/0 1/0/0\n"
+              "3: 80004005/0 80004005/0/0 80004005/1000/0 80004005/0/0\n"
+              "4: 1/0 1/0/0 ffffffff/1000/0 1/0/0\n"
+              "5: 0/1 800700e7/0/0 80004001/1000/0 80004001/0/0\n"
+              "6: 0/1 800700e7/1/0 800700e7/1000/128 1/0/0\n"
+              "7: 0/1 800700e7/0/0 800700e7/1000/0 800700e7/0/0\n"
+              "8: 0/1 800700e7/0/0 800700e7/1000/0 800700e7/0/0\n"
+              "9: 0/1 800700e7/0/0 800700e7/1000/0 800700e7/0/0\n"
+              "10: 0/1 800700e7/0/0 800700e7/0/0 800700e7/0/0\n"
+              "11: 80004005/5a 800700e7/0/0 80004005/1000/0 800700e7/0/0\n"
+              "12: 0/1 80004005/0/0 80004005/1000/128 800700e7/0/0\n"
+              "13: 0/1 0/8001/0 80004005/1000/0 800700e7/0/0\n"
+              "14: 0/1 800700e7/0/0 800700e7/0/0 800700e7/0/0\n"
+              "15: 0/1 800700e7/0/0 800700e7/0/0 800700e7/0/0\n"
+              "16: 800700e7/5a 800700e7/0/0 800700e7/0/0 800700e7/0/0\n"
+              "254: 800700e7/5a 800700e7/0/0 800700e7/0/0 800700e7/0/0\n"
+              "255: 800700e7/5a 800700e7/0/0 800700e7/0/0 800700e7/0/0\n"
+              "256: 800700e7/5a 800700e7/0/0 800700e7/0/0 800700e7/0/0\n");
+    EXPECT_EQ(MM_MediaExtractor_GetCodecTypeEx(midi.c_str(), MEDIA_TYPE_MIDI, nullptr), MM_E_UNSUPPORTED);
 }
 
 TEST_F(Dispatch, PathOnlyQueriesDetectTheTypeFirst) {
-    _MM_MIMETYPE mime;
-    std::memset(&mime, 0, sizeof mime);
+    _MM_MIMETYPE mime{};
     EXPECT_EQ(MM_MediaExtractor_GetMIMEType(mp4.c_str(), &mime), MM_E_UNSUPPORTED);
     EXPECT_EQ(mime.pszMimeType, nullptr);
     EXPECT_EQ(MM_MediaExtractor_GetMIMEType(missing.c_str(), &mime), MM_E_FAIL);
@@ -118,9 +117,7 @@ TEST_F(Dispatch, PathOnlyQueriesDetectTheTypeFirst) {
     EXPECT_EQ(MM_MediaExtractor_GetAudioData(midi.c_str(), 0, 1, &data, &size), MM_E_UNSUPPORTED);
     EXPECT_EQ(MM_MediaExtractor_GetAudioData(missing.c_str(), 0, 1, &data, &size), MM_E_FAIL);
     EXPECT_EQ(data, nullptr);
-}
-
-TEST_F(Dispatch, MakerInfoOfAnythingButMp4LeavesTheRecordUntouched) {
+    // The maker information of anything but MP4 leaves the record untouched.
     _MAKERINFO maker;
     std::memset(&maker, 0x5C, sizeof maker);
     EXPECT_EQ(MM_MediaExtractor_GetMakerInfo(wave.c_str(), &maker), MM_OK);
@@ -142,4 +139,60 @@ TEST_F(Dispatch, FreeingIsSafeAndIdempotent) {
     MM_MediaExtractor_FreeBuffer(nullptr);
     MM_MediaExtractor_FreeBuffer(new unsigned char[3]);
     EXPECT_EQ(MM_MediaExtractor_GetVideoData(nullptr, 0, 0, nullptr, nullptr), MM_OK);
+    for (int slot = 0; slot < MM_MEDIA_SLOTS; ++slot) EXPECT_EQ(MM_GetVideoData[slot], nullptr);
+}
+
+// Offsets that callers compile against (the sizes are asserted in the header).
+TEST(Records, LayoutsAndCodecNames) {
+    EXPECT_EQ(offsetof(_MMClipInfo, nFileSize), 128u);
+    EXPECT_EQ(offsetof(_MMClipInfo, nFrameRate), 188u);
+    EXPECT_EQ(offsetof(_MMMetaItem, nLength), 132u);
+    EXPECT_EQ(offsetof(_MMMetaInfo, pPicture), 2312u);
+    EXPECT_LT(offsetof(_MMMetaInfo, nPlayCount), offsetof(_MMMetaInfo, stAlbumArtist));
+    EXPECT_LT(offsetof(_MMMetaInfo, stAlbumArtist), offsetof(_MMMetaInfo, nReserved));
+    EXPECT_LT(offsetof(_MM_MIMETYPE, nMimeLength), offsetof(_MM_MIMETYPE, pszVideoMimeType));
+    EXPECT_LT(offsetof(_MAKERINFO, nThumbnailSize), offsetof(_MAKERINFO, pPhoneModel));
+    // Names as the binding hands them out, blanks and misspellings included; AMR
+    // frame-type sub-codes have none.
+    EXPECT_STREQ(CodecName(0x1001), "CODEC_MP3_LAYER1");
+    EXPECT_STREQ(CodecName(0x1030), "CODEC_WAVE_PCM  ");
+    EXPECT_STREQ(CodecName(0x1032), "CODEC_WAVE_ALAW ");
+    EXPECT_STREQ(CodecName(0x5010), "CODEC_WMV9_PEOFILE_SIMPLE");
+    EXPECT_STREQ(CodecName(0x400A), "CODEC_MP4AUDIO_MP4A_AAC_PLUS_V2");
+    EXPECT_EQ(CodecName(0), nullptr);
+    EXPECT_EQ(CodecName(0x1011), nullptr);
+}
+
+TEST(Records, ByteReaderAndSync) {
+    const uint8_t data[] = {0x01, 0x02, 0x03, 0x04, 0x05, 0x06, 0x07, 0x08, 0x09};
+    ByteReader r(data, sizeof data);
+    uint32_t be = 0;
+    uint16_t le = 0;
+    ASSERT_TRUE(r.BE32(&be));
+    EXPECT_EQ(be, 0x01020304u);
+    ASSERT_TRUE(r.LE16(&le));
+    EXPECT_EQ(le, 0x0605);
+    uint32_t tooFar = 0xDEAD;
+    EXPECT_FALSE(r.LE32(&tooFar));
+    EXPECT_EQ(tooFar, 0xDEADu) << "a failed read writes nothing";
+    EXPECT_EQ(r.position(), 6u) << "and does not move";
+    EXPECT_FALSE(r.Skip(4));
+    EXPECT_TRUE(r.Skip(3));
+    EXPECT_TRUE(r.empty());
+    EXPECT_FALSE(r.Seek(10));
+    EXPECT_TRUE(r.Seek(0));
+    EXPECT_TRUE(r.Tag("\x01\x02", 2));
+    EXPECT_EQ(ReadLE64(data), 0x0807060504030201ull);
+    EXPECT_EQ(ReadBE64(data), 0x0102030405060708ull);
+    const uint8_t syncsafe[] = {0x00, 0x00, 0x02, 0x01};
+    EXPECT_EQ(ReadSyncsafe32(syncsafe), 257u);
+    // Unsynchronisation drops the zero after each FF but looks no further.
+    const struct { std::vector<uint8_t> in, out; } cases[] = {
+        {{0xFF, 0x00}, {0xFF}}, {{0xFF, 0x00, 0x00}, {0xFF, 0x00}}, {{0xFF, 0xFF, 0x00}, {0xFF, 0xFF, 0x00}},
+        {{0x12, 0xFF, 0x00, 0xE0, 0xFF}, {0x12, 0xFF, 0xE0, 0xFF}}};
+    for (auto c : cases) {
+        c.in.resize(static_cast<size_t>(Sync(c.in.data(), static_cast<int>(c.in.size()))));
+        EXPECT_EQ(c.in, c.out);
+    }
+    EXPECT_EQ(Sync(nullptr, 4), 0);
 }

@@ -167,16 +167,15 @@ TEST_F(Protected, SeeksAreUncheckedAndOnlyTheThreeOriginsExist) {
     MEx_fclose(h);
 }
 
-TEST_F(Protected, SizeComesFromTheFileWhenTheServiceGivesNoLength) {
+// Without a content length the size comes from the file; stat takes the content
+// length without the file system.
+TEST_F(Protected, SizeComesFromTheContentLengthOrTheFile) {
     std::string path = WriteProtected("nolen.dcf", Bytes().str("xyz"), {{"drmtype", "1"}});
     int h = MEx_fopen(path.c_str(), "rb");
     ASSERT_NE(h, 0);
     EXPECT_EQ(MEx_fseek(h, 0, SEEK_END), 0);
     EXPECT_EQ(MEx_ftell(h), 3);
     MEx_fclose(h);
-}
-
-TEST_F(Protected, StatTakesTheContentLengthWithoutTheFileSystem) {
     service.metadata["/nowhere/movie.dcf"] = {{"drmtype", "1"}, {"contentlen", "10000"}};
     struct stat st;
     std::memset(&st, 0, sizeof st);
@@ -185,7 +184,9 @@ TEST_F(Protected, StatTakesTheContentLengthWithoutTheFileSystem) {
     EXPECT_NE(MEx_stat("/nowhere/other.dcf", &st), 0) << "no metadata: the file system answers";
 }
 
-TEST_F(Protected, OnlyContainerBasedSessionsAreRead) {
+// Only container-based sessions are read; a refused session fails the open and
+// logs why; DRM type 0 opens the file as a plain one; detection sees the plain content.
+TEST_F(Protected, SessionKindsAndDetection) {
     service.apiType = 1;
     std::string path = WriteProtected("other.dcf", Bytes().str("abcd"), {{"drmtype", "1"}});
     int h = MEx_fopen(path.c_str(), "rb");
@@ -194,34 +195,26 @@ TEST_F(Protected, OnlyContainerBasedSessionsAreRead) {
     EXPECT_EQ(MEx_fread(buf, 1, 4, h), 0);
     EXPECT_TRUE(service.readOffsets.empty());
     MEx_fclose(h);
-}
-
-TEST_F(Protected, ARefusedSessionFailsTheOpenAndLogsWhy) {
+    service.apiType = 2;
     service.refuseSessions = true;
-    std::string path = WriteProtected("locked.dcf", Bytes().str("abcd"), {{"drmtype", "1"}});
     EXPECT_EQ(MEx_fopen(path.c_str(), "rb"), 0);
     ASSERT_EQ(g_log.size(), 1u);
     EXPECT_EQ(g_log[0].first, 6);
     EXPECT_EQ(g_log[0].second, "MetaInfoExtractor|open failed pDecryptHandle is NULL");
-}
+    service.refuseSessions = false;
 
-TEST_F(Protected, DrmTypeZeroOpensTheFileAsPlain) {
-    std::string path = dir.Write("plain.dcf", Bytes().str("RIFF"));
-    service.metadata[path] = {{"drmtype", "0"}};
-    int h = MEx_fopen(path.c_str(), "rb");
+    std::string plain = dir.Write("plain.dcf", Bytes().str("RIFF"));
+    service.metadata[plain] = {{"drmtype", "0"}};
+    h = MEx_fopen(plain.c_str(), "rb");
     ASSERT_NE(h, 0);
-    char buf[4];
     EXPECT_EQ(MEx_fread(buf, 2, 2, h), 2) << "a plain handle counts items";
     EXPECT_EQ(service.openSessions, 0);
     MEx_fclose(h);
-}
 
-TEST_F(Protected, DetectionSeesThePlainContent) {
-    Bytes wave;
-    wave.str("RIFF").le32(28).str("WAVE").str("fmt ").le32(16).zeros(16);
-    std::string path = WriteProtected("tone.dcf", wave, {{"drmtype", "1"}});
+    std::string wave = WriteProtected("tone.dcf", Bytes().str("RIFF").le32(28).str("WAVE").str("fmt ").le32(16).zeros(16),
+                                      {{"drmtype", "1"}});
     int type = -1;
-    ASSERT_EQ(MM_MediaExtractor_DetectMediaType(path.c_str(), &type), MM_OK);
+    ASSERT_EQ(MM_MediaExtractor_DetectMediaType(wave.c_str(), &type), MM_OK);
     EXPECT_EQ(type, MEDIA_TYPE_WAVE);
 }
 
