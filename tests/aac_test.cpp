@@ -1,16 +1,22 @@
-// Raw AAC files: the ADTS and ADIF checks, clip information and codec type from
-// byte-built files, the corpus and ffmpeg-made streams.
+// Raw AAC: the ADTS and ADIF checks, clip information and codec type of byte-built
+// files, the corpus and ffmpeg-made streams; range extraction; and the raw data block
+// walker, which must step over real channel elements exactly, find SBR fill elements
+// and never read past the data it was given.
 #include <gtest/gtest.h>
+#include <unistd.h>
 
+#include <algorithm>
 #include <cstdlib>
 #include <cstring>
 #include <filesystem>
+#include <random>
 #include <string>
 #include <vector>
 
 #include "aac/aac_bits.h"
 #include "aac/aac_clip.h"
 #include "aac/aac_frame.h"
+#include "aac/aac_walker.h"
 #include "core/file_access.h"
 #include "metainfo/aac.h"
 #include "metainfo/metainfo.h"
@@ -21,6 +27,9 @@
 
 using namespace testing_support;
 using namespace metainfo;
+using metainfo::AacBitReader;
+using metainfo::MakeAacBitReader;
+using metainfo::RawDataStream;
 
 namespace {
 
@@ -299,4 +308,368 @@ TEST(AacFfmpeg, ClipInfoMatchesTheEncodedStream) {
         EXPECT_GE(clip.nDuration, 3u) << out;
         EXPECT_LE(clip.nDuration, 12u) << out;
     }
+}
+
+namespace {
+
+// 8000 Hz: a frame of F bytes makes 62.5 x F bit/s.
+const auto kLayout8k = AdtsLayout(11, 1);
+
+// n frames of 100 bytes: 6250 bit/s, 12 whole seconds for 100 frames.
+std::vector<uint8_t> HundredByteFrames(size_t n) { return AdtsFrames(kLayout8k, std::vector<size_t>(n, 100)); }
+
+std::vector<uint8_t> Slice(const std::vector<uint8_t>& v, size_t from, size_t to) {
+    return std::vector<uint8_t>(v.begin() + static_cast<long>(from), v.begin() + static_cast<long>(to));
+}
+
+// An ADIF file of no sync word; a bitrate of 0 makes its duration 0.
+std::vector<uint8_t> AdifWithoutSync(uint32_t bitrate) {
+    AdifLayout layout;
+    layout.bitrate = bitrate;
+    return Join(AdifFile(layout, AacBlock(false, 0, 20)), std::vector<uint8_t>(5000, 0x11));
+}
+
+struct BufResult { int32_t result; std::vector<uint8_t> data; bool terminated; };
+
+BufResult CutToBuffer(const std::string& path, int start, int end) {
+    unsigned char* data = nullptr;
+    int length = -2;
+    BufResult r{AAC_GetAuidoData_Buf(path.c_str(), start, end, &data, &length), {}, false};
+    if (r.result == MM_OK && data != nullptr) {
+        r.data.assign(data, data + length);
+        r.terminated = data[length] == 0;
+        MM_MediaExtractor_FreeBuffer(data);
+    }
+    return r;
+}
+
+}  // namespace
+
+// Before the file variant's audio come the 20 bytes after the first 128: byte
+// 5 of an ADTS header has the bit that the leading-tag copy tests without
+// looking for "ID3". The buffer variant drops the frame the range end cuts.
+TEST(AacExtract, CutsAtTheFirstSyncAtOrAfterEachOffsetWithTheEndClamped) {
+    TempDir dir;
+    const std::vector<uint8_t> input = HundredByteFrames(100);
+    const std::string path = dir.Write("in.aac", input);
+    const std::string out = dir.PathOf("out.aac");
+    // 1 s -> byte 833 -> sync at 900; 4 s -> byte 3333 -> sync at 3400.
+    ASSERT_EQ(MM_OK, AAC_GetAuidoData_File(path.c_str(), 1, 4, out.c_str()));
+    EXPECT_EQ(Join(Slice(input, 128, 148), Slice(input, 900, 3400)), ReadFileBytes(out));
+    const BufResult r = CutToBuffer(path, 1, 4);
+    ASSERT_EQ(MM_OK, r.result);
+    EXPECT_EQ(Slice(input, 900, 3300), r.data);
+    EXPECT_TRUE(r.terminated);
+    ASSERT_EQ(MM_OK, AAC_GetAuidoData_File(path.c_str(), 6, 1000, out.c_str()));
+    EXPECT_EQ(Join(Slice(input, 128, 148), Slice(input, 5000, input.size())), ReadFileBytes(out));
+}
+
+TEST(AacExtractFile, LeadingTagBodyAndTrailingTagAreCopied) {
+    TempDir dir;
+    Bytes body;
+    for (int i = 0; i < 300; ++i) body.u8(static_cast<uint8_t>(i * 7));
+    const std::vector<uint8_t> trailer = Bytes().str("TAG").fill(125, 'x').data();
+    const std::vector<uint8_t> input = Join(Join(Id3v2Tag(3, body.data()), HundredByteFrames(100)), trailer);
+    const std::string path = dir.Write("tags.aac", input);
+    const std::string out = dir.PathOf("out.aac");
+    ASSERT_EQ(MM_OK, AAC_GetAuidoData_File(path.c_str(), 0, 2, out.c_str()));
+    const std::vector<uint8_t> result = ReadFileBytes(out);
+    // The tag's size of bytes, read from where the 128-byte probe stopped.
+    ASSERT_GE(result.size(), 300u + 128u + 100u);
+    EXPECT_EQ(Slice(input, 128, 428), Slice(result, 0, 300));
+    EXPECT_EQ(trailer, Slice(result, result.size() - 128, result.size()));
+    // Between them, whole frames from a sync word on.
+    EXPECT_EQ(0xFF, result[300]);
+    EXPECT_EQ(0u, (result.size() - 428) % 100);
+}
+
+// No sync word: each offset moves by (bytes read - 100), and the buffer
+// variant, which needs a frame start, rejects the range.
+TEST(AacExtractFile, AdifFileIsCutAsRawBytes) {
+    TempDir dir;
+    const std::vector<uint8_t> input = AdifWithoutSync(8000);
+    const std::string path = dir.Write("adif.aac", input);
+    const std::string out = dir.PathOf("out.aac");
+    ASSERT_EQ(MM_OK, AAC_GetAuidoData_File(path.c_str(), 1, 3, out.c_str()));
+    const size_t size = input.size();
+    const size_t from = 1 * size / 5, to = 3 * size / 5;
+    const size_t shiftFrom = std::min<size_t>(8192, size - from) - 100;
+    const size_t shiftTo = std::min<size_t>(8192, size - to) - 100;
+    EXPECT_EQ(Slice(input, from + shiftFrom, to + shiftTo), ReadFileBytes(out));
+    EXPECT_EQ(1, CutToBuffer(path, 1, 3).result);
+}
+
+// 30 small frames set the bit rate (8000 bit/s); large frames follow, so that
+// one second of bytes is shorter than a frame.
+TEST(AacExtractBuf, RangeWithOneSyncGivesNothingAndWithoutSyncIsRejected) {
+    TempDir dir;
+    std::vector<uint8_t> input = AdtsFrames(kLayout8k, std::vector<size_t>(30, 128));
+    for (int i = 0; i < 10; ++i) input = Join(input, AdtsFrame(kLayout8k, std::vector<uint8_t>(3993, 0)));
+    const std::string path = dir.Write("big.aac", input);
+    ASSERT_EQ(43840u, input.size());  // 43 seconds, 1019 bytes each
+    // 39 s: bytes 39763..40782 hold the frame start at 39840 only.
+    const BufResult one = CutToBuffer(path, 39, 40);
+    ASSERT_EQ(MM_OK, one.result);
+    EXPECT_TRUE(one.data.empty());
+    EXPECT_TRUE(one.terminated);
+    // 40 s: bytes 40781..41800 hold no frame start.
+    EXPECT_EQ(1, CutToBuffer(path, 40, 41).result);
+}
+
+// Frames of 8 bytes (header and an END element) at 8 kHz: 500 bit/s, so one
+// second is 62 bytes, too few to look for a sync word in.
+TEST(AacExtractBuf, RangeOfAHundredBytesOrLessIsNotFrontTrimmed) {
+    TempDir dir;
+    std::vector<uint8_t> input;
+    for (int i = 0; i < 100; ++i) input = Join(input, AdtsFrame(kLayout8k, {0xE0}));
+    const BufResult r = CutToBuffer(dir.Write("small.aac", input), 2, 3);  // 800 bytes, 12 s
+    ASSERT_EQ(MM_OK, r.result);
+    // Bytes 133..200: kept from 133 (inside a frame) up to the last sync at 192.
+    EXPECT_EQ(Slice(input, 133, 192), r.data);
+}
+
+// Handles are closed on the rejected paths as on the successful ones.
+TEST(AacExtract, RejectedRangesAnswerOneAndCloseTheirFiles) {
+    TempDir dir;
+    const std::string path = dir.Write("in.aac", HundredByteFrames(100));  // 12 s
+    const std::string zeroDuration = dir.Write("zero.aac", AdifWithoutSync(0));
+    const std::string notAac = dir.Write("zeros.aac", std::vector<uint8_t>(4000, 0));
+    const std::string tiny = dir.Write("tiny.aac", AdtsFrames(kLayout8k, std::vector<size_t>(4, 30)));
+    const std::string missing = dir.PathOf("missing.aac");
+    const std::string out = dir.PathOf("out.aac");
+    const int before = OpenDescriptors();
+    struct Case { const std::string* file; int start, end; };
+    for (const Case& c : {Case{&path, 3, 3}, Case{&path, 4, 2}, Case{&path, 12, 20}, Case{&path, 50, 60},
+                          Case{&zeroDuration, -5, 5}, Case{&notAac, 0, 1}, Case{&missing, 0, 1}, Case{&tiny, -1, 1}}) {
+        EXPECT_EQ(1, AAC_GetAuidoData_File(c.file->c_str(), c.start, c.end, out.c_str())) << *c.file << c.start;
+        EXPECT_EQ(1, CutToBuffer(*c.file, c.start, c.end).result) << *c.file << c.start;
+    }
+    // 64 MiB at 6250 bit/s: a late time times the size leaves 32 bits, so
+    // nothing is cut; an early one still is.
+    const std::string large = dir.Write("large.aac", HundredByteFrames(100));
+    ASSERT_EQ(0, ::truncate(large.c_str(), 64 << 20));
+    EXPECT_EQ(MM_E_UNSUPPORTED, AAC_GetAuidoData_File(large.c_str(), 0, 80000, out.c_str()));
+    EXPECT_EQ(MM_E_UNSUPPORTED, CutToBuffer(large, 0, 80000).result);
+    EXPECT_EQ(MM_OK, CutToBuffer(large, 0, 1).result);
+    EXPECT_EQ(1, AAC_GetAuidoData_File(path.c_str(), 0, 1, dir.PathOf("no/such/dir.aac").c_str()));
+    EXPECT_EQ(MM_E_INVALIDARG, AAC_GetAuidoData_Buf(path.c_str(), 0, 1, nullptr, nullptr));
+    EXPECT_EQ(MM_OK, AAC_GetAuidoData_File(path.c_str(), 1, 4, out.c_str()));
+    EXPECT_EQ(MM_OK, CutToBuffer(path, 1, 4).result);
+    EXPECT_EQ(before, OpenDescriptors());
+}
+
+// The cut points are the first 12-bit sync patterns found, which may lie
+// inside a frame (and the file variant starts with the leading-tag copy), so
+// the decoder may skip a little at the start; the rest decodes.
+TEST(AacExtractFfmpeg, CutsDecode) {
+    if (!HaveFfmpeg()) GTEST_SKIP() << "ffmpeg not installed";
+    TempDir dir;
+    const std::string in = dir.PathOf("in.aac");
+    const std::string cmd = "/usr/bin/ffmpeg -hide_banner -loglevel error -y -f lavfi -i "
+                            "\"anoisesrc=d=6:c=pink:a=0.3:seed=7:r=44100\" -ac 2 -c:a aac \"" + in + "\"";
+    ASSERT_EQ(0, std::system(cmd.c_str()));
+    const std::string fileCut = dir.PathOf("cut.aac");
+    ASSERT_EQ(MM_OK, AAC_GetAuidoData_File(in.c_str(), 1, 4, fileCut.c_str()));
+    const BufResult r = CutToBuffer(in, 1, 4);
+    ASSERT_EQ(MM_OK, r.result);
+    for (const std::string& cut : {fileCut, dir.Write("buf.aac", r.data)}) {
+        const std::string pcm = dir.PathOf("decoded.raw");
+        const std::string decode = "/usr/bin/ffmpeg -hide_banner -loglevel quiet -y -f aac -i \"" + cut +
+                                   "\" -f s16le -ac 1 -ar 8000 \"" + pcm + "\"";
+        ASSERT_EQ(0, std::system(decode.c_str())) << cut;
+        const double seconds = static_cast<double>(ReadFileBytes(pcm).size()) / 2 / 8000;
+        EXPECT_GT(seconds, 2.5) << cut;
+        EXPECT_LT(seconds, 3.5) << cut;
+    }
+}
+
+namespace {
+
+struct Frame { size_t offset, length; int samplingIndex, headerSize, rawBlocks; };
+
+std::vector<Frame> AdtsFramesOf(const std::vector<uint8_t>& data) {
+    std::vector<Frame> frames;
+    size_t pos = 0;
+    while (pos + 7 <= data.size() && data[pos] == 0xFF && (data[pos + 1] & 0xF6) == 0xF0) {
+        const uint8_t* h = &data[pos];
+        const size_t length = (h[3] & 3u) << 11 | uint32_t{h[4]} << 3 | uint32_t{h[5]} >> 5;
+        if (length < 7 || pos + length > data.size()) break;
+        frames.push_back({pos, length, (h[2] >> 2) & 0x0F, (h[1] & 1) ? 7 : 9, h[6] & 3});
+        pos += length;
+    }
+    return frames;
+}
+
+// Walks the block of every frame; returns a description of the frames whose
+// walk does not end exactly at the frame's end. Frames with a short-window TNS
+// filter are read one bit short per coefficient on purpose; for them only the
+// bound is checked, and they are counted in *shortTns.
+std::string WalkEveryFrame(const std::vector<uint8_t>& data, size_t* walked, size_t* shortTns = nullptr) {
+    std::string failures;
+    *walked = 0;
+    if (shortTns != nullptr) *shortTns = 0;
+    for (const Frame& f : AdtsFramesOf(data)) {
+        if (f.rawBlocks != 0) continue;
+        // The whole file is the data, so a walk that overruns the frame shows.
+        AacBitReader r = MakeAacBitReader(data.data(), static_cast<int>(data.size()),
+                                          static_cast<int>(f.offset) + f.headerSize);
+        uint32_t state = metainfo::kWalkPlain;
+        RawDataStream(&r, &state, f.samplingIndex);
+        const size_t end = static_cast<size_t>(r.bytePos);
+        if (r.shortWindowTns) {
+            if (shortTns != nullptr) ++*shortTns;
+            if (end > data.size()) failures += "frame at " + std::to_string(f.offset) + " walked past the data\n";
+            continue;
+        }
+        ++*walked;
+        if (r.exhausted || r.bitCount != 8 || end != f.offset + f.length) {
+            failures += "frame at " + std::to_string(f.offset) + " (" + std::to_string(f.length) +
+                        " bytes) walk ended at " + std::to_string(end) + "\n";
+        }
+    }
+    return failures;
+}
+
+// Walks one raw data block from its first byte.
+AacBitReader Walk(const std::vector<uint8_t>& block, int samplingIndex, uint32_t* state) {
+    AacBitReader r = MakeAacBitReader(block.data(), static_cast<int>(block.size()), 0);
+    *state = metainfo::kWalkPlain;
+    EXPECT_EQ(1, RawDataStream(&r, state, samplingIndex));
+    return r;
+}
+
+}  // namespace
+
+TEST(AacWalker, EndElementFirstReadsNothingElse) {
+    uint32_t state;
+    const AacBitReader r = Walk({0xE0, 0xFF, 0xFF}, 4, &state);
+    EXPECT_EQ(1, r.bytePos);
+    EXPECT_EQ(8, r.bitCount);
+    EXPECT_EQ(metainfo::kWalkPlain, state);
+}
+
+// After an SCE, an LFE, or a CPE with or without a common window (then two
+// independent channel streams), and a data stream element (escaped count or
+// not, aligned or not), only fill extensions 13 and 14 set the state.
+TEST(AacWalker, OnlySbrFillExtensionsSetTheState) {
+    const char* const elements[] = {"SCE", "LFE", "CPE", "CPE without common window"};
+    for (int ext : {0, 1, 11, 12, 13, 14, 15}) {
+        for (int e = 0; e < 4; ++e) {
+            BitWriter w;
+            if (e < 2) {
+                PutSilentSce(w, e == 0 ? 0 : 3);
+            } else {
+                PutSilentCpe(w, e == 2);
+            }
+            PutDataStream(w, e >= 2 ? 260 : 2, e != 1);
+            PutFill(w, ext, 3);
+            PutEnd(w);
+            uint32_t state;
+            const AacBitReader r = Walk(w.bytes(), 3, &state);
+            const bool sbr = ext == 13 || ext == 14;
+            EXPECT_EQ(sbr ? metainfo::kWalkSbrFound : metainfo::kWalkPlain, state) << ext << " " << elements[e];
+            EXPECT_EQ(static_cast<int>(w.bytes().size()), r.bytePos) << ext << " " << elements[e];
+            EXPECT_FALSE(r.exhausted);
+        }
+    }
+}
+
+TEST(AacWalker, MaxSfbAboveBandCountStopsElementAndWalkGoesOn) {
+    BitWriter w;
+    w.put(0, 3).put(0, 4).put(100, 8);           // SCE, tag, global_gain
+    w.put(0, 1).put(0, 2).put(0, 1).put(63, 6);  // long window, max_sfb 63 > 49 bands at 44.1 kHz
+    PutFill(w, 13, 1);                           // read as the next element
+    PutEnd(w);
+    AacBitReader r = MakeAacBitReader(w.bytes().data(), static_cast<int>(w.bytes().size()), 0, 5);
+    EXPECT_EQ(metainfo::kWalkMaxSfb, metainfo::single_lfe_channel_element(&r, 4));
+    uint32_t state;
+    Walk(w.bytes(), 4, &state);
+    EXPECT_EQ(metainfo::kWalkSbrFound, state);
+}
+
+// A corrupt or truncated stream ends the walk at the end of the data: the
+// buffers are allocated to their exact size, so the sanitizers see any read
+// past them.
+TEST(AacWalker, CorruptStreamsNeverReadPastTheData) {
+    std::mt19937 rng(1234);
+    for (int round = 0; round < 3000; ++round) {
+        const size_t size = 1 + rng() % 600;
+        std::vector<uint8_t> data(size);
+        for (auto& b : data) b = static_cast<uint8_t>(rng());
+        // Bias some buffers towards long runs of ones and zeros (escapes, sections).
+        if (round % 3 == 1) for (size_t i = 0; i < size; i += 2) data[i] = 0xFF;
+        if (round % 3 == 2) for (size_t i = 0; i < size; i += 3) data[i] = 0x00;
+        AacBitReader r = MakeAacBitReader(data.data(), static_cast<int>(size), 0);
+        uint32_t state = metainfo::kWalkPlain;
+        RawDataStream(&r, &state, static_cast<int>(rng() % 16));
+        ASSERT_LE(r.bytePos, static_cast<int>(size));
+    }
+}
+
+TEST(AacWalker, TruncatedRealBlocksEndAtTheCut) {
+    const std::vector<uint8_t> full = AacBlock(true, 13, 40);
+    for (size_t cut = 1; cut < full.size(); ++cut) {
+        uint32_t state;
+        EXPECT_TRUE(Walk(std::vector<uint8_t>(full.begin(), full.begin() + static_cast<long>(cut)), 4, &state).exhausted)
+            << cut;
+    }
+}
+
+// ffmpeg's encoder writes long and short windows, pairs with a common window,
+// M/S, intensity and noise bands, TNS in long and short windows, every
+// spectral book with escapes, and (AAC Main) prediction: walking each frame's
+// block must end exactly at the frame's end.
+TEST(AacWalker, FfmpegStreamsWalkToEveryFrameEnd) {
+    if (!HaveFfmpeg()) GTEST_SKIP() << "ffmpeg not installed";
+    TempDir dir;
+    struct Case { const char* name; std::string input; const char* options; };
+    const std::string clicks =
+        "aevalsrc=if(lt(mod(t\\,0.25)\\,0.004)\\,0.9*sin(2*PI*3000*t)\\,0.02*random(0))"
+        "|0.5*sin(2*PI*440*t)+0.3*random(1):d=2:s=";
+    const Case cases[] = {
+        {"mono8", "sine=d=2:f=300:r=8000", "-ac 1"},
+        {"mono11", "anoisesrc=d=2:c=pink:seed=7:r=11025", "-ac 1"},
+        {"mono16", "sine=d=2:f=1000:r=16000", "-ac 1 -b:a 64k"},
+        {"stereo22", clicks + "22050", "-b:a 96k"},
+        {"stereo32", "anoisesrc=d=2:c=white:seed=7:r=32000:a=0.9", "-ac 2 -b:a 160k"},
+        {"mono44", "sine=d=2:f=440:r=44100", "-ac 1"},
+        {"stereo44", clicks + "44100", "-b:a 128k"},
+        {"stereo48", clicks + "48000", "-b:a 256k"},
+        {"stereo48low", clicks + "48000", "-b:a 32k"},
+        {"loud24", "sine=d=2:f=60:r=24000,volume=40", "-ac 2 -b:a 128k"},
+        {"main44", "sine=d=2:f=440:r=44100", "-ac 2 -profile:a aac_main -aac_pred 1"},
+        {"main48", clicks + "48000", "-profile:a aac_main -aac_pred 1 -b:a 128k"},
+    };
+    for (const Case& c : cases) {
+        const std::string out = dir.PathOf(std::string(c.name) + ".aac");
+        const std::string cmd = "/usr/bin/ffmpeg -hide_banner -loglevel error -y -f lavfi -i \"" + c.input +
+                                "\" " + c.options + " -c:a aac \"" + out + "\"";
+        ASSERT_EQ(0, std::system(cmd.c_str())) << cmd;
+        const std::vector<uint8_t> data = ReadFileBytes(out);
+        size_t walked = 0;
+        size_t shortTns = 0;
+        EXPECT_EQ("", WalkEveryFrame(data, &walked, &shortTns)) << c.name;
+        EXPECT_GT(walked, 10u) << c.name;
+        EXPECT_LT(shortTns * 4, walked) << c.name << ": most frames are checked exactly";
+    }
+}
+
+// Short-window TNS coefficients are read one bit shorter than long-window ones:
+// a block written that way walks to its end.
+TEST(AacWalker, ShortWindowTnsCoefficientsAreOneBitShorter) {
+    BitWriter w;
+    w.put(0, 3).put(0, 4).put(100, 8);                       // SCE, tag, global_gain
+    w.put(0, 1).put(2, 2).put(0, 1).put(0, 4).put(0, 7);     // eight short windows, max_sfb 0
+    w.put(0, 1).put(1, 1);                                   // no pulse data, TNS present
+    w.put(1, 1).put(1, 1).put(5, 4).put(2, 3).put(0, 1).put(0, 1);  // window 0: one filter of order 2
+    w.put(5, 3).put(2, 3);                                   // two coefficients of 1 + 3 - 0 - 1 bits
+    for (int win = 1; win < 8; ++win) w.put(0, 1);           // no filters in the other windows
+    w.put(0, 1);                                             // no gain control
+    PutEnd(w);
+    uint32_t state;
+    const AacBitReader r = Walk(w.bytes(), 4, &state);
+    EXPECT_TRUE(r.shortWindowTns);
+    EXPECT_FALSE(r.exhausted);
+    EXPECT_EQ(static_cast<int>(w.bytes().size()), r.bytePos);
+    EXPECT_EQ(8, r.bitCount);
 }
