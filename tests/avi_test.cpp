@@ -1,9 +1,16 @@
-// AVI files built chunk by chunk: the header list and the clip and track
-// records built from it; the index, its entry times, neighbour searches,
-// seeking and frame delivery through the parser object.
+// AVI files: the header list and the clip and track records built from it; the index,
+// its entry times, neighbour searches, seeking and frame delivery through the parser
+// object; files written by ffmpeg checked against ffprobe; and the metainfo tool's
+// "frames" and "probe" over byte-built AVI and RealMedia files.
 #include <gtest/gtest.h>
+#include <limits.h>
+#include <unistd.h>
 
+#include <cmath>
+#include <cstdio>
+#include <cstdlib>
 #include <cstring>
+#include <string>
 #include <vector>
 
 #include "avi/avi_queries.h"
@@ -11,6 +18,8 @@
 #include "metainfo/metainfo.h"
 #include "support/avi_builder.h"
 #include "support/bytes.h"
+#include "support/ffprobe.h"
+#include "support/rm_builder.h"
 
 using namespace testing_support;
 
@@ -356,4 +365,130 @@ TEST(AviHostile, IndexSizesAndTruncationsStayBounded) {
         _FrameInfo frame{};
         for (int i = 0; i < 20 && f->getNextFrame(0, &frame) == MM_OK; ++i) MM_MediaExtractor_FreeBuffer(frame.pData);
     }
+}
+
+namespace {
+
+struct Variant {
+    const char* video;
+    const char* audio;
+};
+
+class AviFromFfmpeg : public ::testing::TestWithParam<Variant> {};
+
+}  // namespace
+
+TEST_P(AviFromFfmpeg, ClipAndFramesAgreeWithFfprobe) {
+    if (!HaveFfmpeg()) GTEST_SKIP() << "ffmpeg not installed";
+    TempDir dir;
+    std::string path = dir.PathOf("out.avi");
+    if (!FfmpegWrite(std::string("-f lavfi -i testsrc=d=2:s=176x144:r=25 -f lavfi -i sine=d=2 -c:v ") +
+                         GetParam().video + " -c:a " + GetParam().audio, path)) {
+        GTEST_SKIP() << "ffmpeg could not write " << GetParam().video;
+    }
+
+    std::string width = Probe(path, "stream=width", "-select_streams v:0");
+    std::string frames = Probe(path, "stream=nb_frames", "-select_streams v:0");
+    std::string tag = Probe(path, "stream=codec_tag_string", "-select_streams v:0");
+    double duration = std::atof(Probe(path, "format=duration").c_str());
+    ASSERT_FALSE(width.empty());
+
+    int type = 0;
+    ASSERT_EQ(MM_MediaExtractor_DetectMediaType(path.c_str(), &type), MM_OK);
+    ASSERT_EQ(type, MEDIA_TYPE_AVI);
+    _MMClipInfo clip{};
+    ASSERT_EQ(MM_MediaExtractor_GetClipInfo(path.c_str(), type, &clip), MM_OK);
+    EXPECT_EQ(clip.nWidth, std::stoul(width));
+    EXPECT_EQ(clip.nHeight, std::stoul(Probe(path, "stream=height", "-select_streams v:0")));
+    EXPECT_EQ(clip.nDuration, static_cast<uint32_t>(std::floor(duration)) * 1000);
+    EXPECT_EQ(clip.bHasAudio, 1u);
+    EXPECT_EQ(clip.nSampleRate, 44100u);
+    int mask = 0;
+    EXPECT_EQ(MM_MediaExtractor_GetTrackType(path.c_str(), type, &mask), MM_OK);
+    EXPECT_EQ(mask, TRACK_AUDIO | TRACK_VIDEO);
+
+    AviParserHandle parser;
+    ASSERT_EQ(parser.OpenIndexed(path), MM_OK);
+    EXPECT_EQ(parser->getMainHeader()->dwTotalFrames, std::stoul(frames));
+    const uint32_t handler = static_cast<uint32_t>(parser->getStreamType(0));
+    EXPECT_EQ(Bytes().be32(handler).data(), Bytes().str(tag).data()) << "the video handler FourCC";
+
+    uint32_t delivered = 0;
+    _FrameInfo frame{};
+    for (; parser->getNextFrame(0, &frame) == MM_OK; ++delivered) {
+        EXPECT_EQ(frame.dwTimeMs, delivered * 40);
+        MM_MediaExtractor_FreeBuffer(frame.pData);
+    }
+    EXPECT_EQ(delivered + 1, std::stoul(frames)) << "all frames but the last";
+
+    uint32_t actual = 0;
+    EXPECT_EQ(parser->setMediaTime(0, 1500, &actual), MM_OK);
+    EXPECT_LE(actual, 1500u);
+    ASSERT_EQ(parser->getNextFrame(0, &frame), MM_OK);
+    EXPECT_EQ(frame.dwFlags, AVI_KEYFRAME_FLAGS);
+    EXPECT_EQ(frame.dwTimeMs, actual);
+    MM_MediaExtractor_FreeBuffer(frame.pData);
+}
+
+INSTANTIATE_TEST_SUITE_P(Writers, AviFromFfmpeg,
+                         ::testing::Values(Variant{"mpeg4", "pcm_s16le"}, Variant{"msmpeg4", "libmp3lame"}),
+                         [](const ::testing::TestParamInfo<Variant>& param) {
+                             return std::string(param.param.video) + "_" + param.param.audio;
+                         });
+
+namespace {
+
+// The tool is built beside the test directory; "" when it is not there.
+std::string ToolPath() {
+    char self[PATH_MAX] = {};
+    if (readlink("/proc/self/exe", self, sizeof self - 1) <= 0) return "";
+    std::string dir(self);
+    dir = dir.substr(0, dir.rfind('/'));
+    std::string tool = dir.substr(0, dir.rfind('/')) + "/metainfo";
+    return access(tool.c_str(), X_OK) == 0 ? tool : "";
+}
+
+int RunTool(const std::string& args, std::string* out) {
+    FILE* p = popen((ToolPath() + " " + args + " 2>&1").c_str(), "r");
+    if (p == nullptr) return -1;
+    char buf[256];
+    while (fgets(buf, sizeof buf, p) != nullptr) *out += buf;
+    int status = pclose(p);
+    return WIFEXITED(status) ? WEXITSTATUS(status) : -1;
+}
+
+}  // namespace
+
+TEST(MetainfoTool, FramesListsEntriesAndReadsFramesFromTheSeekPoint) {
+    if (ToolPath().empty()) GTEST_SKIP() << "metainfo tool not built beside the tests";
+    TempDir dir;
+    std::string path = dir.Write("clip.avi", AviVideoOnly(20, 5));
+    std::string out;
+    ASSERT_EQ(RunTool("frames '" + path + "' --stream 0 --seek 500", &out), 0) << out;
+    EXPECT_NE(out.find("index: 20 entries"), std::string::npos) << out;
+    EXPECT_NE(out.find("#19     00dc time 760 ms, size 9, -"), std::string::npos) << out;
+    EXPECT_NE(out.find("seek to 500 ms: at 400 ms"), std::string::npos) << out;
+    EXPECT_NE(out.find("time 400 ms, size 7, key"), std::string::npos) << out;
+    EXPECT_NE(out.find("9 frame(s)"), std::string::npos) << out << "frames 10..18; the last entry stays";
+
+    EXPECT_EQ(RunTool("frames '" + path + "' --stream 3", &out), 1);
+    EXPECT_EQ(RunTool("frames", &out), 2);
+    std::string rm = dir.Write("clip.rm", RmFile(RmProps(), {RmMdpr(RmStream())}));
+    EXPECT_EQ(RunTool("frames '" + rm + "'", &out), 1) << "not an AVI file";
+}
+
+TEST(MetainfoTool, ProbeShowsAviAndRealMedia) {
+    if (ToolPath().empty()) GTEST_SKIP() << "metainfo tool not built beside the tests";
+    TempDir dir;
+    std::string avi = dir.Write("clip.avi", AviVideoOnly(50, 10));
+    RmStream audio;
+    audio.typeData = RaHeaderV4(22050, 16, 1, "cook");
+    std::string rm = dir.Write("clip.rm", RmFile(RmProps(), {RmCont("Song", "", "", ""), RmMdpr(audio)}));
+    std::string out;
+    ASSERT_EQ(RunTool("probe '" + avi + "' '" + rm + "'", &out), 0) << out;
+    EXPECT_NE(out.find("media type: 11 (avi)"), std::string::npos) << out;
+    EXPECT_NE(out.find("16x16, 25 fps"), std::string::npos) << out;
+    EXPECT_NE(out.find("media type: 2 (realmedia)"), std::string::npos) << out;
+    EXPECT_NE(out.find("CODEC_RMAUDIO_COOK"), std::string::npos) << out;
+    EXPECT_NE(out.find("Song"), std::string::npos) << out;
 }
