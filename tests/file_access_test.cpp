@@ -1,12 +1,20 @@
+// File access: plain files through the handle table, and protected files read
+// through a content-protection service; these tests install one that serves
+// scrambled files as their plain content.
 #include <gtest/gtest.h>
+#include <unistd.h>
 
 #include <cstdio>
 #include <cstring>
-#include <unistd.h>
+#include <map>
+#include <string>
 #include <thread>
+#include <utility>
 #include <vector>
 
+#include "core/drm.h"
 #include "core/file_access.h"
+#include "metainfo/metainfo.h"
 #include "support/bytes.h"
 
 using metainfo::GetFileExtension;
@@ -21,6 +29,7 @@ using metainfo::MEx_fwrite;
 using metainfo::MEx_stat;
 using testing_support::Bytes;
 using testing_support::TempDir;
+using namespace metainfo;
 
 namespace {
 
@@ -64,26 +73,6 @@ TEST(PlainFile, PathsOfFourCharactersOrFewerNeverOpen) {
     EXPECT_NE(h, 0) << "the same file under a five-character path opens";
     MEx_fclose(h);
     ASSERT_EQ(chdir(cwd), 0);
-}
-
-TEST(PlainFile, MissingFileFailsAndStatReportsSize) {
-    TempDir dir;
-    EXPECT_EQ(MEx_fopen(dir.PathOf("missing.mp3").c_str(), "rb"), 0);
-    std::string path = dir.Write("sized.bin", Bytes().zeros(1234));
-    struct stat st;
-    ASSERT_EQ(MEx_stat(path.c_str(), &st), 0);
-    EXPECT_EQ(st.st_size, 1234);
-    EXPECT_NE(MEx_stat(dir.PathOf("missing.mp3").c_str(), &st), 0);
-}
-
-TEST(PlainFile, WritesThroughAWritableHandle) {
-    TempDir dir;
-    std::string path = dir.PathOf("out.bin");
-    int h = MEx_fopen(path.c_str(), "wb");
-    ASSERT_NE(h, 0);
-    EXPECT_EQ(MEx_fwrite("abcdef", 3, 2, h), 2);
-    MEx_fclose(h);
-    EXPECT_EQ(testing_support::ReadFileBytes(path), Bytes().str("abcdef").data());
 }
 
 TEST(BadHandle, EveryCallAnswersMinusOneAndCloseAnswersZero) {
@@ -168,4 +157,216 @@ TEST(GetFileExtension, AVeryLongPathIsCutNotOverrun) {
     std::string shorter(100, 'b');
     shorter += ".wav";
     EXPECT_EQ(Extension(shorter.c_str(), &r), ".wav");
+}
+
+namespace {
+
+constexpr uint8_t kScramble = 0x5A;
+
+struct FakeService {
+    std::map<std::string, std::vector<std::pair<std::string, std::string>>> metadata;
+    int apiType = 2;
+    bool refuseSessions = false;
+    int openSessions = 0;
+    std::vector<long long> readOffsets;
+};
+
+FakeService* g_service = nullptr;
+
+int GetMetadata(void* ctx, const char* path, void (*emit)(void*, const char*, const char*), void* emitCtx) {
+    auto* service = static_cast<FakeService*>(ctx);
+    auto it = service->metadata.find(path);
+    if (it == service->metadata.end()) return 1;
+    for (const auto& kv : it->second) emit(emitCtx, kv.first.c_str(), kv.second.c_str());
+    emit(emitCtx, nullptr, "ignored");
+    return 0;
+}
+
+void* OpenSession(void* ctx, const char* path, int* apiType) {
+    auto* service = static_cast<FakeService*>(ctx);
+    if (service->refuseSessions) return nullptr;
+    FILE* f = std::fopen(path, "rb");
+    if (f == nullptr) return nullptr;
+    ++service->openSessions;
+    *apiType = service->apiType;
+    return f;
+}
+
+long long Pread(void* ctx, void* session, void* buf, size_t size, long long offset) {
+    static_cast<FakeService*>(ctx)->readOffsets.push_back(offset);
+    FILE* f = static_cast<FILE*>(session);
+    if (offset < 0 || ::fseeko(f, static_cast<off_t>(offset), SEEK_SET) != 0) return -1;
+    size_t n = std::fread(buf, 1, size, f);
+    for (size_t i = 0; i < n; ++i) static_cast<uint8_t*>(buf)[i] ^= kScramble;
+    return static_cast<long long>(n);
+}
+
+void CloseSession(void* ctx, void* session) {
+    --static_cast<FakeService*>(ctx)->openSessions;
+    std::fclose(static_cast<FILE*>(session));
+}
+
+std::vector<std::pair<int, std::string>> g_log;
+void CaptureLog(int priority, const char* tag, const char* message) {
+    g_log.emplace_back(priority, std::string(tag != nullptr ? tag : "") + "|" + message);
+}
+
+class Protected : public ::testing::Test {
+protected:
+    void SetUp() override {
+        g_service = &service;
+        MM_DrmProvider provider{&service, GetMetadata, OpenSession, Pread, CloseSession};
+        MM_MediaExtractor_SetDrmProvider(&provider);
+        g_log.clear();
+        MM_MediaExtractor_SetLogSink(CaptureLog);
+    }
+    void TearDown() override {
+        MM_MediaExtractor_SetDrmProvider(nullptr);
+        MM_MediaExtractor_SetLogSink(nullptr);
+        EXPECT_EQ(service.openSessions, 0) << "every decrypt session is closed";
+        g_service = nullptr;
+    }
+
+    // Writes the content scrambled, as the protected file lies on disk.
+    std::string WriteProtected(const std::string& name, std::vector<uint8_t> plain,
+                               std::vector<std::pair<std::string, std::string>> meta) {
+        for (uint8_t& b : plain) b ^= kScramble;
+        std::string path = dir.Write(name, plain);
+        service.metadata[path] = std::move(meta);
+        return path;
+    }
+
+    FakeService service;
+    TempDir dir;
+};
+
+}  // namespace
+
+TEST_F(Protected, CheckDRMDecidesByCaseSensitiveSuffixAndServiceAnswer) {
+    EXPECT_EQ(CheckDRM("a.fl"), -1);
+    EXPECT_EQ(CheckDRM("music.DCF"), 0);
+    EXPECT_EQ(CheckDRM("/x/song.mp3"), 0);
+    EXPECT_EQ(CheckDRM("/x/unknown.dcf"), 1) << "no metadata: treated as protected";
+    service.metadata["/x/plain.dcf"] = {{"drmtype", "0"}};
+    EXPECT_EQ(CheckDRM("/x/plain.dcf"), 0);
+    service.metadata["/x/typed.fl"] = {{"drmtype", "1a"}};
+    EXPECT_EQ(CheckDRM("/x/typed.fl"), 26);
+}
+
+TEST_F(Protected, MetadataKeysAreExactHexParsedCutAndLastWins) {
+    std::string longId(600, 'i');
+    service.metadata["/m.dcf"] = {{"contentid", longId}, {"contenttype", "audio/mpeg"},
+                                  {"rightsuri", "http://r"}, {"contentlen", "1f4"},
+                                  {"ContentLen", "ffff"}, {"drmtype", "2"}, {"drmtype", "3"}};
+    _DRM_METADATA meta;
+    ASSERT_EQ(GetDRMMetaInfo("/m.dcf", nullptr, &meta), 0);
+    EXPECT_EQ(meta.nContentLength, 500u);
+    EXPECT_EQ(meta.nDrmType, 3u);
+    EXPECT_EQ(std::string(meta.szContentId), std::string(511, 'i'));
+    EXPECT_STREQ(meta.szContentType, "audio/mpeg");
+    EXPECT_STREQ(meta.szRightsUri, "http://r");
+
+    _DRM_METADATA untouched;
+    std::memset(&untouched, 0x7E, sizeof untouched);
+    EXPECT_EQ(GetDRMMetaInfo("/none.dcf", nullptr, &untouched), -1);
+    EXPECT_EQ(untouched.nDrmType, 0x7E7E7E7Eu) << "a failed query leaves the record as it was";
+}
+
+TEST_F(Protected, ReadsCountBytesAndStopAtTheContentLength) {
+    std::string path = WriteProtected("song.dcf", Bytes().str("0123456789ABCDEF"),
+                                      {{"drmtype", "1"}, {"contentlen", "c"}});
+    int h = MEx_fopen(path.c_str(), "rb");
+    ASSERT_NE(h, 0);
+    char buf[16] = {0};
+    EXPECT_EQ(MEx_fread(buf, 4, 2, h), 8) << "bytes, not items";
+    EXPECT_EQ(std::string(buf, 8), "01234567");
+    EXPECT_EQ(MEx_ftell(h), 8);
+    EXPECT_EQ(MEx_fread(buf, 1, 16, h), 8) << "the service reads what the file has";
+    EXPECT_EQ(MEx_ftell(h), 16);
+    EXPECT_EQ(MEx_feof(h), 1);
+    EXPECT_EQ(MEx_fread(buf, 1, 4, h), 0) << "at or past the content length nothing is read";
+    EXPECT_EQ(MEx_fwrite(buf, 1, 1, h), -1) << "protected files are never written";
+    EXPECT_EQ(MEx_fclose(h), 0);
+}
+
+TEST_F(Protected, SeeksAreUncheckedAndOnlyTheThreeOriginsExist) {
+    std::string path = WriteProtected("clip.fl", Bytes().str("abcdefgh"), {{"drmtype", "1"}});
+    int h = MEx_fopen(path.c_str(), "rb");
+    ASSERT_NE(h, 0);
+    char c = 0;
+    EXPECT_EQ(MEx_fseek(h, -2, SEEK_END), 0);
+    EXPECT_EQ(MEx_fread(&c, 1, 1, h), 1);
+    EXPECT_EQ(c, 'g');
+    EXPECT_EQ(MEx_fseek(h, 100, SEEK_CUR), 0);
+    EXPECT_EQ(MEx_feof(h), 1);
+    EXPECT_EQ(MEx_fread(&c, 1, 1, h), 0);
+    EXPECT_EQ(MEx_fseek(h, 8, SEEK_SET), 0);
+    EXPECT_EQ(MEx_feof(h), 1) << "position equal to size is the end";
+    EXPECT_EQ(MEx_fseek(h, 0, 7), -1);
+    EXPECT_EQ(MEx_fseek(h, -3, SEEK_SET), 0) << "before the start is accepted too";
+    EXPECT_EQ(MEx_ftell(h), -3);
+    MEx_fclose(h);
+}
+
+// Without a content length the size comes from the file; stat takes the content
+// length without the file system.
+TEST_F(Protected, SizeComesFromTheContentLengthOrTheFile) {
+    std::string path = WriteProtected("nolen.dcf", Bytes().str("xyz"), {{"drmtype", "1"}});
+    int h = MEx_fopen(path.c_str(), "rb");
+    ASSERT_NE(h, 0);
+    EXPECT_EQ(MEx_fseek(h, 0, SEEK_END), 0);
+    EXPECT_EQ(MEx_ftell(h), 3);
+    MEx_fclose(h);
+    service.metadata["/nowhere/movie.dcf"] = {{"drmtype", "1"}, {"contentlen", "10000"}};
+    struct stat st;
+    std::memset(&st, 0, sizeof st);
+    ASSERT_EQ(MEx_stat("/nowhere/movie.dcf", &st), 0);
+    EXPECT_EQ(st.st_size, 0x10000);
+    EXPECT_NE(MEx_stat("/nowhere/other.dcf", &st), 0) << "no metadata: the file system answers";
+}
+
+// Only container-based sessions are read; a refused session fails the open and
+// logs why; DRM type 0 opens the file as a plain one; detection sees the plain content.
+TEST_F(Protected, SessionKindsAndDetection) {
+    service.apiType = 1;
+    std::string path = WriteProtected("other.dcf", Bytes().str("abcd"), {{"drmtype", "1"}});
+    int h = MEx_fopen(path.c_str(), "rb");
+    ASSERT_NE(h, 0);
+    char buf[4];
+    EXPECT_EQ(MEx_fread(buf, 1, 4, h), 0);
+    EXPECT_TRUE(service.readOffsets.empty());
+    MEx_fclose(h);
+    service.apiType = 2;
+    service.refuseSessions = true;
+    EXPECT_EQ(MEx_fopen(path.c_str(), "rb"), 0);
+    ASSERT_EQ(g_log.size(), 1u);
+    EXPECT_EQ(g_log[0].first, 6);
+    EXPECT_EQ(g_log[0].second, "MetaInfoExtractor|open failed pDecryptHandle is NULL");
+    service.refuseSessions = false;
+
+    std::string plain = dir.Write("plain.dcf", Bytes().str("RIFF"));
+    service.metadata[plain] = {{"drmtype", "0"}};
+    h = MEx_fopen(plain.c_str(), "rb");
+    ASSERT_NE(h, 0);
+    EXPECT_EQ(MEx_fread(buf, 2, 2, h), 2) << "a plain handle counts items";
+    EXPECT_EQ(service.openSessions, 0);
+    MEx_fclose(h);
+
+    std::string wave = WriteProtected("tone.dcf", Bytes().str("RIFF").le32(28).str("WAVE").str("fmt ").le32(16).zeros(16),
+                                      {{"drmtype", "1"}});
+    int type = -1;
+    ASSERT_EQ(MM_MediaExtractor_DetectMediaType(wave.c_str(), &type), MM_OK);
+    EXPECT_EQ(type, MEDIA_TYPE_WAVE);
+}
+
+TEST(NoProtectionService, ProtectedNamesAreReadAsPlainFiles) {
+    TempDir dir;
+    std::string path = dir.Write("song.dcf", Bytes().str("abcd"));
+    EXPECT_EQ(CheckDRM(path.c_str()), 0);
+    int h = MEx_fopen(path.c_str(), "rb");
+    ASSERT_NE(h, 0);
+    char buf[4];
+    EXPECT_EQ(MEx_fread(buf, 1, 4, h), 4);
+    EXPECT_EQ(std::string(buf, 4), "abcd");
+    MEx_fclose(h);
 }
