@@ -1,14 +1,22 @@
-// MPEG audio: frame headers, leading tags, the frame-pair rule, stream kinds,
-// durations and the slot answers.
+// MPEG audio and ID3: frame headers, leading tags, the frame-pair rule, stream kinds,
+// durations and the slot answers; ID3 tags (frame table, first frame wins, encodings,
+// genres, time stamps, pictures, unsynchronisation, v1 and the fallback between them);
+// range extraction; and the real MPEG audio and ID3 files of the corpus.
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <cstdio>
 #include <cstring>
+#include <filesystem>
 #include <string>
 #include <tuple>
 
 #include "core/file_access.h"
+#include "metainfo/extract.h"
 #include "metainfo/metainfo.h"
+#include "mp3/id3.h"
+#include "mp3/id3_frames.h"
+#include "mp3/mp3_extract.h"
 #include "mp3/mp3_frame.h"
 #include "mp3/mp3_info.h"
 #include "support/bytes.h"
@@ -59,6 +67,113 @@ std::string InfoSummary(const Probe& p) {
     return text;
 }
 
+using Frames = std::vector<Data>;
+
+std::string Item(const _MMMetaItem& item) { return std::string(reinterpret_cast<const char*>(item.szData), item.nLength); }
+
+struct Meta {
+    _MMMetaInfo meta;
+    int32_t result = 0;
+    Meta() { std::memset(&meta, 0, sizeof meta); }
+    explicit Meta(const Data& file, int pictureLimit = 1) : Meta() {
+        TempDir dir;
+        result = ID3_GetMetaInfo(dir.Write("t.mp3", file).c_str(), &meta, pictureLimit);
+    }
+    Meta(const Meta&) = delete;
+    ~Meta() { delete[] meta.pPicture; }
+    std::string Text(int kind) const { return Item(meta.aItems[kind]); }
+    Data Raw(int kind) const {
+        const _MMMetaItem& item = meta.aItems[kind];
+        return Data(item.szData, item.szData + item.nLength);
+    }
+    uint32_t Code(int kind) const { return meta.aItems[kind].nEncoding; }
+    Data Picture() const { return Data(meta.pPicture, meta.pPicture + meta.nPictureSize); }
+};
+
+Data Text3(const std::string& id, const std::string& text) { return Id3Frame(3, id, TextBody(0, text)); }
+
+// A v2 tag of the frames, then a few audio frames.
+Data Tagged(int version, const Frames& frames, size_t padding = 16, uint8_t flags = 0) {
+    return Bytes().raw(Id3Tag(version, frames, padding, flags)).raw(Mp3Frames(6)).data();
+}
+
+// Runs one step of the v2 parser on the tag at `offset`, with the bound an embedding box gives it.
+int32_t ParseAt(const Data& file, long offset, uint32_t bound, Meta* m,
+                int32_t (*parse)(int, ID3_MetaInfo*) = ParseID3V2) {
+    TempDir dir;
+    const int h = MEx_fopen(dir.Write("box.bin", file).c_str(), "rb");
+    if (h == 0 || MEx_fseek(h, offset, SEEK_SET) != 0) return -1;
+    ID3_MetaInfo ctx = {&m->meta, bound, 0, 1, 0, 0};
+    const int32_t result = parse(h, &ctx);
+    MEx_fclose(h);
+    return result;
+}
+
+constexpr uint32_t kFrame = 417;  // MPEG-1 Layer III, 128 kbit/s, 44100 Hz
+constexpr int kFrames = 1152;     // 480,384 bytes: 30 s at 16,000 bytes/s
+
+struct Buffer {
+    unsigned char* data = nullptr;
+    int size = 0;
+    int32_t result = 0;
+    Buffer(const std::string& path, int start, int end) { result = MP3_GetAudioData2Buf(path.c_str(), start, end, &data, &size); }
+    Buffer(const Buffer&) = delete;
+    ~Buffer() { MM_MediaExtractor_FreeBuffer(data); }
+};
+
+std::string RunCommand(const std::string& command) {
+    std::string out;
+    if (FILE* p = popen(command.c_str(), "r")) {
+        char buf[256];
+        while (fgets(buf, sizeof buf, p) != nullptr) out += buf;
+        if (pclose(p) != 0) return "failed";
+    }
+    return out;
+}
+
+// Seconds of audio a decoder finds in the file (frames counted by ffprobe), or -1
+// when ffmpeg cannot decode it cleanly.
+double DecodedSeconds(const std::string& path) {
+    if (RunCommand("/usr/bin/ffmpeg -nostdin -v error -i '" + path + "' -f null - 2>&1") != "") return -1;
+    const std::string out = RunCommand("/usr/bin/ffprobe -v error -count_frames -select_streams a:0 -show_entries "
+                                       "stream=nb_read_frames,sample_rate -of csv=p=0 '" + path + "'");
+    unsigned rate = 0, frames = 0;
+    if (std::sscanf(out.c_str(), "%u,%u", &rate, &frames) != 2 || rate == 0) return -1;
+    return frames * 1152.0 / rate;
+}
+
+// Header kind and Xing offset from the audio-information request, or {0, 0} on failure.
+std::pair<uint32_t, uint32_t> VbrHeaderOf(const std::string& path) {
+    _MP3AudioInfo info;
+    std::memset(&info, 0, sizeof info);
+    const bool ok = GetMediaInfo_MP3(path.c_str(), &info, INFO_MP3_AUDIO) == MM_OK;
+    delete[] info.xingToc;
+    return ok ? std::make_pair(info.headerKind, info.xingOffset) : std::make_pair(0u, 0u);
+}
+
+// Every query a caller can make of an MP3 file, none of which may fault. Returns the
+// size of the first two seconds' audio, or -1 when they cannot be cut.
+int AskEverything(const std::string& path, const std::string& out) {
+    int type = MEDIA_TYPE_UNKNOWN;
+    MM_MediaExtractor_DetectMediaType(path.c_str(), &type);
+    _MMClipInfo clip;
+    MM_MediaExtractor_GetClipInfo(path.c_str(), MEDIA_TYPE_MP3, &clip);
+    _MM_CODECTYPE codec;
+    MM_MediaExtractor_GetCodecType(path.c_str(), MEDIA_TYPE_MP3, &codec);
+    _MM_MIMETYPE mime{};
+    MM_MediaExtractor_GetMIMEType(path.c_str(), &mime);
+    MM_MediaExtractor_FreeBuffer(mime.pszMimeType);
+    _MMMetaInfo meta;
+    MM_MediaExtractor_GetMetaInfo(path.c_str(), MEDIA_TYPE_MP3, &meta);
+    MM_MediaExtractor_FreeMetaInfo(&meta);
+    std::memset(&meta, 0, sizeof meta);
+    ID3_GetMetaInfo(path.c_str(), &meta, 0x7FFFFFFF);  // every picture the file holds
+    MM_MediaExtractor_FreeMetaInfo(&meta);
+    VbrHeaderOf(path);
+    const Buffer b(path, 0, 2);
+    MP3_GetAudioData2File(path.c_str(), 0, 100, out.c_str());  // the end is clamped to the duration
+    return b.result == MM_OK ? b.size : -1;
+}
 }  // namespace
 
 TEST(Mp3Frame, SizesFieldsAndRejectedHeaders) {
@@ -134,13 +249,13 @@ TEST(Mp3Sync, TagsAreSkippedAndTwoConsecutiveFramesMakeAStream) {
 
 // Stream kind and sizes of one file from the clip and the audio-information requests.
 TEST(Mp3Stream, KindDurationAndRatesOfEachStreamShape) {
-    Mp3Shape low, high, mono, lsf, lsfMono, mpeg25, mpeg25Mono, mpeg2Mono;
+    Mp3Shape low, high, mono, lsf, lsfMono, mpeg25, mpeg25Mono;
     low.bitrateIndex = 1;    // 32 kbit/s
     high.bitrateIndex = 14;  // 320 kbit/s
-    mono.channelMode = lsfMono.channelMode = mpeg25Mono.channelMode = mpeg2Mono.channelMode = 3;
-    lsf.version = lsfMono.version = mpeg2Mono.version = 2;
+    mono.channelMode = lsfMono.channelMode = mpeg25Mono.channelMode = 3;
+    lsf.version = lsfMono.version = 2;
     mpeg25.version = mpeg25Mono.version = 0;
-    lsf.bitrateIndex = lsfMono.bitrateIndex = mpeg25.bitrateIndex = mpeg25Mono.bitrateIndex = mpeg2Mono.bitrateIndex = 8;
+    lsf.bitrateIndex = lsfMono.bitrateIndex = mpeg25.bitrateIndex = mpeg25Mono.bitrateIndex = 8;
     XingFields xing, bytesOnly, zero, info;
     xing.frames = 3828;
     xing.bytes = 1600000;
@@ -196,12 +311,6 @@ TEST(Mp3Stream, KindDurationAndRatesOfEachStreamShape) {
         {"mpeg-2.5 mono", Mp3Frames(12, mpeg25Mono),
          "mp3 size=5004 bps=64000 audio=1 abps=64000 hz=11025 ch=1 bits=16 spf=576",
          "kind=1 tag=0 avg=64000 dur=0 spf=576 xing=0/0 frames=0 bytes=0 q=0 toc=-1 vbri=0/0"},
-        {"mpeg-2 mono", Mp3Frames(12, mpeg2Mono),
-         "mp3 size=2496 bps=64000 audio=1 abps=64000 hz=22050 ch=1 bits=16 spf=1152",
-         "kind=1 tag=0 avg=64000 dur=0 spf=576 xing=0/0 frames=0 bytes=0 q=0 toc=-1 vbri=0/0"},
-        {"mpeg-1 mono", Mp3Frames(12, mono),
-         "mp3 size=5004 bps=128000 audio=1 abps=128000 hz=44100 ch=1 bits=16 spf=1152",
-         "kind=1 tag=0 avg=128000 dur=0 spf=1152 xing=0/0 frames=0 bytes=0 q=0 toc=-1 vbri=0/0"},
         {"15 bytes", Cat({Mp3Header({}), Data(11, 0)}), "-2147467259", "-2147467259"},
     };
     for (const auto& c : cases) {
@@ -240,4 +349,379 @@ TEST(Mp3Stream, CodecFollowsTheLayerAndMimeReplacesTheOldString) {
     EXPECT_EQ(none.pszMimeType, nullptr);
     EXPECT_EQ(MP3_GetCodecType(tiny.c_str(), &codec), MM_E_FAIL);
     EXPECT_EQ(GetMediaInfo_MP3(nullptr, &mask, INFO_CLIPINFO), MM_E_INVALIDARG);
+}
+
+TEST(Id3Tags, FrameTableFillsItemsFirstFrameWinsAndTextIsCutTo128Bytes) {
+    const struct {
+        const char* id;
+        int item;
+    } table[] = {{"TPE1", META_ARTIST},   {"TALB", META_ALBUM},    {"TYER", META_YEAR},         {"TCOP", META_COPYRIGHT},
+                 {"TCOM", META_COMPOSER}, {"TRCK", META_TRACKNUMBER}, {"TLAN", META_LANGUAGE}, {"TFLT", META_FILETYPE},
+                 {"TPE3", META_CONDUCTOR}, {"TPUB", META_PUBLISHER}, {"TDAT", META_DATE},      {"TIME", META_TIME}};
+    Frames frames = {Text3("TIT2", std::string(300, 'x')), Text3("TIT2", "Second"), Text3("TXXX", "skipped"),
+                     Text3("TPE2", "Band"), Id3Frame(3, "PCNT", {0, 0, 1, 2}),
+                     Id3Frame(3, "POPM", {'a', '@', 'b', 0, 196, 0})};
+    for (const auto& row : table) frames.push_back(Text3(row.id, row.id));
+    const Meta m(Tagged(3, frames));
+    ASSERT_EQ(m.result, MM_OK);
+    EXPECT_EQ(m.Text(META_TITLE), std::string(128, 'x'));
+    EXPECT_EQ(m.Code(META_TITLE), 3u);
+    for (const auto& row : table) EXPECT_EQ(m.Text(row.item), row.id);
+    EXPECT_EQ(m.meta.aItems[META_RESERVED6].nLength, 0u);
+    EXPECT_EQ(Item(m.meta.stAlbumArtist), "Band");
+    EXPECT_EQ(m.meta.nPlayCount, 0x102u);
+    EXPECT_EQ(m.meta.nRating, 196u);
+}
+
+TEST(Id3Tags, FailedV2KeepsItsItemsUnlessV1ReplacesThemWholeAndV2WinsOverV1) {
+    // The reader counts the header's ten bytes against the tag size: without
+    // padding the last frame overruns the tag and the v2 parse fails.
+    const auto broken = Id3Tag(3, {Text3("TCOM", "Composer"), Text3("TPE1", "Artist name")}, 0);
+    const auto v1 = Id3v1Titled("V1 title");
+    const Meta failed(Bytes().raw(broken).raw(Mp3Frames(6)).data());
+    EXPECT_EQ(failed.result, 1);
+    EXPECT_EQ(failed.Text(META_COMPOSER), "Composer");
+    EXPECT_EQ(failed.meta.aItems[META_ARTIST].nLength, 0u);
+    const Meta replaced(Bytes().raw(broken).raw(Mp3Frames(6)).raw(v1).data());
+    EXPECT_EQ(replaced.result, MM_OK);
+    EXPECT_EQ(replaced.Text(META_TITLE), "V1 title");
+    EXPECT_EQ(replaced.meta.aItems[META_COMPOSER].nLength, 0u);
+    EXPECT_EQ(Meta(Bytes().raw(Tagged(3, {Text3("TIT2", "V2 title")})).raw(v1).data()).Text(META_TITLE), "V2 title");
+    EXPECT_EQ(Meta(Mp3Frames(6)).result, 1);
+}
+
+// v2.4's encoding byte decides the code, v2.3 keeps Latin-1 for any but
+// UTF-16, whose little-endian text is delivered big-endian; a UTF-8 mark gives UTF-8.
+TEST(Id3Tags, EncodingsAndTheirCodes) {
+    const struct { int version; Data body, text; uint32_t code; } cases[] = {
+        {4, TextBody(3, "T\xC3\xA9"), {'T', 0xC3, 0xA9}, 5}, {4, TextBytes(2, {0, 'A'}), {0, 'A'}, 4},
+        {4, TextBody(7, "x"), {'x'}, 3},                     {3, TextBody(3, "T\xC3\xA9"), {'T', 0xC3, 0xA9}, 3},
+        {3, TextBytes(1, {0xFF, 0xFE, 'H', 0, 'i', 0}), {0xFE, 0xFF, 0, 'H', 0, 'i'}, 4},
+        {3, TextBytes(1, {0xFF, 0xFE, 'H', 0, 'i'}), {}, 0},  // odd length: left empty
+        {3, TextBytes(1, {0xEF, 0xBB, 0xBF, 'U'}), {0xEF, 0xBB, 0xBF, 'U'}, 5}};
+    for (const auto& c : cases) {
+        const Meta m(Tagged(c.version, {Id3Frame(c.version, "TIT2", c.body)}));
+        EXPECT_EQ(m.Raw(META_TITLE), c.text) << &c - cases;
+        EXPECT_EQ(m.Code(META_TITLE), c.code) << &c - cases;
+    }
+}
+
+TEST(Id3Tags, GenreNumbersBelow148BecomeNames) {
+    const std::pair<Data, std::string> cases[] = {
+        {TextBody(0, "(17)Rock"), "Rock"}, {TextBody(0, "(17)"), "Rock"},   {TextBody(0, "Rock"), "Rock"},
+        {TextBody(0, "(255)"), "(255)"},   {TextBody(0, "(-1)"), "(-1)"},   {TextBody(0, "(147)"), "Synthpop"},
+        {TextBody(0, "(67)"), "Psychadelic"},
+        {TextBytes(1, {0xFF, 0xFE, '(', 0, '1', 0, '7', 0, ')', 0}), "Rock"},  // UTF-16 is compacted first
+        {TextBytes(1, {0xFE, 0xFF, 0, '(', 0, '8', 0, ')'}), "Jazz"},
+    };
+    for (const auto& [body, name] : cases) {
+        const Meta m(Tagged(3, {Id3Frame(3, "TCON", body)}));
+        EXPECT_EQ(m.Text(META_GENRE), name);
+        EXPECT_EQ(m.Code(META_GENRE), 3u) << name;
+    }
+}
+
+// TDRC is split by body size counting the encoding byte; a size outside the
+// list fills nothing, and a year already read keeps TDRC out.
+TEST(Id3Tags, RecordingTimeIsSplitByBodySize) {
+    const struct { int version; Frames frames; std::string year, date, time; } cases[] = {
+        {4, {Id3Frame(4, "TDRC", TextBody(0, "2004-05-0"))}, std::string("\0" "200", 4), "-05-0", ""},
+        {4, {Id3Frame(4, "TDRC", Bytes().str("2004-05-06T12").data())}, "2004", "05-06", "12"},
+        {4, {Id3Frame(4, "TDRC", TextBody(0, "2004"))}, "", "", ""},
+        {3, {Text3("TYER", "1999"), Id3Frame(3, "TDRC", {'2', '0', '0', '4'})}, "1999", "", ""}};
+    for (const auto& c : cases) {
+        const Meta m(Tagged(c.version, c.frames));
+        EXPECT_EQ(std::make_tuple(m.Text(META_YEAR), m.Text(META_DATE), m.Text(META_TIME)), std::tie(c.year, c.date, c.time));
+    }
+    EXPECT_EQ(Meta(Tagged(4, cases[1].frames)).Code(META_TIME), 3u);
+}
+
+TEST(Id3Tags, CommentsSkipLanguageAndDescription) {
+    const struct {
+        uint8_t encoding;
+        Data afterLanguage, text;
+        uint32_t code;
+    } cases[] = {
+        {0, Bytes().str("desc").u8(0).str("Comment").data(), Bytes().str("Comment").data(), 3},
+        {1, {0xFF, 0xFE, 0, 0, 0xFF, 0xFE, 'O', 0, 'K', 0}, {0xFE, 0xFF, 0, 'O', 0, 'K'}, 4},
+        // The terminator is the first zero pair at any offset, so a description
+        // ending in a character with a zero high byte ends one byte early.
+        {1, {0xFF, 0xFE, 'd', 0, 0, 0, 0xFF, 0xFE, 'O', 0}, {0, 0xFF, 0xFE, 'O', 0}, 4},
+    };
+    for (const auto& c : cases) {
+        const Meta m(Tagged(3, {Id3Frame(3, "COMM", Bytes().u8(c.encoding).str("eng").raw(c.afterLanguage).data())}));
+        EXPECT_EQ(m.Raw(META_COMMENT), c.text);
+        EXPECT_EQ(m.Code(META_COMMENT), c.code);
+    }
+}
+
+TEST(Id3Tags, PictureIsReadOnlyWithinTheLimit) {
+    const Data jpeg = {0xFF, 0xD8, 0xFF, 0xE0, 1, 2, 3};
+    const auto file = Tagged(3, {Id3Frame(3, "APIC", ApicBody("image/jpeg", jpeg, "cover"))});
+    const Meta m(file);
+    EXPECT_EQ(m.Text(META_PICTURE_FORMAT), "image/jpeg");
+    EXPECT_EQ(m.Code(META_PICTURE_FORMAT), 3u);
+    EXPECT_EQ(m.Picture(), jpeg);
+    const Meta none(file, 0);  // limit 0: pictures are never read
+    EXPECT_EQ(none.meta.pPicture, nullptr);
+    EXPECT_EQ(none.meta.aItems[META_PICTURE_FORMAT].nLength, 0u);
+    const auto large = Tagged(3, {Id3Frame(3, "APIC", ApicBody("image/png", Data(600000 - 13)))});  // a 600,000-byte frame
+    EXPECT_EQ(Meta(large, 1).meta.pPicture, nullptr);
+    EXPECT_EQ(Meta(large, 600000).meta.nPictureSize, 600000u - 13);
+}
+
+TEST(Id3Tags, V22FramesHaveThreeLetterIdsAndPictureFormat) {
+    const Meta m(Tagged(2, {Id3Frame22("TT2", TextBody(0, "Two")), Id3Frame22("TCO", TextBody(0, "(0)")),
+                            Id3Frame22("PIC", Bytes().u8(0).str("PNG").u8(0).str("d").u8(0).u8(9).data())}));
+    ASSERT_EQ(m.result, MM_OK);
+    EXPECT_EQ(std::make_tuple(m.Text(META_TITLE), m.Text(META_GENRE), m.Text(META_PICTURE_FORMAT)),
+              std::make_tuple("Two", "Blues", "PNG"));
+    EXPECT_EQ(m.Picture(), (Data{9}));
+}
+
+TEST(Id3Tags, UnsynchronisedTagIsRestoredAndItsPictureFormatCountsTheZero) {
+    const Data picture = {0xFF, 0xD8, 0xFF, 0x00, 0xFF};
+    // Frame sizes count the bytes as stored, after unsynchronisation.
+    const Meta m(Tagged(3, {Id3Frame(3, "TIT2", Unsynchronise(TextBytes(0, {'a', 0xFF, 'b'}))),
+                            Id3Frame(3, "APIC", Unsynchronise(ApicBody("image/jpeg", picture)))}, 16, 0x80));
+    ASSERT_EQ(m.result, MM_OK);
+    EXPECT_EQ(m.Raw(META_TITLE), (Data{'a', 0xFF, 'b'}));
+    EXPECT_EQ(m.meta.aItems[META_PICTURE_FORMAT].nLength, 11u);
+    EXPECT_EQ(m.Picture(), picture);
+}
+
+TEST(Id3Tags, V24FrameUnsyncAndDataLengthIndicator) {
+    const auto body = Bytes().syncsafe32(5).raw(Unsynchronise(TextBytes(0, {'x', 0xFF, 0x00, 'y'}))).data();
+    const Meta m(Tagged(4, {Id3Frame(4, "TIT2", body, 0x03)}));
+    ASSERT_EQ(m.result, MM_OK);
+    EXPECT_EQ(m.Raw(META_TITLE), (Data{'x', 0xFF, 0x00, 'y'}));
+    uint8_t shortBody[] = {1, 2, 3};  // below four bytes there is no indicator to drop
+    EXPECT_EQ(RemoveDataLengthIndicator(shortBody, 3), 3u);
+}
+
+TEST(Id3Tags, V23ExtendedHeaderIsSkippedWithOrWithoutUnsync) {
+    const auto body = Bytes().be32(6).zeros(6).raw(Text3("TIT2", "Ext")).zeros(30).data();
+    for (uint8_t flags : {uint8_t{0x40}, uint8_t{0xC0}}) {
+        const Meta m(Bytes().raw(Id3v2Tag(3, body, flags)).raw(Mp3Frames(6)).data());
+        EXPECT_EQ(m.result, MM_OK);
+        EXPECT_EQ(m.Text(META_TITLE), "Ext") << int{flags};
+    }
+}
+
+TEST(Id3Tags, Version1FieldsAreTrimmedAndTheTrackByteIsSigned) {
+    const Meta m(Bytes().raw(Mp3Frames(6)).raw(Id3v1({"Title  \t", "Artist", "Album", "2001", "Note", 200, 17})).data());
+    ASSERT_EQ(m.result, MM_OK);
+    EXPECT_EQ(std::make_tuple(m.Text(META_TITLE), m.Text(META_ARTIST), m.Text(META_ALBUM), m.Text(META_YEAR),
+                              m.Text(META_COMMENT)), std::make_tuple("Title", "Artist", "Album", "2001", "Note"));
+    EXPECT_EQ(m.Text(META_TRACKNUMBER), "-56");
+    EXPECT_EQ(m.Text(META_GENRE), "Rock");
+    EXPECT_EQ(m.Code(META_TITLE), 3u);
+    const Meta n(Bytes().raw(Mp3Frames(6)).raw(Id3v1({"T", "", "", "", "", 0, 148})).data());
+    EXPECT_EQ(n.meta.aItems[META_TRACKNUMBER].nLength, 0u);
+    EXPECT_EQ(n.meta.aItems[META_GENRE].nLength, 0u);
+}
+
+TEST(Id3Tags, HostileSizesFailTheTagCleanly) {
+    Data truncated = Id3v2Tag(4, Id3Frame(4, "TIT2", TextBody(0, std::string(200, 'a'))));
+    truncated.resize(100);  // the tag claims more than the file holds
+    Frames files = {truncated, Bytes().str("ID3").u8(3).zeros(2).syncsafe32(0x0FFFFFFF).raw(Mp3Frames(6)).data()};
+    for (uint32_t size : {0x7FFFFFF0u, 0x80000001u}) {  // beyond the tag, and negative
+        files.push_back(Bytes().raw(Id3v2Tag(3, Bytes().str("TIT2").be32(size).zeros(42).data())).raw(Mp3Frames(6)).data());
+    }
+    for (const auto& file : files) EXPECT_EQ(Meta(file).result, 1);
+
+    // Zero-size frames cost only their header; a picture without a MIME terminator is dropped.
+    const Meta m(Tagged(3, {Id3Frame(3, "TIT2", {}), Id3Frame(3, "APIC", {}), Id3Frame(3, "APIC", TextBody(0, "image/png")),
+                            Text3("TIT2", "ok")}));
+    EXPECT_EQ(m.result, MM_OK);
+    EXPECT_EQ(m.meta.pPicture, nullptr);
+    EXPECT_EQ(m.Text(META_TITLE), "ok");
+}
+
+TEST(Id3Tags, EmbeddedTagIsParsedOnAnOpenHandleWithinItsBound) {
+    const Data tag = Id3Tag(4, {Id3Frame(4, "TIT2", TextBody(0, "Inside"))});
+    const auto file = Bytes().zeros(100).raw(tag).zeros(50).data();
+    Meta m, tight, shortHeader;
+    EXPECT_EQ(ParseAt(file, 100, static_cast<uint32_t>(tag.size()), &m), 0);
+    EXPECT_EQ(m.Text(META_TITLE), "Inside");
+    EXPECT_EQ(ParseAt(file, 100, 10, &tight), 1);
+    EXPECT_EQ(ParseAt({'I', 'D', '3', 3, 0}, 0, 100, &shortHeader, ParseV2Header), kID3ShortHeader);
+}
+
+TEST(Id3Tags, ShortFrameBodyEndsAVersion24TagOnly) {
+    // A bound beyond what the file still holds: a v2.4 frame cut short fails
+    // the tag, a v2.3 one keeps what was read.
+    for (int version : {3, 4}) {
+        Data file = Id3Tag(version, {Id3Frame(version, "TIT2", TextBody(0, "From v2")),
+                                                     Id3Frame(version, "PRIV", Data(400, 1))});
+        file.resize(file.size() - 300);
+        Meta m;
+        EXPECT_EQ(ParseAt(file, 0, 100000, &m), version == 4 ? 1 : 0) << version;
+        EXPECT_EQ(m.Text(META_TITLE), "From v2");
+    }
+}
+
+TEST(Id3Tags, AacFilesTakeTheirTagsFromId3) {
+    TempDir dir;
+    const std::string path = dir.Write("a.aac", Tagged(3, {Text3("TIT2", "AAC")}));
+    _MMMetaInfo meta;
+    ASSERT_EQ(MM_MediaExtractor_GetMetaInfo(path.c_str(), MEDIA_TYPE_AAC, &meta), MM_OK);
+    EXPECT_EQ(Item(meta.aItems[META_TITLE]), "AAC");
+    MM_MediaExtractor_FreeMetaInfo(&meta);
+}
+
+TEST(Mp3Extract, PositionsMoveToTheNextSyncAndTheEndIsCutAtTheDuration) {
+    TempDir dir;
+    const std::string path = dir.Write("cbr.mp3", Mp3Frames(kFrames));
+    const Buffer b(path, 10, 20);
+    ASSERT_EQ(b.result, MM_OK);
+    // 160,000 and 320,000 moved to the frames at 384 and 768.
+    EXPECT_EQ(b.size, static_cast<int>(320256 - 160128));
+    ASSERT_NE(b.data, nullptr);
+    EXPECT_EQ(b.data[0], 0xFF);
+    EXPECT_EQ(b.data[kFrame], 0xFF);
+    // A source without leading or trailing tags gives a file of the same bytes.
+    ASSERT_EQ(MP3_GetAudioData2File(path.c_str(), 10, 20, dir.PathOf("out.mp3").c_str()), MM_OK);
+    EXPECT_EQ(ReadFileBytes(dir.PathOf("out.mp3")), std::vector<uint8_t>(b.data, b.data + b.size));
+    unsigned char* pub = nullptr;
+    int size = 0;
+    ASSERT_EQ(MM_MediaExtractor_GetAudioData(path.c_str(), 10, 20, &pub, &size), MM_OK);
+    EXPECT_EQ(size, b.size);
+    MM_MediaExtractor_FreeBuffer(pub);
+
+    const struct { int start, end; int32_t result; int size; } ranges[] = {
+        {20, 1000, MM_OK, static_cast<int>(kFrames * kFrame - 320256)},
+        {30, 40, MM_E_FAIL, 0},  // starting at the very end leaves no frame
+        {31, 40, MM_E_INVALIDARG, 0}, {-1, 5, MM_E_INVALIDARG, 0}, {5, 5, MM_E_INVALIDARG, 0}};
+    for (const auto& r : ranges) {
+        const Buffer cut(path, r.start, r.end);
+        EXPECT_EQ(cut.result, r.result) << r.start;
+        EXPECT_EQ(cut.data != nullptr, r.result == MM_OK) << r.start;
+        if (r.result == MM_OK) { EXPECT_EQ(cut.size, r.size); }
+    }
+    EXPECT_EQ(MP3_GetAudioData2Buf(path.c_str(), 0, 5, nullptr, &size), MM_E_INVALIDARG);
+    EXPECT_EQ(MP3_GetAudioData2File(path.c_str(), 0, 5, nullptr), MM_E_INVALIDARG);
+    VbriFields vbri;  // VBRI streams cannot be cut
+    vbri.frames = kFrames;
+    EXPECT_EQ(Buffer(dir.Write("vbri.mp3", Bytes().raw(VbriFrame(vbri)).raw(Mp3Frames(kFrames - 1)).data()), 1, 2).result,
+              MM_E_FAIL);
+}
+
+TEST(Mp3Extract, FileCarriesTagsAndAXingFrameForTheRange) {
+    TempDir dir;
+    const std::vector<uint8_t> tag = Id3v2Tag(3, std::vector<uint8_t>(20, 0));  // 30 bytes
+    XingFields xing;
+    xing.frames = kFrames;
+    xing.bytes = kFrames * kFrame;
+    const auto file = Bytes().raw(tag).raw(XingFrame(xing)).raw(Mp3Frames(kFrames - 1)).raw(Id3v1Titled("Trailing")).data();
+    const std::string out = dir.PathOf("out.mp3");
+    ASSERT_EQ(MP3_GetAudioData2File(dir.Write("xing.mp3", file).c_str(), 10, 20, out.c_str()), MM_OK);
+    const std::vector<uint8_t> cut = ReadFileBytes(out);
+
+    // Table entries 33 and 67 (84 and 171) of 480,384 bytes, counted from the
+    // file start, moved to the frames at 157,656 and 321,120.
+    const uint32_t span = 321120 - 157656;
+    ASSERT_EQ(cut.size(), 30 + kFrame + span + 128);
+    EXPECT_TRUE(std::equal(tag.begin(), tag.end(), cut.begin()));
+    const uint8_t* x = cut.data() + 30;
+    EXPECT_EQ(std::memcmp(x, file.data() + 30, 40), 0);  // header, side information, "Xing"
+    const auto fields = Bytes().be32(0xF).be32(383).be32(span).data();  // lrint(10 * 44100 / 1152) frames
+    EXPECT_EQ(std::memcmp(x + 40, fields.data(), 12), 0);
+    EXPECT_EQ(std::memcmp(x + 52, file.data() + 30 + 52, 100), 0);  // the source's table as it stands
+    EXPECT_EQ(x[155], 57);  // quality
+    EXPECT_EQ(x[156], 0);   // padding up to the source frame's size
+    EXPECT_EQ(std::memcmp(cut.data() + 30 + kFrame, file.data() + 157656, span), 0);
+    EXPECT_EQ(std::memcmp(cut.data() + cut.size() - 128, "TAGTrailing", 11), 0);
+}
+
+TEST(Mp3Extract, CutFilesDecodeForTheRequestedSpan) {
+    if (!HaveFfmpeg()) GTEST_SKIP() << "ffmpeg is not installed";
+    TempDir dir;
+    const std::string make = "/usr/bin/ffmpeg -nostdin -v error -y -f lavfi -i sine=frequency=440:duration=30 "
+                             "-c:a libmp3lame ";
+    const double frame = 1152.0 / 44100;
+    const struct {
+        std::string options;
+        double tolerance;
+    } cases[] = {
+        {"-b:a 128k", frame},
+        {"-q:a 4", 30 * 0.01 + 2 * frame},  // the Xing table has 1% steps: each cut may move by half a step
+    };
+    for (const auto& c : cases) {
+        const std::string source = dir.PathOf("source.mp3"), out = dir.PathOf("cut.mp3");
+        if (RunCommand(make + c.options + " '" + source + "' 2>&1") != "") GTEST_SKIP() << "ffmpeg cannot encode MP3 here";
+        ASSERT_EQ(MP3_GetAudioData2File(source.c_str(), 10, 20, out.c_str()), MM_OK) << c.options;
+        EXPECT_NEAR(DecodedSeconds(out), 10.0, c.tolerance) << c.options;
+    }
+    const std::string corpus = CorpusDir();
+    for (const char* name : {"mutagen/xing.mp3", "mutagen/silence-44-s.mp3"}) {
+        if (corpus.empty()) break;
+        const std::string out = dir.PathOf("corpus.mp3");
+        ASSERT_EQ(MP3_GetAudioData2File((corpus + "/" + name).c_str(), 1, 2, out.c_str()), MM_OK) << name;
+        EXPECT_GT(DecodedSeconds(out), 0.5) << name;
+    }
+}
+
+TEST(Mp3Corpus, EveryFileIsAnsweredWithoutFaultAndKnownFilesAsByHand) {
+    const std::string corpus = CorpusDir();
+    if (corpus.empty()) GTEST_SKIP() << "no corpus";
+    TempDir dir;
+    for (const char* sub : {"/mutagen", "/taglib"}) {
+        for (const auto& entry : std::filesystem::directory_iterator(corpus + sub)) {
+            const std::string ext = entry.path().extension().string();
+            if (ext != ".mp3" && ext != ".id3") continue;
+            SCOPED_TRACE(entry.path().string());
+            EXPECT_NE(AskEverything(entry.path().string(), dir.PathOf("cut.mp3")), 0);
+        }
+    }
+    // silence-44-s.mp3: ID3v2.3 tag then 32 kbit/s MPEG-1 Layer III stereo.
+    const std::string silence = corpus + "/mutagen/silence-44-s.mp3";
+    _MMClipInfo clip;
+    ASSERT_EQ(MP3_GetClipInfo(silence.c_str(), &clip), MM_OK);
+    EXPECT_EQ(std::tie(clip.nSampleRate, clip.nChannels, clip.nBitrate, clip.nFileSize),
+              std::make_tuple(44100u, 2u, 32000u, 16384u));
+    _MMMetaInfo meta;
+    std::memset(&meta, 0, sizeof meta);
+    ASSERT_EQ(ID3_GetMetaInfo(silence.c_str(), &meta, 1), MM_OK);
+    EXPECT_EQ(std::string(reinterpret_cast<const char*>(meta.aItems[META_TITLE].szData), meta.aItems[META_TITLE].nLength),
+              "Silence");
+    MM_MediaExtractor_FreeMetaInfo(&meta);
+    // silence-44-s-mpeg25.mp3: MPEG-2.5 stereo reports 1152 >> 2 samples per frame.
+    ASSERT_EQ(MP3_GetClipInfo((corpus + "/mutagen/silence-44-s-mpeg25.mp3").c_str(), &clip), MM_OK);
+    EXPECT_EQ(std::tie(clip.nSampleRate, clip.nSamplesPerFrame), std::make_tuple(12000u, 288u));
+    // vbri.mp3 carries a VBRI header; lame_vbr.mp3 (mono MPEG-1) has its Xing header at byte 21.
+    EXPECT_EQ(VbrHeaderOf(corpus + "/mutagen/vbri.mp3").first, 3u);
+    EXPECT_EQ(VbrHeaderOf(corpus + "/taglib/lame_vbr.mp3"), std::make_pair(2u, 21u));
+    EXPECT_NE(MP3_GetClipInfo((corpus + "/mutagen/emptyfile.mp3").c_str(), &clip), MM_OK);
+}
+
+TEST(Mp3Robustness, DamagedCopiesOfATaggedXingFileAreAnsweredWithoutFault) {
+    // Deterministic byte damage over a file with every structure the readers
+    // walk: v2.3 tag with text and picture, Xing frame, frames, v1 tag.
+    const auto apic = ApicBody("image/png", std::vector<uint8_t>(64, 0xFF), "d");
+    const auto comm = TextBytes(1, {'e', 'n', 'g', 0xFF, 0xFE, 0, 0, 0xFF, 0xFE, 'c', 0});
+    XingFields xing;
+    xing.frames = 40;
+    xing.bytes = 40 * 417;
+    const std::vector<uint8_t> source =
+        Bytes()
+            .raw(Id3Tag(3, {Id3Frame(3, "TIT2", TextBody(0, "Title")), Id3Frame(3, "APIC", apic), Id3Frame(3, "COMM", comm),
+                            Id3Frame(3, "TCON", TextBody(0, "(17)")), Id3Frame(3, "TDRC", TextBody(0, "2004-05-0"))}))
+            .raw(XingFrame(xing))
+            .raw(Mp3Frames(39))
+            .raw(Id3v1Titled("v1"))
+            .data();
+    TempDir dir;
+    uint32_t seed = 12345;
+    auto next = [&seed]() { return (seed = seed * 1103515245u + 12345u) >> 8; };
+    for (int round = 0; round < 150; ++round) {
+        std::vector<uint8_t> damaged = source;
+        for (int e = 1 + static_cast<int>(next() % 8); e > 0; --e) {
+            // Most damage lands in the first kilobyte, where the tag and first frames are.
+            const size_t span = (next() & 1) ? 1024 : damaged.size();
+            damaged[next() % span] = static_cast<uint8_t>(next());
+        }
+        if (round % 10 == 0) damaged.resize(next() % damaged.size());
+        AskEverything(dir.Write("damaged.mp3", damaged), dir.PathOf("out.mp3"));
+    }
 }
