@@ -20,6 +20,7 @@
 #include "support/bytes.h"
 #include "support/ffprobe.h"
 #include "support/rm_builder.h"
+#include "support/summary.h"
 
 using namespace testing_support;
 
@@ -46,26 +47,121 @@ protected:
     }
 };
 
+// A parser over the file, its index already read.
+class Indexed {
+public:
+    explicit Indexed(const std::vector<uint8_t>& file) : path_(dir_.Write("clip.avi", file)) {}
+    int32_t Open() { return p_.OpenIndexed(path_); }
+    CAVIParser* operator->() const { return p_.operator->(); }
+    const _AVIIndexEntry& Entry(uint32_t i) const { return p_->getIndexEntries()[i]; }
+    std::vector<uint32_t> TimesOf(uint32_t stream) const {
+        std::vector<uint32_t> times;
+        for (uint32_t i = 0; i < p_->getIndexCount(); ++i) {
+            if (Entry(i).wStream == stream) times.push_back(Entry(i).dwTimeMs);
+        }
+        return times;
+    }
+
+private:
+    TempDir dir_;
+    std::string path_;
+    AviParserHandle p_;
+};
+
+// Video at 25 fps interleaved with 4000-byte audio chunks at 16000 bytes/s.
+std::vector<uint8_t> Interleaved(uint32_t videoFrames, uint32_t audioChunks) {
+    AviMainFields main;
+    main.totalFrames = videoFrames;
+    main.streams = 2;
+    Bytes hdrl = AviHdrl(main, {AviStrl(AviVideoStream(1, 25, videoFrames), AviVideoFormat(16, 16, "FMP4")),
+                                AviStrl(AviAudioStream(16000, audioChunks * 4000), AviAudioFormat(1, 1, 8000, 16000, 2, 16))});
+    std::vector<AviFrame> frames;
+    for (uint32_t i = 0; i < videoFrames || i < audioChunks; ++i) {
+        if (i < videoFrames) frames.push_back({0, "dc", Bytes().be32(i).zeros(5), i % 10 == 0 ? 0x10u : 0u});
+        if (i < audioChunks) frames.push_back({1, "wb", Bytes().fill(4000, static_cast<uint8_t>(i)), 0x10u});
+    }
+    return AviFile(hdrl, frames);
+}
+
+// One video stream whose frames carry the given index flags.
+std::vector<uint8_t> VideoWithFlags(const std::vector<uint32_t>& flags) {
+    Bytes hdrl = AviHdrl(AviMainFields(), {AviStrl(AviVideoStream(1, 25, 6), AviVideoFormat(16, 16, "FMP4"))});
+    std::vector<AviFrame> frames;
+    for (uint32_t f : flags) frames.push_back({0, "dc", Bytes().zeros(4), f});
+    return AviFile(hdrl, frames);
+}
+
+struct Variant {
+    const char* video;
+    const char* audio;
+};
+
+class AviFromFfmpeg : public ::testing::TestWithParam<Variant> {};
+
+// The tool is built beside the test directory; "" when it is not there.
+std::string ToolPath() {
+    char self[PATH_MAX] = {};
+    if (readlink("/proc/self/exe", self, sizeof self - 1) <= 0) return "";
+    std::string dir(self);
+    dir = dir.substr(0, dir.rfind('/'));
+    std::string tool = dir.substr(0, dir.rfind('/')) + "/metainfo";
+    return access(tool.c_str(), X_OK) == 0 ? tool : "";
+}
+
+int RunTool(const std::string& args, std::string* out) {
+    FILE* p = popen((ToolPath() + " " + args + " 2>&1").c_str(), "r");
+    if (p == nullptr) return -1;
+    char buf[256];
+    while (fgets(buf, sizeof buf, p) != nullptr) *out += buf;
+    int status = pclose(p);
+    return WIFEXITED(status) ? WEXITSTATUS(status) : -1;
+}
 }  // namespace
 
-TEST_F(AviHeaders, DurationComesFromScaleRateAndLengthAndFrameRateFromTotalFrames) {
-    AviMainFields main;
-    main.totalFrames = 300;
-    main.flags = 0x10;  // AVIF_HASINDEX as written in the file
-    std::string path = Write({AviStrl(AviVideoStream(1001, 30000, 300), AviVideoFormat(320, 240, "FMP4"))}, main);
-    EXPECT_EQ(parser->init(path.c_str(), &clip), MM_OK);
-    EXPECT_EQ(parser->getDuration(), 10010u);
-    EXPECT_EQ(clip.nDuration, 10u);
-    EXPECT_EQ(clip.nFrameRate, 30u);
-    EXPECT_EQ(clip.nWidth, 320u);
-    EXPECT_EQ(clip.bHasVideo, 1u);
-    EXPECT_STREQ(clip.szFormat, "avi");
-    EXPECT_EQ(parser->getMainHeader()->dwFlags, 0x10000000u) << "flags are read byte-swapped";
-    EXPECT_EQ(parser->getMainHeader()->bHasIndex, 0u);
-
-    _MMClipInfo pub{};
-    EXPECT_EQ(MM_MediaExtractor_GetClipInfo(path.c_str(), MEDIA_TYPE_AVI, &pub), MM_OK);
-    EXPECT_EQ(pub.nDuration, 10000u) << "whole seconds, then milliseconds";
+// The duration comes from scale, rate and length (a stream without a rate leaves it to
+// the next), the frame rate from the total frames; flags are read byte-swapped; a JUNK
+// chunk inside the header list ends the stream walk but keeps earlier streams
+// (unreported); stream lists beyond the two slots are ignored.
+TEST_F(AviHeaders, ClipAndStreamsOfEachHeaderList) {
+    AviMainFields ntsc;
+    ntsc.totalFrames = 300;
+    ntsc.flags = 0x10;  // AVIF_HASINDEX as written in the file
+    AviStreamFields xvid = AviVideoStream(1, 25, 50);
+    xvid.handler = "XVID";
+    const struct {
+        const char* name;
+        std::vector<Bytes> lists;
+        AviMainFields main;
+        const char *clip, *parser;
+    } cases[] = {
+        {"ntsc", {AviStrl(AviVideoStream(1001, 30000, 300), AviVideoFormat(320, 240, "FMP4"))}, ntsc,
+         "avi size=224 dur=10 bps=179 video=1 vbps=179 w=320 h=240 fps=30",
+         "ms=10010 streams=1 types=464d5034/ffffffff/ffffffff flags=10000000 index=0"},
+        {"junk", {VideoStrl(), RiffChunk("JUNK", Bytes().zeros(24)), AudioStrl()}, AviMainFields(),
+         "avi size=358 dur=2 bps=1432 video=1 vbps=1432 w=64 h=48",
+         "ms=2000 streams=1 types=464d5034/ffffffff/ffffffff flags=10000000 index=0"},
+        {"no rate", {VideoStrl(0), AudioStrl(48000)}, AviMainFields(),
+         "avi size=326 dur=3 bps=869 audio=1 video=1 abps=16000 hz=8000 ch=1 bits=16 vbps=4294952165 w=64 h=48",
+         "ms=3000 streams=2 types=464d5034/1/ffffffff flags=10000000 index=0"},
+        {"three streams", {AviStrl(xvid, AviVideoFormat(64, 48, "XVID")), AudioStrl(),
+                           AviStrl(AviVideoStream(1, 30, 90), AviVideoFormat(999, 999, "DIVX"))},
+         AviMainFields(), "avi size=450 dur=2 bps=1800 audio=1 video=1 abps=16000 hz=8000 ch=1 bits=16 vbps=4294953096 w=64 h=48",
+         "ms=2000 streams=2 types=58564944/1/ffffffff flags=10000000 index=0"},
+    };
+    for (const auto& c : cases) {
+        std::memset(&clip, 0, sizeof clip);
+        EXPECT_EQ(parser->init(Write(c.lists, c.main).c_str(), &clip), MM_OK) << c.name;
+        char text[96];
+        std::snprintf(text, sizeof text, "ms=%u streams=%u types=%x/%x/%x flags=%x index=%u", parser->getDuration(),
+                      parser->getStreamNum(), static_cast<unsigned>(parser->getStreamType(0)),
+                      static_cast<unsigned>(parser->getStreamType(1)), static_cast<unsigned>(parser->getStreamType(2)),
+                      parser->getMainHeader()->dwFlags, parser->getMainHeader()->bHasIndex);
+        EXPECT_EQ(ClipSummary(clip), c.clip) << c.name;
+        EXPECT_EQ(std::string(text), c.parser) << c.name;
+    }
+    _MMClipInfo pub{};  // whole seconds, then milliseconds
+    EXPECT_EQ(MM_MediaExtractor_GetClipInfo(Write(cases[0].lists, ntsc).c_str(), MEDIA_TYPE_AVI, &pub), MM_OK);
+    EXPECT_EQ(pub.nDuration, 10000u);
 }
 
 TEST_F(AviHeaders, AudioBitRateIsBytesPerSecondAndVideoGetsTheDifference) {
@@ -78,44 +174,12 @@ TEST_F(AviHeaders, AudioBitRateIsBytesPerSecondAndVideoGetsTheDifference) {
     padded.patch_le32(4, static_cast<uint32_t>(padded.size() - 8));
     ASSERT_EQ(padded.size(), 2000000u);
     std::string path = dir.Write("hundred.avi", padded);
-
     EXPECT_EQ(metainfo::AVI_GetClipInfo(path.c_str(), &clip), MM_OK);
-    EXPECT_EQ(clip.nDuration, 100u);
-    EXPECT_EQ(clip.nBitrate, 160000u);
-    EXPECT_EQ(clip.nAudioBitrate, 16000u);
-    EXPECT_EQ(clip.nVideoBitrate, 144000u);
-    EXPECT_EQ(clip.nSampleRate, 8000u);
-    EXPECT_EQ(clip.nBitsPerSample, 16u);
+    EXPECT_EQ(ClipSummary(clip), "avi size=2000000 dur=100 bps=160000 audio=1 video=1 abps=16000 hz=8000 ch=1 bits=16 "
+                                 "vbps=144000 w=64 h=48 fps=25");
     int mask = 0;
     EXPECT_EQ(MM_MediaExtractor_GetTrackType(path.c_str(), MEDIA_TYPE_AVI, &mask), MM_OK);
     EXPECT_EQ(mask, TRACK_AUDIO | TRACK_VIDEO);
-}
-
-TEST_F(AviHeaders, JunkInsideTheHeaderListEndsTheStreamWalkButKeepsEarlierStreams) {
-    std::string path = Write({VideoStrl(), RiffChunk("JUNK", Bytes().zeros(24)), AudioStrl()});
-    EXPECT_EQ(parser->init(path.c_str(), &clip), MM_OK) << "header-list damage is not reported";
-    EXPECT_EQ(parser->getStreamNum(), 1u);
-    EXPECT_EQ(clip.bHasVideo, 1u);
-    EXPECT_EQ(clip.bHasAudio, 0u);
-    EXPECT_EQ(clip.nDuration, 2u);
-}
-
-TEST_F(AviHeaders, StreamWithoutRateLeavesTheDurationToTheNextStream) {
-    EXPECT_EQ(parser->init(Write({VideoStrl(0), AudioStrl(48000)}).c_str(), nullptr), MM_OK);
-    EXPECT_EQ(parser->getDuration(), 3000u);
-}
-
-TEST_F(AviHeaders, StreamListsBeyondTheTwoSlotsAreIgnored) {
-    AviStreamFields xvid = AviVideoStream(1, 25, 50);
-    xvid.handler = "XVID";
-    std::string path = Write({AviStrl(xvid, AviVideoFormat(64, 48, "XVID")), AudioStrl(),
-                              AviStrl(AviVideoStream(1, 30, 90), AviVideoFormat(999, 999, "DIVX"))});
-    EXPECT_EQ(parser->init(path.c_str(), &clip), MM_OK);
-    EXPECT_EQ(parser->getStreamNum(), 2u);
-    EXPECT_EQ(clip.nWidth, 64u) << "the third stream did not replace the video format";
-    EXPECT_EQ(parser->getStreamType(0), 0x58564944) << "XVID";
-    EXPECT_EQ(parser->getStreamType(1), 1);
-    EXPECT_EQ(parser->getStreamType(2), -1);
 }
 
 TEST_F(AviHeaders, ArgumentAndOpenFailures) {
@@ -170,54 +234,6 @@ TEST_F(AviHeaders, InitTwiceStartsAfresh) {
     EXPECT_EQ(parser->free(), MM_OK);
     EXPECT_EQ(parser->free(), MM_OK);
 }
-
-namespace {
-
-// A parser over the file, its index already read.
-class Indexed {
-public:
-    explicit Indexed(const std::vector<uint8_t>& file) : path_(dir_.Write("clip.avi", file)) {}
-    int32_t Open() { return p_.OpenIndexed(path_); }
-    CAVIParser* operator->() const { return p_.operator->(); }
-    const _AVIIndexEntry& Entry(uint32_t i) const { return p_->getIndexEntries()[i]; }
-    std::vector<uint32_t> TimesOf(uint32_t stream) const {
-        std::vector<uint32_t> times;
-        for (uint32_t i = 0; i < p_->getIndexCount(); ++i) {
-            if (Entry(i).wStream == stream) times.push_back(Entry(i).dwTimeMs);
-        }
-        return times;
-    }
-
-private:
-    TempDir dir_;
-    std::string path_;
-    AviParserHandle p_;
-};
-
-// Video at 25 fps interleaved with 4000-byte audio chunks at 16000 bytes/s.
-std::vector<uint8_t> Interleaved(uint32_t videoFrames, uint32_t audioChunks) {
-    AviMainFields main;
-    main.totalFrames = videoFrames;
-    main.streams = 2;
-    Bytes hdrl = AviHdrl(main, {AviStrl(AviVideoStream(1, 25, videoFrames), AviVideoFormat(16, 16, "FMP4")),
-                                AviStrl(AviAudioStream(16000, audioChunks * 4000), AviAudioFormat(1, 1, 8000, 16000, 2, 16))});
-    std::vector<AviFrame> frames;
-    for (uint32_t i = 0; i < videoFrames || i < audioChunks; ++i) {
-        if (i < videoFrames) frames.push_back({0, "dc", Bytes().be32(i).zeros(5), i % 10 == 0 ? 0x10u : 0u});
-        if (i < audioChunks) frames.push_back({1, "wb", Bytes().fill(4000, static_cast<uint8_t>(i)), 0x10u});
-    }
-    return AviFile(hdrl, frames);
-}
-
-// One video stream whose frames carry the given index flags.
-std::vector<uint8_t> VideoWithFlags(const std::vector<uint32_t>& flags) {
-    Bytes hdrl = AviHdrl(AviMainFields(), {AviStrl(AviVideoStream(1, 25, 6), AviVideoFormat(16, 16, "FMP4"))});
-    std::vector<AviFrame> frames;
-    for (uint32_t f : flags) frames.push_back({0, "dc", Bytes().zeros(4), f});
-    return AviFile(hdrl, frames);
-}
-
-}  // namespace
 
 // Video entries step by the frame time, audio ones by the previous chunk's
 // length; entries keep their fields; an entry of a stream without a slot stops
@@ -367,17 +383,6 @@ TEST(AviHostile, IndexSizesAndTruncationsStayBounded) {
     }
 }
 
-namespace {
-
-struct Variant {
-    const char* video;
-    const char* audio;
-};
-
-class AviFromFfmpeg : public ::testing::TestWithParam<Variant> {};
-
-}  // namespace
-
 TEST_P(AviFromFfmpeg, ClipAndFramesAgreeWithFfprobe) {
     if (!HaveFfmpeg()) GTEST_SKIP() << "ffmpeg not installed";
     TempDir dir;
@@ -435,29 +440,6 @@ INSTANTIATE_TEST_SUITE_P(Writers, AviFromFfmpeg,
                          [](const ::testing::TestParamInfo<Variant>& param) {
                              return std::string(param.param.video) + "_" + param.param.audio;
                          });
-
-namespace {
-
-// The tool is built beside the test directory; "" when it is not there.
-std::string ToolPath() {
-    char self[PATH_MAX] = {};
-    if (readlink("/proc/self/exe", self, sizeof self - 1) <= 0) return "";
-    std::string dir(self);
-    dir = dir.substr(0, dir.rfind('/'));
-    std::string tool = dir.substr(0, dir.rfind('/')) + "/metainfo";
-    return access(tool.c_str(), X_OK) == 0 ? tool : "";
-}
-
-int RunTool(const std::string& args, std::string* out) {
-    FILE* p = popen((ToolPath() + " " + args + " 2>&1").c_str(), "r");
-    if (p == nullptr) return -1;
-    char buf[256];
-    while (fgets(buf, sizeof buf, p) != nullptr) *out += buf;
-    int status = pclose(p);
-    return WIFEXITED(status) ? WEXITSTATUS(status) : -1;
-}
-
-}  // namespace
 
 TEST(MetainfoTool, FramesListsEntriesAndReadsFramesFromTheSeekPoint) {
     if (ToolPath().empty()) GTEST_SKIP() << "metainfo tool not built beside the tests";
