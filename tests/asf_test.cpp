@@ -98,6 +98,51 @@ void Capture(int priority, const char* tag, const char* message) {
     g_lines.push_back({priority, tag != nullptr ? tag : "", message});
 }
 
+// key=value lines of ffprobe for one selection of the file (the first of each key).
+std::map<std::string, std::string> Probe(const std::string& path, const std::string& select) {
+    std::map<std::string, std::string> values;
+    FILE* p = popen(("/usr/bin/ffprobe -v error " + select + " -of default=nw=1 '" + path + "'").c_str(), "r");
+    if (p == nullptr) return values;
+    char line[4096];
+    while (std::fgets(line, sizeof line, p) != nullptr) {
+        std::string s(line);
+        if (!s.empty() && s.back() == '\n') s.pop_back();
+        const size_t eq = s.find('=');
+        if (eq != std::string::npos) values.emplace(s.substr(0, eq), s.substr(eq + 1));
+    }
+    pclose(p);
+    return values;
+}
+
+uint32_t Number(const std::map<std::string, std::string>& v, const char* key) {
+    auto it = v.find(key);
+    return it == v.end() ? 0 : static_cast<uint32_t>(std::strtoul(it->second.c_str(), nullptr, 10));
+}
+
+std::string Narrow(const _MMMetaItem& item) {
+    std::string s;
+    for (uint32_t i = 0; i + 1 < item.nLength && item.szData[i] != 0; i += 2) s.push_back(static_cast<char>(item.szData[i]));
+    return s;
+}
+
+// Every query of the public interface, which must all succeed.
+struct Answers {
+    int type = 0, mask = 0;
+    _MM_CODECTYPE codec{};
+    _MMClipInfo clip{};
+    _MMMetaInfo meta{};
+    explicit Answers(const std::string& path) {
+        const char* p = path.c_str();
+        EXPECT_EQ(MM_MediaExtractor_DetectMediaType(p, &type), 0);
+        EXPECT_EQ(type, MEDIA_TYPE_ASF);
+        EXPECT_EQ(MM_MediaExtractor_GetTrackType(p, type, &mask), 0);
+        EXPECT_EQ(MM_MediaExtractor_GetCodecType(p, type, &codec), 0);
+        EXPECT_EQ(MM_MediaExtractor_GetClipInfo(p, type, &clip), 0);
+        EXPECT_EQ(MM_MediaExtractor_GetMetaInfo(p, type, &meta), 0);
+    }
+    Answers(const Answers&) = delete;
+    ~Answers() { MM_MediaExtractor_FreeMetaInfo(&meta); }
+};
 }  // namespace
 
 // The duration is play time less preroll in milliseconds, divided by 1000
@@ -267,19 +312,8 @@ TEST(AsfCodec, Wmv9LevelRulesFireInTheirOrder) {
     EXPECT_EQ(ASF_AdvancedProfileLevel(30, false, 2048, 1536), 0u);
 }
 
-TEST(AsfNames, Unicode2AsciiAndIsEqualNameAndTheLog) {
-    // The low byte of unit i goes to byte i and is counted; a unit with a zero
-    // low byte leaves byte i as it was.
-    uint8_t text[] = {'W', 0, 'M', 0, 0, 0x30, '/', 0};
-    EXPECT_EQ(ASF_unicode2ascii(text, sizeof text), 3u);
-    EXPECT_EQ(std::string(reinterpret_cast<char*>(text), 4), "WMM/");
-    uint8_t one[] = {'A'};
-    EXPECT_EQ(ASF_unicode2ascii(one, 1), 0u);
-    const uint8_t name[] = {'W', 'M', '/', 'Y', 'e', 'a', 'r'};
-    EXPECT_EQ(ASF_IsEqualName(name, "WM/Year", 7, 7), 1);
-    EXPECT_EQ(ASF_IsEqualName(name, "WM/Yea", 6, 7), 0);
-    EXPECT_EQ(ASF_IsEqualName(name, "WM/Yeah", 7, 7), 0);
-    // Diagnostics go to the log at verbose priority with the ASF tag.
+// Diagnostics go to the log at verbose priority with the ASF tag.
+TEST(AsfLog, DiagnosticsGoToTheLogAtVerbosePriority) {
     TempDir dir;
     auto path = dir.Write("a.wma", AsfFile({AsfAudioStream(1, 0x0161, 44100, 2, 128000)}));
     g_lines.clear();
@@ -401,56 +435,6 @@ TEST(AsfMeta, PicturesAndBanners) {
     EXPECT_EQ(meta.nPictureSize, 0x80000u);
     EXPECT_EQ(MM_MediaExtractor_FreeMetaInfo(&meta), 0);
 }
-
-namespace {
-
-// key=value lines of ffprobe for one selection of the file (the first of each key).
-std::map<std::string, std::string> Probe(const std::string& path, const std::string& select) {
-    std::map<std::string, std::string> values;
-    FILE* p = popen(("/usr/bin/ffprobe -v error " + select + " -of default=nw=1 '" + path + "'").c_str(), "r");
-    if (p == nullptr) return values;
-    char line[4096];
-    while (std::fgets(line, sizeof line, p) != nullptr) {
-        std::string s(line);
-        if (!s.empty() && s.back() == '\n') s.pop_back();
-        const size_t eq = s.find('=');
-        if (eq != std::string::npos) values.emplace(s.substr(0, eq), s.substr(eq + 1));
-    }
-    pclose(p);
-    return values;
-}
-
-uint32_t Number(const std::map<std::string, std::string>& v, const char* key) {
-    auto it = v.find(key);
-    return it == v.end() ? 0 : static_cast<uint32_t>(std::strtoul(it->second.c_str(), nullptr, 10));
-}
-
-std::string Narrow(const _MMMetaItem& item) {
-    std::string s;
-    for (uint32_t i = 0; i + 1 < item.nLength && item.szData[i] != 0; i += 2) s.push_back(static_cast<char>(item.szData[i]));
-    return s;
-}
-
-// Every query of the public interface, which must all succeed.
-struct Answers {
-    int type = 0, mask = 0;
-    _MM_CODECTYPE codec{};
-    _MMClipInfo clip{};
-    _MMMetaInfo meta{};
-    explicit Answers(const std::string& path) {
-        const char* p = path.c_str();
-        EXPECT_EQ(MM_MediaExtractor_DetectMediaType(p, &type), 0);
-        EXPECT_EQ(type, MEDIA_TYPE_ASF);
-        EXPECT_EQ(MM_MediaExtractor_GetTrackType(p, type, &mask), 0);
-        EXPECT_EQ(MM_MediaExtractor_GetCodecType(p, type, &codec), 0);
-        EXPECT_EQ(MM_MediaExtractor_GetClipInfo(p, type, &clip), 0);
-        EXPECT_EQ(MM_MediaExtractor_GetMetaInfo(p, type, &meta), 0);
-    }
-    Answers(const Answers&) = delete;
-    ~Answers() { MM_MediaExtractor_FreeMetaInfo(&meta); }
-};
-
-}  // namespace
 
 TEST(AsfCorpus, EveryWmaIsAnsweredAndAgreesWithFfprobe) {
     const std::string corpus = CorpusDir();
