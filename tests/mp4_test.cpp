@@ -129,6 +129,29 @@ protected:
     }
 };
 
+// Every query of the public interface, plus the maker box.
+struct Answers {
+    int type = 0, mask = 0;
+    int32_t clipResult = 0, codecResult = 0, metaResult = 0;
+    _MMClipInfo clip{};
+    _MM_CODECTYPE codec{};
+    _MMMetaInfo meta{};
+    explicit Answers(const std::string& path) {
+        const char* p = path.c_str();
+        MM_MediaExtractor_DetectMediaType(p, &type);
+        MM_MediaExtractor_GetTrackType(p, MEDIA_TYPE_MP4, &mask);
+        codecResult = MM_MediaExtractor_GetCodecType(p, MEDIA_TYPE_MP4, &codec);
+        clipResult = MM_MediaExtractor_GetClipInfo(p, MEDIA_TYPE_MP4, &clip);
+        metaResult = MM_MediaExtractor_GetMetaInfo(p, MEDIA_TYPE_MP4, &meta);
+        _MAKERINFO maker{};
+        MP4_GetMakerInfo(p, &maker);
+        MM_MediaExtractor_FreeBuffer(maker.pPhoneModel);
+        MM_MediaExtractor_FreeBuffer(maker.pThumbnail);
+        MM_MediaExtractor_FreeBuffer(maker.pSmartAlbum);
+    }
+    Answers(const Answers&) = delete;
+    ~Answers() { MM_MediaExtractor_FreeMetaInfo(&meta); }
+};
 }  // namespace
 
 TEST_F(Mp4, ClipOfEachFileShape) {
@@ -462,34 +485,6 @@ TEST_F(Mp4, MakerBox) {
     EXPECT_EQ(AnaMaker(h, &maker), -9);
     MEx_fclose(h);
 }
-
-namespace {
-
-// Every query of the public interface, plus the maker box.
-struct Answers {
-    int type = 0, mask = 0;
-    int32_t clipResult = 0, codecResult = 0, metaResult = 0;
-    _MMClipInfo clip{};
-    _MM_CODECTYPE codec{};
-    _MMMetaInfo meta{};
-    explicit Answers(const std::string& path) {
-        const char* p = path.c_str();
-        MM_MediaExtractor_DetectMediaType(p, &type);
-        MM_MediaExtractor_GetTrackType(p, MEDIA_TYPE_MP4, &mask);
-        codecResult = MM_MediaExtractor_GetCodecType(p, MEDIA_TYPE_MP4, &codec);
-        clipResult = MM_MediaExtractor_GetClipInfo(p, MEDIA_TYPE_MP4, &clip);
-        metaResult = MM_MediaExtractor_GetMetaInfo(p, MEDIA_TYPE_MP4, &meta);
-        _MAKERINFO maker{};
-        MP4_GetMakerInfo(p, &maker);
-        MM_MediaExtractor_FreeBuffer(maker.pPhoneModel);
-        MM_MediaExtractor_FreeBuffer(maker.pThumbnail);
-        MM_MediaExtractor_FreeBuffer(maker.pSmartAlbum);
-    }
-    Answers(const Answers&) = delete;
-    ~Answers() { MM_MediaExtractor_FreeMetaInfo(&meta); }
-};
-
-}  // namespace
 
 TEST(Mp4Corpus, EveryMp4FamilyFileIsAnsweredWithoutAFault) {
     const std::string root = CorpusDir();

@@ -174,6 +174,30 @@ namespace {
 std::vector<uint8_t> Qcp(const std::vector<Bytes>& chunks) { return RiffForm("QLCM", chunks); }
 Bytes Data(const Bytes& packets) { return SpeechChunk("data", packets); }
 
+// Cuts from a 60-second 12.2 kbit/s file: 1600 bytes per second after the 6-byte magic.
+struct AmrExtract : ::testing::Test {
+    void SetUp() override {
+        source = AmrFile(false, 7, 3000);
+        // Mark each frame with its index so that a wrong offset shows.
+        for (size_t i = 0; i < 3000; ++i) source[6 + i * 32 + 1] = static_cast<uint8_t>(i);
+        path = dir.Write("speech.amr", source);
+    }
+    TempDir dir;
+    std::vector<uint8_t> source;
+    std::string path;
+};
+
+// Cuts from three seconds of 8 kHz 16-bit mono: 16000 bytes a second from offset 36.
+struct WaveExtract : ::testing::Test {
+    void SetUp() override {
+        source = CanonicalWave(1, 1, 8000, 16, 48000);
+        for (size_t i = 44; i < source.size(); ++i) source[i] = static_cast<uint8_t>(i * 7);
+        path = dir.Write("tone.wav", source);
+    }
+    TempDir dir;
+    std::vector<uint8_t> source;
+    std::string path;
+};
 }  // namespace
 
 TEST(QcpClip, FmtBitrateGivesDurationAndFields) {
@@ -397,23 +421,6 @@ TEST(WaveFormat, ShortFilesFailAndMissingFilesAnswerOne) {
     EXPECT_EQ(metainfo::WAVE_GetClipInfo(SpeechFile("44.wav", file).c_str(), nullptr), MM_E_INVALIDARG);
 }
 
-namespace {
-
-// Cuts from a 60-second 12.2 kbit/s file: 1600 bytes per second after the 6-byte magic.
-struct AmrExtract : ::testing::Test {
-    void SetUp() override {
-        source = AmrFile(false, 7, 3000);
-        // Mark each frame with its index so that a wrong offset shows.
-        for (size_t i = 0; i < 3000; ++i) source[6 + i * 32 + 1] = static_cast<uint8_t>(i);
-        path = dir.Write("speech.amr", source);
-    }
-    TempDir dir;
-    std::vector<uint8_t> source;
-    std::string path;
-};
-
-}  // namespace
-
 TEST_F(AmrExtract, BufferHoldsWholeSecondsCutToTheDuration) {
     const struct {
         int start, end;
@@ -461,22 +468,6 @@ TEST_F(AmrExtract, CutFileIsAcceptedByFfprobeWithTheRequestedDuration) {
     ASSERT_EQ(AMR_GetAudioData2File(path.c_str(), 5, 15, out.c_str()), MM_OK);
     EXPECT_NEAR(FfprobePlayTime(out), 10.0, 0.021);
 }
-
-namespace {
-
-// Cuts from three seconds of 8 kHz 16-bit mono: 16000 bytes a second from offset 36.
-struct WaveExtract : ::testing::Test {
-    void SetUp() override {
-        source = CanonicalWave(1, 1, 8000, 16, 48000);
-        for (size_t i = 44; i < source.size(); ++i) source[i] = static_cast<uint8_t>(i * 7);
-        path = dir.Write("tone.wav", source);
-    }
-    TempDir dir;
-    std::vector<uint8_t> source;
-    std::string path;
-};
-
-}  // namespace
 
 TEST_F(WaveExtract, BufferFromTheDataIdCutToTheDuration) {
     const struct {
