@@ -88,14 +88,6 @@ std::string SpeechFile(const std::string& name, const std::vector<uint8_t>& byte
     return dir.Write(name, bytes);
 }
 
-std::string AudioSummary(const _MMClipInfo& c) {
-    char text[256];
-    std::snprintf(text, sizeof text, "%.127s size=%u dur=%u bps=%u/%u hz=%u ch=%u bits=%u spf=%u av=%u/%u", c.szFormat,
-                  c.nFileSize, c.nDuration, c.nBitrate, c.nAudioBitrate, c.nSampleRate, c.nChannels, c.nBitsPerSample,
-                  c.nSamplesPerFrame, c.bHasAudio, c.bHasVideo);
-    return text;
-}
-
 double FfprobePlayTime(const std::string& file) {
     std::string cmd = "/usr/bin/ffprobe -v error -show_entries packet=pts_time,duration_time -of csv=p=0 '";
     FILE* p = popen((cmd + file + "'").c_str(), "r");

@@ -1,6 +1,6 @@
 // Byte builders for speech and PCM files: RIFF chunks (WAVE, QCP), AMR
-// storage files and EVRC storage files; a scratch directory, a one-line clip
-// summary and ffprobe's view of a cut file.
+// storage files and EVRC storage files; a scratch directory and ffprobe's
+// view of a cut file.
 #pragma once
 
 #include <cstdint>
@@ -45,11 +45,6 @@ std::vector<uint8_t> EvrcFile(const Bytes& packets);
 // Writes bytes to name in a directory that lasts as long as the test program;
 // returns the path.
 std::string SpeechFile(const std::string& name, const std::vector<uint8_t>& bytes);
-
-// The audio fields of a clip record on one line, e.g.
-// "amr size=96006 dur=60000 bps=12200/12200 hz=8000 ch=1 bits=16 spf=160 av=1/0"
-// (bps: overall/audio bit rate; av: has audio/has video).
-std::string AudioSummary(const _MMClipInfo& clip);
 
 // Play time as ffprobe's demuxer reads it: the end of the last packet, or -1.
 // (Its container duration is only an estimate from the bit rate.)
