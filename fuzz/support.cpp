@@ -1,6 +1,8 @@
 #include "support.h"
 
+#include <dirent.h>
 #include <fcntl.h>
+#include <signal.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
@@ -95,13 +97,38 @@ extern "C" void MetainfoFuzzRemoveScratch() {
 
 namespace {
 
+// A run stopped by a crash or a timeout leaves its scratch directory behind;
+// the next process removes those whose process is gone.
+void RemoveStaleScratch(const std::string& base) {
+    DIR* d = opendir(base.c_str());
+    if (d == nullptr) return;
+    static const char kPrefix[] = "metainfo-fuzz-";
+    while (dirent* e = readdir(d)) {
+        if (std::strncmp(e->d_name, kPrefix, sizeof kPrefix - 1) != 0) continue;
+        char* end = nullptr;
+        long pid = std::strtol(e->d_name + sizeof kPrefix - 1, &end, 10);
+        if (end == nullptr || *end != '\0' || pid <= 0 || kill(static_cast<pid_t>(pid), 0) == 0 || errno != ESRCH) {
+            continue;
+        }
+        const std::string dir = base + "/" + e->d_name;
+        if (DIR* inner = opendir(dir.c_str())) {
+            while (dirent* f = readdir(inner)) {
+                if (f->d_name[0] != '.') unlink((dir + "/" + f->d_name).c_str());
+            }
+            closedir(inner);
+        }
+        rmdir(dir.c_str());
+    }
+    closedir(d);
+}
+
 Scratch& State() {
     if (g_scratch == nullptr) {
-        std::string pattern = ScratchBase() + "/metainfo-fuzz-XXXXXX";
-        std::vector<char> buf(pattern.begin(), pattern.end());
-        buf.push_back('\0');
-        if (mkdtemp(buf.data()) == nullptr) Fail("cannot make a scratch directory in", ScratchBase());
-        g_scratch = new Scratch{buf.data(), std::string(buf.data()) + "/input", {}, {}, {}};
+        const std::string base = ScratchBase();
+        RemoveStaleScratch(base);
+        const std::string dir = base + "/metainfo-fuzz-" + std::to_string(getpid());
+        if (mkdir(dir.c_str(), 0700) != 0 && errno != EEXIST) Fail("cannot make a scratch directory in", base);
+        g_scratch = new Scratch{dir, dir + "/input", {}, {}, {}};
         std::atexit(MetainfoFuzzRemoveScratch);
         MM_DrmProvider provider{nullptr, GetMetadata, OpenSession, ReadServed, CloseSession};
         MM_MediaExtractor_SetDrmProvider(&provider);
