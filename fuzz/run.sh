@@ -112,8 +112,10 @@ triage() {
   local t=$1 dir=$work/$1 seen="" n=0 f name min report
   mkdir -p "$dir/min" "$root/fuzz/regressions/$t"
   : >"$dir/new-regressions"
-  # Faults the committed regression inputs already show are not new.
-  for f in "$root/fuzz/regressions/$t"/* "$root/fuzz/regressions/common"/*; do
+  compgen -G "$dir/artifacts/*-*" >/dev/null || return 0
+  # Faults the committed regression inputs already show (of any target, when
+  # they show them through this one) are not new.
+  for f in "$root"/fuzz/regressions/*/*; do
     [ -f "$f" ] || continue
     name=$(name_of "$t" "$f")
     [ -z "$name" ] || seen="$seen $name"
@@ -126,7 +128,7 @@ triage() {
     [ -n "$name" ] || { echo "  ($t: ${f##*/} does not fail again alone)"; continue; }
     case " $seen " in *" $name "*) continue ;; esac
     seen="$seen $name"
-    [ -e "$root/fuzz/regressions/$t/$name" ] && continue
+    compgen -G "$root/fuzz/regressions/*/$name" >/dev/null && continue
     min=$dir/min/$name
     rm -f "$min"
     "$bin/fuzz_$t" -minimize_crash=1 -max_total_time=60 -timeout=$((timeout_s * 2)) -rss_limit_mb=$rss_mb \
