@@ -17,14 +17,8 @@
 #include <vector>
 
 #include "metainfo/metainfo.h"
-#include "support/asf_builder.h"
-#include "support/avi_builder.h"
 #include "support/bytes.h"
-#include "support/id3_builder.h"
-#include "support/mp3_builder.h"
-#include "support/mp4_builder.h"
-#include "support/rm_builder.h"
-#include "support/speech_builder.h"
+#include "support/fixture_files.h"
 
 using namespace testing_support;
 
@@ -219,48 +213,12 @@ protected:
     Service second;
 };
 
-// Files of the formats the bundled samples lack, and of those whose parse
-// leaves state for the next call (MP4, ASF, QCP).
+// Every format's byte-built files, in their order: a QCP parse leaves state
+// for the next one on the same thread.
 std::vector<std::string> BuiltFiles(const TempDir& dir) {
-    Bytes jpeg = Bytes().be16(0xFFD8).fill(300, 0x11).be16(0xFFD9);
-    Bytes asf = AsfHeader({AsfFileProperties(2000, 30000000, 0, 128000), AsfAudioStream(1, 0x0161, 44100, 2, 128000),
-                           AsfContentDescription("Title", "Artist", "", "", "")});
-    asf.raw(AsfGuid("75B22636-668E-11CF-A6D9-00AA0062CE6C")).le64(50).fill(26, 0);
-
-    RmStream audio;
-    audio.typeData = RaHeaderV4(44100, 16, 2, "cook");
-    RmStream video;
-    video.number = 1;
-    video.mime = "video/x-pn-realvideo";
-    video.typeData = RvHeader("RV40", 320, 240, 15);
-    RmProps props;
-    props.numStreams = 2;
-
-    ByteVec udta = Box("udta", Join({TextBox("titl", "Clip"),
-                                     FullBox("@mkr", 0, 0,
-                                             Join({FullBox("modl", 0, 0, ByteVec{'P', 'X'}),
-                                                   FullBox("thub", 0, 0,
-                                                           Bytes().be32(0xCAFE).be32(static_cast<uint32_t>(jpeg.size())).raw(jpeg))}))}));
-    ByteVec stbl = Join({Stsd({AudioEntry("mp4a", 2, 16, 44100, Esds(0x40, 128000))}), Stsz(0, 0)});
-    ByteVec mp4 = Movie(Join({Mvhd(0, 1000, 5000), Trak("soun", 44100, 220500, stbl), udta}));
-
-    std::vector<uint8_t> mp3 = Id3Tag(3, {Id3Frame(3, "TIT2", TextBody(0, "Song")),
-                                          Id3Frame(3, "APIC", ApicBody("image/jpeg", jpeg))});
-    std::vector<uint8_t> frames = Mp3Frames(40);
-    mp3.insert(mp3.end(), frames.begin(), frames.end());
-
-    Bytes packets = SpeechPackets(4, 34, 200);
-    return {
-        dir.Write("tagged.mp3", mp3),
-        dir.Write("camera.3gp", mp4),
-        dir.Write("song.wma", asf),
-        dir.Write("clip.rm", RmFile(props, {RmCont("t", "a", "c", "x"), RmMdpr(audio), RmMdpr(video)})),
-        dir.Write("clip.avi", AviVideoOnly(20, 5)),
-        // Counted packets, sized by the codec the thread saw last: QCELP, then SMV.
-        dir.Write("qcelp.qcp", RiffForm("QLCM", {QcpFmtChunk(kQcelpGuid1, 0), SpeechChunk("data", packets)})),
-        dir.Write("smv.qcp", RiffForm("QLCM", {QcpFmtChunk(kSmvGuid, 0), SpeechChunk("data", packets)})),
-        dir.Write("voice.evc", EvrcFile(SpeechPackets(4, 22, 100))),
-    };
+    std::vector<std::string> files;
+    for (const FixtureFile& f : FixtureFiles()) files.push_back(dir.Write(f.name, f.bytes));
+    return files;
 }
 
 std::vector<std::string> FilesUnder(const std::string& folder) {
