@@ -3,12 +3,13 @@
 # target and runs them there: armhf with Debian's cross compiler under
 # qemu-user, i386 with gcc -m32 natively. Then compares what the target's
 # "metainfo probe --json" says with what the host's says, file by file, over
-# samples/, ../shared/corpus/ and, when given, a folder of large sparse files.
+# samples/, the tests' byte-built files of every format, ../shared/corpus/ and
+# sparse files of 3 and 5 GiB.
 #
 #   tools/cross-test.sh [armhf|i386] [SPARSE_DIR] [--clean]
 #
-# SPARSE_DIR (or $METAINFO_SPARSE_DIR) is filled by the host's SparseFiles
-# tests, then compared with the rest. --clean rebuilds everything, so that every
+# SPARSE_DIR (or $METAINFO_SPARSE_DIR; build-<target>/sparse by default) is
+# filled by the host's SparseFiles tests, then compared with the rest. --clean rebuilds everything, so that every
 # compiler warning is shown again. As root, installs what the target needs:
 # Debian's multilib and armhf cross compilers exclude each other, so one set
 # replaces the other. Exits 1 when a test fails or an answer differs, 2 when
@@ -34,6 +35,7 @@ done
 # A relative SPARSE_DIR is taken from where the script was started.
 [ -n "$sparse_dir" ] && [ "${sparse_dir#/}" = "$sparse_dir" ] && sparse_dir=$caller_dir/$sparse_dir
 bdir=$root/build-$target
+[ -n "$sparse_dir" ] || sparse_dir=$bdir/sparse
 hostdir=$root/build
 jobs=2
 mkdir -p "$bdir"
@@ -144,8 +146,7 @@ fi
 
 # The host's tool (and tests, which write the sparse files) for the comparison.
 say "host build ($hostdir)"
-host_targets=(--target metainfo_cli)
-[ -n "$sparse_dir" ] && host_targets+=(--target metainfo_tests)
+host_targets=(--target metainfo_cli --target metainfo_tests --target metainfo_make_seeds)
 { [ -f "$hostdir/CMakeCache.txt" ] || cmake -S . -B "$hostdir" -DCMAKE_BUILD_TYPE=RelWithDebInfo; } \
   >"$bdir/host-build.log" 2>&1 \
   && cmake --build "$hostdir" -j $jobs "${host_targets[@]}" >>"$bdir/host-build.log" 2>&1 \
@@ -156,7 +157,7 @@ end_phase host-build
 # here too: where 32-bit sizes narrow, -Wconversion says so.
 say "build for $target ($bdir)"
 cmake -S . -B "$bdir" -DCMAKE_TOOLCHAIN_FILE="$toolchain" -DCMAKE_BUILD_TYPE=RelWithDebInfo \
-  -DCMAKE_DISABLE_FIND_PACKAGE_JNI=ON -DGTest_DIR="$gtest_prefix/lib/cmake/GTest" -DMETAINFO_WERROR=OFF \
+  -DCMAKE_DISABLE_FIND_PACKAGE_JNI=ON -DGTest_DIR="$gtest_prefix/lib/cmake/GTest" -DMETAINFO_WERROR=ON \
   >"$bdir/configure.log" 2>&1 \
   || { tail -20 "$bdir/configure.log"; die "configuring for $target failed"; }
 cmake --build "$bdir" -j $jobs $clean >"$bdir/build.log" 2>&1
@@ -240,6 +241,12 @@ end_phase sparse
 say "comparison: host metainfo probe --json against $target"
 files=()
 for f in samples/*; do [ -f "$f" ] && files+=("$f"); done
+rm -rf "$bdir/fixtures"
+if "$hostdir/fuzz/metainfo_make_seeds" "$bdir/fixtures" >/dev/null 2>&1; then
+  mapfile -t -O ${#files[@]} files < <(find "$bdir/fixtures/detect" -type f | LC_ALL=C sort)
+else
+  echo "   the byte-built files could not be written: they are left out"
+fi
 if [ -d ../shared/corpus ]; then
   mapfile -t -O ${#files[@]} files < <(find ../shared/corpus -type f | LC_ALL=C sort)
 else
