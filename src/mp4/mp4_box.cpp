@@ -55,7 +55,7 @@ int getBoxHeader(int h, _BOXHEADER* header) {
     const bool whole = MEx_fread(b, 1, sizeof b, h) == static_cast<int>(sizeof b);
     header->size = ReadBE32(b);
     header->type = ReadBE32(b + 4);
-    if (whole && header->size == 1) {
+    if (header->size == 1) {
         uint8_t large[8] = {};
         const int got = MEx_fread(large, 1, sizeof large, h);
         header->largeSizeHigh = ReadBE32(large);
