@@ -167,6 +167,10 @@ TEST_F(Mp4, ClipOfEachFileShape) {
         {"size 0", Bytes().be32(0).str("ftyp").zeros(24), "clip.mp4", MM_E_FAIL, ""},
         {"beyond the file", Movie(Mvhd(0, 1000, 7000), Bytes().be32(0x7FFFFFF0).str("mdat").zeros(8)), "clip.mp4", MM_OK,
          "mp4 size=156 dur=7 bps=178"},
+        // Headers cut short: missing bytes read as 0 (a 64-bit size of 0 is refused); the walk
+        // stops at a last header the file does not hold whole, rather than going back to it.
+        {"cut 64-bit size", Bytes().be32(1), "clip.mp4", MM_E_FAIL, ""},
+        {"cut last header", Join({Ftyp(), Bytes().be32(3).u8(0x80).data()}), "clip.m4a", MM_OK, "m4a size=29"},
         // A 64-bit size's upper word of 1 is ignored: the box ends after its lower word.
         {"64-bit size", Join({Ftyp(), Bytes().be32(1).str("mdat").be32(1).be32(24).zeros(8).data(),
                               Box("moov", Join({Mvhd(0, 1000, 6000), AudioTrak(6000)})), Box("free", ByteVec(8, 0))}),
