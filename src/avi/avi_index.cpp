@@ -44,7 +44,7 @@ int32_t CAVIParser::locateChunk(const char* fourcc) {
     uint64_t pos = 12;
     while (pos + 8 <= end) {
         if (MEx_fseek(hFile, static_cast<int64_t>(pos), SEEK_SET) != 0) return MM_E_FAIL;
-        _CHUNKHEADER header;
+        _CHUNKHEADER header{};
         getChunkHeader(hFile, &header);
         bool found = isList ? header.ckID == Fourcc("LIST") && header.ckType == want : header.ckID == want;
         if (found) {
@@ -75,7 +75,7 @@ int32_t CAVIParser::parseMovi(int handle) {
     if (handle == 0) return MM_E_INVALIDARG;
     int64_t start = MEx_ftell(handle);
     if (start < 0) return MM_E_FAIL;
-    _CHUNKHEADER header;
+    _CHUNKHEADER header{};
     getChunkHeader(handle, &header);
     if (header.ckSize == 0 || header.ckSize > nFileSize || header.ckSize < 4) return MM_E_FAIL;
     uint64_t end = uint64_t(start) + 12 + header.ckSize - 4;
@@ -112,7 +112,7 @@ int32_t CAVIParser::parseIdx1(int handle) {
     if (handle == 0) return MM_E_INVALIDARG;
     int64_t start = MEx_ftell(handle);
     if (start < 0) return MM_E_FAIL;
-    _CHUNKHEADER header;
+    _CHUNKHEADER header{};
     getChunkHeader(handle, &header);
     if (header.ckSize >= nFileSize || header.ckSize == 0) return MM_E_FAIL;
     uint64_t first = uint64_t(start) + 8;

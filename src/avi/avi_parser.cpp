@@ -146,7 +146,7 @@ int32_t CAVIParser::init(const char* path, _MMClipInfo* clip) {
     nFileSize = PositionToU32(MEx_ftell(hFile));
     MEx_fseek(hFile, 0, SEEK_SET);
 
-    _CHUNKHEADER riff;
+    _CHUNKHEADER riff{};
     getChunkHeader(hFile, &riff);
     if (riff.ckID != Fourcc("RIFF")) return MM_E_FAIL;
     nRiffEnd = SaturateU32(uint64_t(riff.ckSize) + 8);
@@ -182,7 +182,7 @@ int32_t CAVIParser::parseListChunks() {
     uint64_t pos = 12;
     while (pos < nFileSize) {
         if (MEx_fseek(hFile, static_cast<int64_t>(pos), SEEK_SET) != 0) return MM_E_FAIL;
-        _CHUNKHEADER header;
+        _CHUNKHEADER header{};
         getChunkHeader(hFile, &header);
         MEx_fseek(hFile, static_cast<int64_t>(pos), SEEK_SET);
         if (pos < nRiffEnd && (header.ckSize == 0 || header.ckSize >= nFileSize)) return MM_E_FAIL;
@@ -202,7 +202,7 @@ int32_t CAVIParser::parseListChunks() {
 }
 
 int32_t CAVIParser::parseInfo() {
-    _CHUNKHEADER header;
+    _CHUNKHEADER header{};
     getChunkHeader(hFile, &header);
     if (header.ckSize > nFileSize || header.ckSize == 0) return MM_E_FAIL;
     return MM_OK;
@@ -211,7 +211,7 @@ int32_t CAVIParser::parseInfo() {
 int32_t CAVIParser::parseHdrl() {
     int64_t start = MEx_ftell(hFile);
     if (start < 0) return MM_E_FAIL;
-    _CHUNKHEADER header;
+    _CHUNKHEADER header{};
     getChunkHeader(hFile, &header);
     if (header.ckSize >= nFileSize || header.ckSize == 0 || header.ckSize < 4) return MM_E_FAIL;
     uint32_t bodySize = header.ckSize - 4;
@@ -234,7 +234,7 @@ int32_t CAVIParser::parseHdrl() {
             result = MM_E_FAIL;
             break;
         }
-        _CHUNKHEADER list;
+        _CHUNKHEADER list{};
         getChunkHeader(body + off, &list);
         if (off + 8 + list.ckSize > bodySize || list.ckType != Fourcc("strl")) {
             result = MM_E_FAIL;  // streams read so far stay
