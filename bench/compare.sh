@@ -23,7 +23,7 @@ trap cleanup EXIT
 
 build() {   # source folder, build folder
   cmake -S "$1" -B "$2" -DCMAKE_BUILD_TYPE=Release -DMETAINFO_TESTS=OFF >/dev/null
-  cmake --build "$2" -j 2 --target metainfo_cli metainfo_make_seeds >/dev/null
+  cmake --build "$2" -j 2 --target metainfo_cli metainfo_make_seeds >"$2.log" 2>&1 || { cat "$2.log"; return 1; }
 }
 
 git -C "$root" worktree add --detach "$work/base-src" "$base" >/dev/null 2>&1

@@ -69,7 +69,8 @@ int main(int argc, char** argv) {
     std::string family;
     bool count = false;
     app.add_option("paths", roots, "files and folders to measure")->required();
-    app.add_option("--peers", wanted, "peers to run (default: every one built and installed)");
+    std::string peerList;
+    app.add_option("--peers", peerList, "peers to run, comma-separated (default: every one built and installed)");
     app.add_option("--rounds", rounds, "measured rounds after the warm-up")->check(CLI::Range(1, 1000));
     app.add_option("--mutagen-worker", worker, "path of mutagen_worker.py");
     app.add_option("--family", family, "measure only this family (MP3, MP4, ...)");
@@ -77,6 +78,11 @@ int main(int argc, char** argv) {
     app.add_flag("--count", count, "print how many files would be measured, and stop");
     app.add_flag("--once", once, "run each job once and print nothing (for counting system calls)");
     CLI11_PARSE(app, argc, argv);
+    for (size_t at = 0; at < peerList.size();) {
+        const size_t comma = std::min(peerList.find(',', at), peerList.size());
+        wanted.push_back(peerList.substr(at, comma - at));
+        at = comma + 1;
+    }
 
     std::vector<bench::BenchFile> files = bench::CollectFiles(roots);
     if (!family.empty()) {
