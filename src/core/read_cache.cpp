@@ -16,9 +16,9 @@ namespace {
 // previous miss, up to kMaxChunk; a request of kMaxChunk or more that the
 // cache does not hold goes straight to the caller's buffer.
 constexpr size_t kMinChunk = 4096;
-constexpr size_t kMaxChunk = 64 * 1024;
+constexpr size_t kMaxChunk = size_t{64} * 1024;
 // What one file may hold; past it the file's bytes are dropped and read anew.
-constexpr size_t kCapacity = 1024 * 1024;
+constexpr size_t kCapacity = size_t{1024} * 1024;
 constexpr int kFiles = 2;
 // A file changed this recently when its bytes were first read may have been
 // changed again within one tick of the file system's clock, leaving the same
