@@ -358,11 +358,12 @@ uint32_t SumSampleSizes(int h, uint64_t n) {
     uint32_t total = 0;
     while (n > 0) {
         const size_t want = n < kBlock ? static_cast<size_t>(n) : kBlock;
-        const int got = MEx_fread(block, 4, static_cast<unsigned>(want), h);
-        if (got <= 0) break;
-        for (size_t i = 0; i < static_cast<size_t>(got); ++i) total += ReadBE32(block + 4 * i);
-        n -= static_cast<uint64_t>(got);
-        if (static_cast<size_t>(got) < want) break;
+        // Counted in bytes: a protected file's reads answer bytes, not items.
+        const int got = MEx_fread(block, 1, static_cast<unsigned>(want * 4), h);
+        const size_t entries = got > 0 ? static_cast<size_t>(got) / 4 : 0;
+        for (size_t i = 0; i < entries; ++i) total += ReadBE32(block + 4 * i);
+        n -= entries;
+        if (entries < want) break;
     }
     return total;
 }
