@@ -4,6 +4,7 @@
 #include <gtest/gtest.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cstdio>
 #include <cstring>
 #include <map>
@@ -135,6 +136,52 @@ TEST(PlainFile, ReadsItemsSeeksAndTellsLikeStdio) {
     EXPECT_EQ(MEx_fseek(h, 1, SEEK_CUR), 0);
     EXPECT_EQ(MEx_ftell(h), 3);
     EXPECT_EQ(MEx_fclose(h), 0);
+}
+
+// Reads that hit, straddle and miss what earlier reads brought in, from two
+// handles on one file, small and large, up to and past the end; then the file
+// is rewritten in place with the same size, and a new handle reads the new bytes.
+TEST(PlainFile, EveryReadAnswersTheFileBytesAndARewriteIsSeen) {
+    struct Step {
+        int handle;
+        int64_t pos;
+        size_t n;
+    };
+    const Step kSteps[] = {
+        {0, 0, 128},        {1, 300000, 64},    {0, 20000, 10},     {0, 12288, 7712},
+        {1, 12000, 9000},   {0, 4000, 200},     {1, 0, 10},         {0, 70000, 9000},
+        {1, 65536, 200000}, {0, 299990, 50},    {1, 8192, 4096},    {0, 4096, 100000},
+        {1, 307190, 20},    {0, 307200, 10},    {1, 123456, 1},     {0, 200000, 107200},
+        {1, 0, 307200},
+    };
+    constexpr size_t kSize = 307200;
+    TempDir dir;
+    std::vector<uint8_t> bytes(kSize);
+    for (size_t i = 0; i < kSize; ++i) bytes[i] = static_cast<uint8_t>(i * 7 + i / 251);
+    std::string path = dir.Write("a.bin", bytes);
+    int h[2] = {MEx_fopen(path.c_str(), "rb"), MEx_fopen(path.c_str(), "rb")};
+    ASSERT_NE(h[0], 0);
+    ASSERT_NE(h[1], 0);
+    for (const Step& s : kSteps) {
+        SCOPED_TRACE(testing::Message() << "read " << s.n << " at " << s.pos);
+        std::vector<uint8_t> got(s.n, 0xEE);
+        ASSERT_EQ(MEx_fseek(h[s.handle], s.pos, SEEK_SET), 0);
+        const size_t want = s.pos >= static_cast<int64_t>(kSize) ? 0 : std::min(s.n, kSize - static_cast<size_t>(s.pos));
+        EXPECT_EQ(MEx_fread(got.data(), 1, static_cast<unsigned>(s.n), h[s.handle]), static_cast<int>(want));
+        EXPECT_TRUE(std::equal(got.begin(), got.begin() + static_cast<std::ptrdiff_t>(want), bytes.begin() + s.pos));
+        EXPECT_EQ(MEx_feof(h[s.handle]), want < s.n ? 1 : 0);
+        EXPECT_EQ(MEx_ftell(h[s.handle]), s.pos + static_cast<int64_t>(want));
+    }
+    MEx_fclose(h[0]);
+    MEx_fclose(h[1]);
+    // At once, so that the file's times are likely still those of the first write.
+    for (uint8_t& b : bytes) b ^= 0xFF;
+    dir.Write("a.bin", bytes);
+    int again = MEx_fopen(path.c_str(), "rb");
+    std::vector<uint8_t> got(kSize);
+    EXPECT_EQ(MEx_fread(got.data(), 1, kSize, again), static_cast<int>(kSize));
+    EXPECT_EQ(got, bytes);
+    MEx_fclose(again);
 }
 
 TEST(PlainFile, PathsOfFourCharactersOrFewerNeverOpen) {

@@ -241,16 +241,19 @@ TEST_F(Mp4, SampleDescriptions) {
                       Stsd({AudioEntry("samr", 1, 16, 8000, Box("damr", Bytes().str("vndr").u8(0).be16(0x81FF).u8(0).u8(3))),
                             AudioEntry("mp4a", 2, 16, 48000, Esds(0x40, 1, {0x11, 0x90}))}))),
          "size=536 dur=10 bps=428 audio=1 hz=8000 ch=1 bits=3 | 1 4005/0 0"},
-        // Frame rate is samples per whole second; stsz replaces the node's bit rate, not the clip's.
+        // Frame rate is samples per whole second; with a bit rate from the sample entry the
+        // sizes are not summed.
         {"frame rate 10 s", Video(mp4v, Stsz(500, 300)),
-         "size=553 dur=10 bps=442 video=1 vbps=64000 w=176 h=144 fps=30 | 16 4001/0 120000"},
+         "size=553 dur=10 bps=442 video=1 vbps=64000 w=176 h=144 fps=30 | 16 4001/0 64000"},
         {"frame rate 9.9 s", Video(mp4v, Stsz(500, 300), 9900),
-         "size=553 dur=9 bps=491 video=1 vbps=64000 w=176 h=144 fps=33 | 16 4001/0 133333"},
+         "size=553 dur=9 bps=491 video=1 vbps=64000 w=176 h=144 fps=33 | 16 4001/0 64000"},
         // A zero sample size sums the entries; a count far beyond the table sums what the box holds.
         {"stsz entries", Audio(AudioEntry("mp4a", 1, 16, 8000, Esds(0x40, 0, {0x15, 0x88})), Stsz(0, 3, {1000, 2000, 2000})),
          "size=515 dur=10 bps=412 audio=1 abps=4000 hz=8000 ch=1 bits=16 | 1 4008/2102 4000"},
         {"stsz hostile count", Audio(AudioEntry("mp4a", 1, 16, 8000), Stsz(0, 0xFFFFFFF0u, {800})),
          "size=468 dur=10 bps=374 audio=1 abps=640 hz=8000 ch=1 bits=16 | 1 0/0 640"},
+        {"stsz of 40000 entries", Audio(AudioEntry("mp4a", 1, 16, 8000), Stsz(0, 40000, std::vector<uint32_t>(40000, 25))),
+         "size=160464 dur=10 bps=128371 audio=1 abps=800000 hz=8000 ch=1 bits=16 | 1 0/0 800000"},
         // Speech entries have fixed values.
         {"secw", Audio(AudioEntry("secw", 2, 8, 44100)),
          "size=444 dur=10 bps=355 audio=1 hz=8000 ch=1 bits=16 | 1 8001/0 0"},

@@ -1,5 +1,6 @@
 #include "core/file_access.h"
 
+#include <fcntl.h>
 #include <unistd.h>
 
 #include <atomic>
@@ -10,6 +11,7 @@
 #include "core/byte_reader.h"
 #include "core/drm.h"
 #include "core/log.h"
+#include "core/read_cache.h"
 #include "metainfo/records.h"
 
 // Without 64-bit file offsets a 32-bit host could neither seek past 2 GiB nor
@@ -19,9 +21,14 @@ static_assert(sizeof(off_t) == 8, "build with _FILE_OFFSET_BITS=64");
 namespace metainfo {
 namespace {
 
+// A plain file is read with positional reads through this thread's cache
+// (fd set), or, when it is no regular file or is written, through stdio.
 struct MexHandle {
     int drmKind = -1;
     FILE* stream = nullptr;
+    int fd = -1;
+    FileIdentity id;
+    bool eof = false;
     bool hasClient = false;
     DrmClient client{};
     void* session = nullptr;
@@ -136,6 +143,68 @@ int SeekProtected(MexHandle* handle, int64_t offset, int whence) {
     }
 }
 
+bool ReadOnly(const char* mode) { return mode[0] == 'r' && std::strchr(mode, '+') == nullptr; }
+
+// Takes fd as the handle's positional reader when it is a regular file.
+bool TakeRegularFile(MexHandle* handle, int fd, int64_t position) {
+    struct stat st;
+    if (::fstat(fd, &st) != 0 || !S_ISREG(st.st_mode)) return false;
+    handle->fd = fd;
+    handle->id = FileIdentity::Of(st);
+    handle->position = position < 0 ? 0 : position;
+    OpenCachedFile(handle->id);
+    return true;
+}
+
+bool OpenPlain(MexHandle* handle, const char* path, const char* mode) {
+    if (ReadOnly(mode)) {
+        const int fd = ::open(path, O_RDONLY | O_CLOEXEC);
+        if (fd < 0) return false;
+        if (TakeRegularFile(handle, fd, 0)) return true;
+        ::close(fd);
+    }
+    handle->stream = std::fopen(path, mode);
+    if (handle->stream == nullptr) return false;
+    struct stat st;
+    // What this thread holds of a file that is now written is stale.
+    if (!ReadOnly(mode) && ::fstat(::fileno(handle->stream), &st) == 0) {
+        ForgetCachedFile(static_cast<uint64_t>(st.st_dev), static_cast<uint64_t>(st.st_ino));
+    }
+    return true;
+}
+
+void ClosePlain(MexHandle* handle) {
+    if (handle->fd >= 0) ::close(handle->fd);
+    if (handle->stream != nullptr) (void)std::fclose(handle->stream);
+    handle->fd = -1;
+    handle->stream = nullptr;
+}
+
+int ReadPositional(MexHandle* handle, void* buf, unsigned size, unsigned count) {
+    const size_t want = static_cast<size_t>(size) * count;
+    if (want == 0) return 0;
+    const size_t got = CachedRead(handle->fd, handle->id, static_cast<uint64_t>(handle->position), buf, want);
+    handle->position += static_cast<int64_t>(got);
+    if (got < want) handle->eof = true;
+    return static_cast<int>(got / size);
+}
+
+// As fseeko: no position before the start or past the largest offset.
+int SeekPositional(MexHandle* handle, int64_t offset, int whence) {
+    int64_t base;
+    switch (whence) {
+        case SEEK_SET: base = 0; break;
+        case SEEK_CUR: base = handle->position; break;
+        case SEEK_END: base = handle->id.size; break;
+        default: return -1;
+    }
+    if (offset > 0 && base > INT64_MAX - offset) return -1;
+    if (base + offset < 0) return -1;
+    handle->position = base + offset;
+    handle->eof = false;
+    return 0;
+}
+
 }  // namespace
 
 int MEx_fopen(const char* path, const char* mode) {
@@ -149,16 +218,10 @@ int MEx_fopen(const char* path, const char* mode) {
         return 0;
     }
     handle->drmKind = kind;
-    bool opened;
-    if (kind == 0) {
-        handle->stream = std::fopen(path, mode);
-        opened = handle->stream != nullptr;
-    } else {
-        opened = OpenProtected(handle, path, client);
-    }
+    const bool opened = kind == 0 ? OpenPlain(handle, path, mode) : OpenProtected(handle, path, client);
     int h = opened ? Register(handle) : 0;
     if (h == 0) {
-        if (handle->stream != nullptr) (void)std::fclose(handle->stream);
+        ClosePlain(handle);
         CloseProtected(handle);
         delete handle;
     }
@@ -169,21 +232,23 @@ int MEx_fdopen(int fd, const char* mode) {
     if (fd < 0 || mode == nullptr) return 0;
     int copy = ::dup(fd);
     if (copy < 0) return 0;
-    FILE* stream = ::fdopen(copy, mode);
-    if (stream == nullptr) {
+    MexHandle* handle = new (std::nothrow) MexHandle();
+    if (handle == nullptr) {
         ::close(copy);
         return 0;
     }
-    MexHandle* handle = new (std::nothrow) MexHandle();
-    if (handle == nullptr) {
-        (void)std::fclose(stream);
-        return 0;
-    }
     handle->drmKind = 0;
-    handle->stream = stream;
+    if (!ReadOnly(mode) || !TakeRegularFile(handle, copy, static_cast<int64_t>(::lseek(copy, 0, SEEK_CUR)))) {
+        handle->stream = ::fdopen(copy, mode);
+        if (handle->stream == nullptr) {
+            ::close(copy);
+            delete handle;
+            return 0;
+        }
+    }
     int h = Register(handle);
     if (h == 0) {
-        (void)std::fclose(stream);
+        ClosePlain(handle);
         delete handle;
     }
     return h;
@@ -193,6 +258,7 @@ int MEx_fread(void* buf, unsigned size, unsigned count, int h) {
     MexHandle* handle = Lookup(h);
     if (handle == nullptr) return -1;
     if (buf == nullptr) return 0;
+    if (handle->fd >= 0) return ReadPositional(handle, buf, size, count);
     if (handle->drmKind == 0) return static_cast<int>(std::fread(buf, size, count, handle->stream));
     return ReadProtected(handle, buf, size, count);
 }
@@ -200,13 +266,14 @@ int MEx_fread(void* buf, unsigned size, unsigned count, int h) {
 int MEx_fwrite(const void* buf, unsigned size, unsigned count, int h) {
     MexHandle* handle = Lookup(h);
     if (handle == nullptr || handle->drmKind != 0) return -1;
-    if (buf == nullptr) return 0;
+    if (buf == nullptr || handle->fd >= 0) return 0;
     return static_cast<int>(std::fwrite(buf, size, count, handle->stream));
 }
 
 int MEx_fseek(int h, int64_t offset, int whence) {
     MexHandle* handle = Lookup(h);
     if (handle == nullptr) return -1;
+    if (handle->fd >= 0) return SeekPositional(handle, offset, whence);
     if (handle->drmKind == 0) return ::fseeko(handle->stream, static_cast<off_t>(offset), whence);
     return SeekProtected(handle, offset, whence);
 }
@@ -214,6 +281,7 @@ int MEx_fseek(int h, int64_t offset, int whence) {
 int64_t MEx_ftell(int h) {
     MexHandle* handle = Lookup(h);
     if (handle == nullptr) return -1;
+    if (handle->fd >= 0) return handle->position;
     if (handle->drmKind == 0) return static_cast<int64_t>(::ftello(handle->stream));
     return handle->position;
 }
@@ -221,6 +289,7 @@ int64_t MEx_ftell(int h) {
 int MEx_feof(int h) {
     MexHandle* handle = Lookup(h);
     if (handle == nullptr) return -1;
+    if (handle->fd >= 0) return handle->eof ? 1 : 0;
     if (handle->drmKind == 0) return std::feof(handle->stream);
     return handle->position >= handle->size ? 1 : 0;
 }
@@ -230,7 +299,9 @@ int MEx_fclose(int h) {
     if (handle == nullptr) return 0;
     Unregister(h);
     int result = 0;
-    if (handle->drmKind == 0) {
+    if (handle->fd >= 0) {
+        result = ::close(handle->fd);
+    } else if (handle->drmKind == 0) {
         result = std::fclose(handle->stream);
     } else {
         CloseProtected(handle);

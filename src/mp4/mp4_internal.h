@@ -72,6 +72,9 @@ struct MP4TrackNode {
 struct _ME_ClipInfoEx {
     _MMClipInfo clip;
     MP4TrackNode* tracks;  // head of the ring, null without "trak"
+    // Set by a codec query, which walks the same boxes but reports no bit
+    // rate: no sample-size table is summed for it.
+    bool codecOnly;
 };
 
 // The node being filled: the last one of the ring (null without any).

@@ -348,40 +348,66 @@ int32_t AnaStsd(int h, uint32_t /*handlerType*/, _ME_ClipInfoEx* info) {
     }
 }
 
-int32_t AnaStsz(int h, uint32_t handlerType, _ME_ClipInfoEx* info) {
-    BoxBuffer buf;
-    uint32_t size = 0;
-    // Error codes the other way round from the other readers, as callers know them.
-    const int32_t result = ReadWholeBox(h, FourCC("stsz"), kMp4BadEntry, kMp4BadContainer, &buf, &size);
-    if (result != MM_OK) return result;
-    if (buf.size < 20) return MM_E_FAIL;
-    const uint32_t sampleSize = ReadBE32(buf.data + 12);
-    const uint32_t sampleCount = ReadBE32(buf.data + 16);
-    uint32_t total = 0;  // 32-bit arithmetic, wrapping as it always has
-    if (sampleSize != 0) {
-        total = sampleSize * sampleCount;
-    } else {
-        const uint64_t held = (buf.size - 20) / 4;
-        const uint64_t n = sampleCount < held ? sampleCount : held;
-        for (uint64_t i = 0; i < n; ++i) total += ReadBE32(buf.data + 20 + 4 * i);
+namespace {
+
+// Sum of n big-endian 32-bit sample sizes from the current position, read in
+// blocks; 32-bit arithmetic, wrapping as it always has.
+uint32_t SumSampleSizes(int h, uint64_t n) {
+    constexpr size_t kBlock = 16384;
+    uint8_t block[kBlock * 4];
+    uint32_t total = 0;
+    while (n > 0) {
+        const size_t want = n < kBlock ? static_cast<size_t>(n) : kBlock;
+        // Counted in bytes: a protected file's reads answer bytes, not items.
+        const int got = MEx_fread(block, 1, static_cast<unsigned>(want * 4), h);
+        const size_t entries = got > 0 ? static_cast<size_t>(got) / 4 : 0;
+        for (size_t i = 0; i < entries; ++i) total += ReadBE32(block + 4 * i);
+        n -= entries;
+        if (entries < want) break;
     }
+    return total;
+}
+
+}  // namespace
+
+int32_t AnaStsz(int h, uint32_t handlerType, _ME_ClipInfoEx* info) {
+    const int64_t start = Tell(h);
+    _BOXHEADER header{};
+    getBoxHeader(h, &header);
+    // Error codes the other way round from the other readers, as callers know them.
+    if (header.type != FourCC("stsz") || BadBoxSize(header.size)) return kMp4BadEntry;
+    // What the box holds of its declared size before the file ends.
+    const uint64_t left = start >= 0 && static_cast<uint64_t>(start) < s_mp4FileSize
+                              ? s_mp4FileSize - static_cast<uint64_t>(start)
+                              : 0;
+    const uint64_t held = header.size < left ? header.size : left;
+    if (held < 20) return MM_E_FAIL;
+    uint8_t fields[12] = {};
+    SeekTo(h, start + 8);
+    if (MEx_fread(fields, 1, sizeof fields, h) != static_cast<int>(sizeof fields)) return MM_E_FAIL;
+    const uint32_t sampleSize = ReadBE32(fields + 4);
+    const uint32_t sampleCount = ReadBE32(fields + 8);
     const int32_t duration = static_cast<int32_t>(info->clip.nDuration);
     if (duration <= 0) return MM_OK;
-    const int32_t bits = static_cast<int32_t>(total * 8u);
-    const int32_t bitrate = bits / duration;
     MP4TrackNode* node = CurrentTrack(info);
-    if (handlerType == FourCC("vide")) {
+    const bool video = handlerType == FourCC("vide");
+    const bool audio = handlerType == FourCC("soun");
+    if (video) {
         const int32_t frameRate = static_cast<int32_t>(sampleCount) / duration;
         info->clip.nFrameRate = static_cast<uint32_t>(frameRate);
-        if (info->clip.nVideoBitrate == 0) info->clip.nVideoBitrate = static_cast<uint32_t>(bitrate);
-        if (node != nullptr) {
-            node->bitsOrFrameRate = static_cast<uint32_t>(frameRate);
-            node->bitrate = static_cast<uint32_t>(bitrate);
-        }
-    } else if (handlerType == FourCC("soun")) {
-        if (info->clip.nAudioBitrate == 0) info->clip.nAudioBitrate = static_cast<uint32_t>(bitrate);
-        if (node != nullptr) node->bitrate = static_cast<uint32_t>(bitrate);
+        if (node != nullptr) node->bitsOrFrameRate = static_cast<uint32_t>(frameRate);
     }
+    // The sum only feeds a bit rate the sample entry left unknown.
+    uint32_t* field = video ? &info->clip.nVideoBitrate : audio ? &info->clip.nAudioBitrate : nullptr;
+    if (field == nullptr || *field != 0 || info->codecOnly) return MM_OK;
+    uint32_t total = sampleSize * sampleCount;
+    if (sampleSize == 0) {
+        const uint64_t entries = (held - 20) / 4;
+        total = SumSampleSizes(h, sampleCount < entries ? sampleCount : entries);
+    }
+    const int32_t bits = static_cast<int32_t>(total * 8u);
+    *field = static_cast<uint32_t>(bits / duration);
+    if (node != nullptr) node->bitrate = *field;
     return MM_OK;
 }
 

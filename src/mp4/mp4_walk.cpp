@@ -363,6 +363,7 @@ int32_t MP4_GetCodecType(const char* path, _MM_CODECTYPE* codec) {
     if (path == nullptr || codec == nullptr) return MM_E_INVALIDARG;
     _ME_ClipInfoEx info;
     std::memset(&info, 0, sizeof info);
+    info.codecOnly = true;
     return CodecFromWalk(MP4_GetMediaInfo(path, kModeClip, &info), &info, codec);
 }
 
@@ -376,6 +377,7 @@ int32_t MP4_GetCodecTypeEx(int fd, _MM_CODECTYPE* codec) {
     if (codec == nullptr) return MM_E_INVALIDARG;
     _ME_ClipInfoEx info;
     std::memset(&info, 0, sizeof info);
+    info.codecOnly = true;
     return CodecFromWalk(MP4_GetMediaInfoFd(fd, kModeClip, &info), &info, codec);
 }
 

@@ -1,0 +1,190 @@
+#include "core/read_cache.h"
+
+#include <unistd.h>
+
+#include <cerrno>
+#include <ctime>
+#include <cstring>
+#include <iterator>
+#include <map>
+#include <vector>
+
+namespace metainfo {
+namespace {
+
+// A miss reads at least this much, doubling while the reads run on from the
+// previous miss, up to kMaxChunk; a request of kMaxChunk or more that the
+// cache does not hold goes straight to the caller's buffer.
+constexpr size_t kMinChunk = 4096;
+constexpr size_t kMaxChunk = size_t{64} * 1024;
+// What one file may hold; past it the file's bytes are dropped and read anew.
+constexpr size_t kCapacity = size_t{1024} * 1024;
+constexpr int kFiles = 2;
+// A file changed this recently when its bytes were first read may have been
+// changed again within one tick of the file system's clock, leaving the same
+// identity behind: its bytes serve only the handle that read them.
+constexpr int64_t kSettledNs = 2000000000;
+
+struct CachedFile {
+    FileIdentity id;
+    bool used = false;
+    uint64_t lastUse = 0;
+    std::map<uint64_t, std::vector<uint8_t>> extents;   // start -> bytes, never overlapping
+    size_t bytes = 0;
+    uint64_t missEnd = UINT64_MAX;
+    size_t chunk = kMinChunk;
+    uint64_t end = UINT64_MAX;   // where a read came up short: nothing past it
+    int64_t startedNs = 0;       // when the bytes held were first read
+
+    void Clear() {
+        extents.clear();
+        bytes = 0;
+        missEnd = UINT64_MAX;
+        chunk = kMinChunk;
+    }
+};
+
+struct ThreadCache {
+    CachedFile files[kFiles];
+    uint64_t clock = 0;
+};
+
+thread_local ThreadCache t_cache;
+
+int64_t NowNs() {
+    struct timespec ts {};
+    ::clock_gettime(CLOCK_REALTIME, &ts);
+    return static_cast<int64_t>(ts.tv_sec) * 1000000000 + ts.tv_nsec;
+}
+
+void Restart(CachedFile& f) {
+    f.Clear();
+    f.end = UINT64_MAX;
+    f.startedNs = NowNs();
+}
+
+CachedFile& FileFor(const FileIdentity& id) {
+    ThreadCache& c = t_cache;
+    CachedFile* oldest = &c.files[0];
+    for (CachedFile& f : c.files) {
+        if (f.used && f.id == id) {
+            f.lastUse = ++c.clock;
+            return f;
+        }
+        if (!f.used || (oldest->used && f.lastUse < oldest->lastUse)) oldest = &f;
+    }
+    Restart(*oldest);
+    oldest->id = id;
+    oldest->used = true;
+    oldest->lastUse = ++c.clock;
+    return *oldest;
+}
+
+// pread until n bytes, the end of the file or an error.
+size_t ReadAt(int fd, uint8_t* dst, size_t n, uint64_t pos) {
+    size_t done = 0;
+    while (done < n) {
+        const uint64_t at = pos + done;
+        if (at > static_cast<uint64_t>(INT64_MAX)) break;
+        const ssize_t got = ::pread(fd, dst + done, n - done, static_cast<off_t>(at));
+        if (got < 0 && errno == EINTR) continue;
+        if (got <= 0) break;
+        done += static_cast<size_t>(got);
+    }
+    return done;
+}
+
+// Adds bytes read at pos, joining the extents they touch.
+void Insert(CachedFile& f, uint64_t pos, std::vector<uint8_t> data) {
+    f.bytes += data.size();
+    auto next = f.extents.upper_bound(pos);
+    auto at = next;
+    if (next != f.extents.begin() && std::prev(next)->first + std::prev(next)->second.size() == pos) {
+        at = std::prev(next);
+        at->second.insert(at->second.end(), data.begin(), data.end());
+    } else {
+        at = f.extents.emplace_hint(next, pos, std::move(data));
+    }
+    if (next != f.extents.end() && at->first + at->second.size() == next->first) {
+        at->second.insert(at->second.end(), next->second.begin(), next->second.end());
+        f.extents.erase(next);
+    }
+}
+
+// Reads the gap at pos (up to gapEnd) into the cache; false at the end.
+bool Fill(CachedFile& f, int fd, uint64_t pos, size_t missing, uint64_t gapEnd) {
+    f.chunk = pos == f.missEnd ? (f.chunk < kMaxChunk ? f.chunk * 2 : kMaxChunk) : kMinChunk;
+    size_t want = missing > f.chunk ? missing : f.chunk;
+    if (want > gapEnd - pos) want = static_cast<size_t>(gapEnd - pos);
+    if (f.bytes + want > kCapacity) f.Clear();
+    std::vector<uint8_t> data(want);
+    const size_t got = ReadAt(fd, data.data(), want, pos);
+    if (got < want) f.end = pos + got;
+    if (got == 0) return false;
+    data.resize(got);
+    f.missEnd = pos + got;
+    Insert(f, pos, std::move(data));
+    return true;
+}
+
+}  // namespace
+
+FileIdentity FileIdentity::Of(const struct stat& st) {
+    FileIdentity id;
+    id.device = static_cast<uint64_t>(st.st_dev);
+    id.inode = static_cast<uint64_t>(st.st_ino);
+    id.size = static_cast<int64_t>(st.st_size);
+    id.modifiedNs = static_cast<int64_t>(st.st_mtim.tv_sec) * 1000000000 + st.st_mtim.tv_nsec;
+    id.changedNs = static_cast<int64_t>(st.st_ctim.tv_sec) * 1000000000 + st.st_ctim.tv_nsec;
+    return id;
+}
+
+void OpenCachedFile(const FileIdentity& id) {
+    CachedFile& f = FileFor(id);
+    if (f.startedNs - id.changedNs < kSettledNs) Restart(f);
+}
+
+size_t CachedRead(int fd, const FileIdentity& id, uint64_t pos, void* dst, size_t n) {
+    CachedFile& f = FileFor(id);
+    auto* out = static_cast<uint8_t*>(dst);
+    size_t done = 0;
+    while (done < n) {
+        const uint64_t at = pos + done;
+        auto next = f.extents.upper_bound(at);
+        if (next != f.extents.begin()) {
+            const auto held = std::prev(next);
+            const uint64_t end = held->first + held->second.size();
+            if (at < end) {
+                const size_t take = static_cast<size_t>(end - at) < n - done ? static_cast<size_t>(end - at) : n - done;
+                std::memcpy(out + done, held->second.data() + (at - held->first), take);
+                done += take;
+                continue;
+            }
+        }
+        if (at >= f.end) break;
+        const uint64_t gapEnd = next != f.extents.end() ? next->first : UINT64_MAX;
+        const size_t missing = gapEnd - at < n - done ? static_cast<size_t>(gapEnd - at) : n - done;
+        if (missing >= kMaxChunk) {
+            const size_t got = ReadAt(fd, out + done, missing, at);
+            done += got;
+            if (got < missing) {
+                f.end = at + got;
+                break;
+            }
+            continue;
+        }
+        if (!Fill(f, fd, at, missing, gapEnd)) break;
+    }
+    return done;
+}
+
+void ForgetCachedFile(uint64_t device, uint64_t inode) {
+    for (CachedFile& f : t_cache.files) {
+        if (f.used && f.id.device == device && f.id.inode == inode) {
+            f.Clear();
+            f.used = false;
+        }
+    }
+}
+
+}  // namespace metainfo

@@ -1,0 +1,45 @@
+// The bytes of the files a thread read last, so that the queries of one probe
+// (type, clip information, tags, codec: each opens the file) read every byte
+// from the system once, and a seek costs nothing.
+//
+// A file is known by device, inode, size and modification and change times:
+// a file rewritten between two queries is read anew. A file changed in the
+// last seconds is read anew by every handle, as a rewrite within one tick of
+// the file system's clock keeps its times.
+#pragma once
+
+#include <sys/stat.h>
+
+#include <cstddef>
+#include <cstdint>
+
+namespace metainfo {
+
+struct FileIdentity {
+    uint64_t device = 0;
+    uint64_t inode = 0;
+    int64_t size = 0;
+    int64_t modifiedNs = 0;
+    int64_t changedNs = 0;
+
+    static FileIdentity Of(const struct stat& st);
+    bool operator==(const FileIdentity& o) const {
+        return device == o.device && inode == o.inode && size == o.size && modifiedNs == o.modifiedNs &&
+               changedNs == o.changedNs;
+    }
+};
+
+// Called when a handle opens the file: what is held of it serves the new
+// handle only when the file had settled before it was read (see kSettledNs).
+void OpenCachedFile(const FileIdentity& id);
+
+// Copies up to n bytes at pos of the open file fd (known as id) into dst,
+// from this thread's cache where it holds them and from the file where not.
+// Answers the bytes copied: fewer than n only at the end of the file or on a
+// read error.
+size_t CachedRead(int fd, const FileIdentity& id, uint64_t pos, void* dst, size_t n);
+
+// Drops what this thread holds of a file that is about to be written.
+void ForgetCachedFile(uint64_t device, uint64_t inode);
+
+}  // namespace metainfo
