@@ -168,7 +168,7 @@ TEST(PlainFile, EveryReadAnswersTheFileBytesAndARewriteIsSeen) {
         ASSERT_EQ(MEx_fseek(h[s.handle], s.pos, SEEK_SET), 0);
         const size_t want = s.pos >= static_cast<int64_t>(kSize) ? 0 : std::min(s.n, kSize - static_cast<size_t>(s.pos));
         EXPECT_EQ(MEx_fread(got.data(), 1, static_cast<unsigned>(s.n), h[s.handle]), static_cast<int>(want));
-        EXPECT_TRUE(std::equal(got.begin(), got.begin() + static_cast<std::ptrdiff_t>(want), bytes.begin() + s.pos));
+        EXPECT_TRUE(std::equal(got.begin(), got.begin() + static_cast<std::ptrdiff_t>(want), bytes.begin() + static_cast<std::ptrdiff_t>(s.pos)));
         EXPECT_EQ(MEx_feof(h[s.handle]), want < s.n ? 1 : 0);
         EXPECT_EQ(MEx_ftell(h[s.handle]), s.pos + static_cast<int64_t>(want));
     }
