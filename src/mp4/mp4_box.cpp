@@ -21,15 +21,18 @@ void SeekTo(int h, int64_t pos) {
 
 bool BadBoxSize(uint32_t size) { return size == 0 || size >= s_mp4FileSize; }
 
+uint64_t BytesHeld(int64_t start, uint64_t size) {
+    const uint64_t left = start >= 0 && start < static_cast<int64_t>(s_mp4FileSize)
+                              ? s_mp4FileSize - static_cast<uint64_t>(start)
+                              : 0;
+    return size < left ? size : left;
+}
+
 bool ReadBoxBuffer(int h, uint32_t size, BoxBuffer* out) {
     delete[] out->data;
     out->data = nullptr;
     out->size = 0;
-    const int64_t pos = Tell(h);
-    const uint64_t left = pos >= 0 && pos < static_cast<int64_t>(s_mp4FileSize)
-                              ? s_mp4FileSize - static_cast<uint64_t>(pos)
-                              : 0;
-    const uint64_t want = size < left ? size : left;
+    const uint64_t want = BytesHeld(Tell(h), size);
     out->data = new (std::nothrow) uint8_t[want != 0 ? want : 1];
     if (out->data == nullptr) return false;
     if (want != 0) {

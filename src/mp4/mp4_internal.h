@@ -92,6 +92,8 @@ struct BoxBuffer {
     BoxBuffer& operator=(const BoxBuffer&) = delete;
     ~BoxBuffer() { delete[] data; }
 };
+// What an element of size bytes at start holds before the file ends.
+uint64_t BytesHeld(int64_t start, uint64_t size);
 // Reads size bytes from the current position. Returns false when the buffer
 // cannot be allocated; out->size tells how many bytes the file gave.
 bool ReadBoxBuffer(int h, uint32_t size, BoxBuffer* out);

@@ -376,11 +376,7 @@ int32_t AnaStsz(int h, uint32_t handlerType, _ME_ClipInfoEx* info) {
     getBoxHeader(h, &header);
     // Error codes the other way round from the other readers, as callers know them.
     if (header.type != FourCC("stsz") || BadBoxSize(header.size)) return kMp4BadEntry;
-    // What the box holds of its declared size before the file ends.
-    const uint64_t left = start >= 0 && static_cast<uint64_t>(start) < s_mp4FileSize
-                              ? s_mp4FileSize - static_cast<uint64_t>(start)
-                              : 0;
-    const uint64_t held = header.size < left ? header.size : left;
+    const uint64_t held = BytesHeld(start, header.size);
     if (held < 20) return MM_E_FAIL;
     uint8_t fields[12] = {};
     SeekTo(h, start + 8);
