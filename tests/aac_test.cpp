@@ -148,14 +148,14 @@ std::string WalkEveryFrame(const std::vector<uint8_t>& data, size_t* walked, siz
                                           static_cast<int>(f.offset) + f.headerSize);
         uint32_t state = metainfo::kWalkPlain;
         RawDataStream(&r, &state, f.samplingIndex);
-        const size_t end = static_cast<size_t>(r.bytePos);
+        const size_t end = static_cast<size_t>(metainfo::BytePosition(r));
         if (r.shortWindowTns) {
             if (shortTns != nullptr) ++*shortTns;
             if (end > data.size()) failures += "frame at " + std::to_string(f.offset) + " walked past the data\n";
             continue;
         }
         ++*walked;
-        if (r.exhausted || r.bitCount != 8 || end != f.offset + f.length) {
+        if (r.exhausted || !metainfo::AtByteStart(r) || end != f.offset + f.length) {
             failures += "frame at " + std::to_string(f.offset) + " (" + std::to_string(f.length) +
                         " bytes) walk ended at " + std::to_string(end) + "\n";
         }
@@ -497,8 +497,8 @@ TEST(AacExtractFfmpeg, CutsDecode) {
 TEST(AacWalker, EndElementFirstReadsNothingElse) {
     uint32_t state;
     const AacBitReader r = Walk({0xE0, 0xFF, 0xFF}, 4, &state);
-    EXPECT_EQ(1, r.bytePos);
-    EXPECT_EQ(8, r.bitCount);
+    EXPECT_EQ(1, metainfo::BytePosition(r));
+    EXPECT_TRUE(metainfo::AtByteStart(r));
     EXPECT_EQ(metainfo::kWalkPlain, state);
 }
 
@@ -522,7 +522,7 @@ TEST(AacWalker, OnlySbrFillExtensionsSetTheState) {
             const AacBitReader r = Walk(w.bytes(), 3, &state);
             const bool sbr = ext == 13 || ext == 14;
             EXPECT_EQ(sbr ? metainfo::kWalkSbrFound : metainfo::kWalkPlain, state) << ext << " " << elements[e];
-            EXPECT_EQ(static_cast<int>(w.bytes().size()), r.bytePos) << ext << " " << elements[e];
+            EXPECT_EQ(static_cast<int>(w.bytes().size()), metainfo::BytePosition(r)) << ext << " " << elements[e];
             EXPECT_FALSE(r.exhausted);
         }
     }
@@ -556,7 +556,7 @@ TEST(AacWalker, CorruptStreamsNeverReadPastTheData) {
         AacBitReader r = MakeAacBitReader(data.data(), static_cast<int>(size), 0);
         uint32_t state = metainfo::kWalkPlain;
         RawDataStream(&r, &state, static_cast<int>(rng() % 16));
-        ASSERT_LE(r.bytePos, static_cast<int>(size));
+        ASSERT_LE(metainfo::BytePosition(r), static_cast<int>(size));
     }
 }
 
@@ -637,6 +637,6 @@ TEST(AacWalker, ShortWindowTnsCoefficientsAreOneBitShorter) {
     const AacBitReader r = Walk(w.bytes(), 4, &state);
     EXPECT_TRUE(r.shortWindowTns);
     EXPECT_FALSE(r.exhausted);
-    EXPECT_EQ(static_cast<int>(w.bytes().size()), r.bytePos);
-    EXPECT_EQ(8, r.bitCount);
+    EXPECT_EQ(static_cast<int>(w.bytes().size()), metainfo::BytePosition(r));
+    EXPECT_TRUE(metainfo::AtByteStart(r));
 }

@@ -33,57 +33,24 @@ void byte_alignment(int* bytePos, int* bitCount) {
 }
 
 AacBitReader MakeAacBitReader(const uint8_t* buf, int size, int bytePos, int bitCount) {
-    AacBitReader r{buf, size, bytePos, bitCount, false, false};
-    if (buf == nullptr || size < 0 || bytePos < 0 || bitCount < 1 || bitCount > 8) r.exhausted = true;
+    AacBitReader r{buf, size, 0, false, false};
+    if (buf == nullptr || size < 0 || bytePos < 0 || bitCount < 1 || bitCount > 8) {
+        r.exhausted = true;
+        return r;
+    }
+    r.bitPos = static_cast<int64_t>(bytePos) * 8 + (8 - bitCount);
     return r;
-}
-
-namespace {
-
-// True when the bytes a read of n (1..8) bits touches all lie inside the data.
-bool CanRead(const AacBitReader* r, int n) {
-    if (r->exhausted) return false;
-    const int64_t last = static_cast<int64_t>(r->bytePos) + (r->bitCount < n ? 1 : 0);
-    return r->bytePos >= 0 && last < r->size;
-}
-
-}  // namespace
-
-uint32_t ReadBits(AacBitReader* r, int n) {
-    uint32_t value = 0;
-    while (n > 0) {
-        const int piece = n > 8 ? 8 : n;
-        if (!CanRead(r, piece)) {
-            r->exhausted = true;
-            return 0;
-        }
-        value = value << piece | GetBits(r->buf, piece, &r->bitCount, &r->bytePos);
-        n -= piece;
-    }
-    return value;
-}
-
-uint32_t PeekBits(AacBitReader* r, int n) {
-    if (n <= 0) return 0;
-    if (!CanRead(r, n)) {
-        r->exhausted = true;
-        return 0;
-    }
-    int bitCount = r->bitCount;
-    int bytePos = r->bytePos;
-    return GetBits(r->buf, n, &bitCount, &bytePos);
 }
 
 void SkipBytes(AacBitReader* r, uint32_t count) {
     if (r->exhausted) return;
-    const int64_t to = static_cast<int64_t>(r->bytePos) + count;
-    if (to > r->size) {
+    if ((r->bitPos >> 3) + count > r->size) {
         r->exhausted = true;
         return;
     }
-    r->bytePos = static_cast<int>(to);
+    r->bitPos += static_cast<int64_t>(count) * 8;
 }
 
-void AlignToByte(AacBitReader* r) { byte_alignment(&r->bytePos, &r->bitCount); }
+void AlignToByte(AacBitReader* r) { r->bitPos = (r->bitPos + 7) & ~int64_t{7}; }
 
 }  // namespace metainfo

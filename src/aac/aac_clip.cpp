@@ -113,14 +113,14 @@ int AdtsFrame(const uint8_t* frame, int available, uint32_t* walkerState, uint32
 
     AacBitReader r = MakeAacBitReader(frame, available, kAdtsHeaderSize);
     if (rawBlocks == 0) {
-        if (!protectionAbsent) r.bytePos = 9;  // crc_check
+        if (!protectionAbsent) SetBytePosition(&r, 9);  // crc_check
         RawDataStream(&r, walkerState, samplingIndex);
     } else if (protectionAbsent) {
         // r blocks, one fewer than the header announces: kept as the walk has
         // always been.
         for (int i = 0; i < rawBlocks && !r.exhausted; ++i) RawDataStream(&r, walkerState, samplingIndex);
     } else {
-        r.bytePos = 9 + 2 * rawBlocks;  // raw_data_block_position[] and crc_check
+        SetBytePosition(&r, 9 + 2 * rawBlocks);  // raw_data_block_position[] and crc_check
         for (int i = 0; i < rawBlocks && !r.exhausted; ++i) {
             RawDataStream(&r, walkerState, samplingIndex);
             SkipBytes(&r, 2);  // the block's crc_check

@@ -1,5 +1,6 @@
 #include "aac/aac_walker.h"
 
+#include "aac/aac_huffman.h"
 #include "aac/aac_tables.h"
 
 namespace metainfo {
@@ -50,13 +51,16 @@ struct IcsInfo {
     int num_window_groups;
     int window_group_length[kMaxGroups];
     int num_swb;
-    // Band offsets of each window group, in spectral lines of the group.
-    uint16_t sect_sfb_offset[kMaxGroups][kMaxBands + 1];
+    // Band offsets of one window; a group's band is as many times wider as
+    // the group has windows.
+    const uint16_t* swb_offset;
     int predictor_data_present;
 };
 
 // What one channel's walk keeps while it lasts: the window information and the
-// section codebook of every band. Nothing survives the element.
+// section codebook of every band. Nothing survives the element, and a band's
+// codebook is read only after section_data has written it, so the storage is
+// never cleared.
 struct ChannelStream {
     IcsInfo info;
     uint8_t sfb_cb[kMaxGroups][kMaxBands];
@@ -65,19 +69,7 @@ struct ChannelStream {
 
 int OutOfDataOr(const AacBitReader* r, int result) { return r->exhausted ? kWalkOutOfData : result; }
 
-// Index of the next codeword of a tree, or -1 (bad codeword or no data).
-int DecodeCodeword(AacBitReader* r, const HuffNode* tree, int nodes) {
-    int n = 0;
-    while ((tree[n].zero & kHuffLeaf) == 0) {
-        const uint32_t bit = ReadBits(r, 1);
-        if (r->exhausted) return -1;
-        n = bit ? tree[n].one : tree[n].zero;
-        if (n >= nodes) return -1;
-    }
-    return tree[n].zero & ~kHuffLeaf;
-}
-
-int DecodeScaleFactor(AacBitReader* r) { return DecodeCodeword(r, hcb_sf, kScaleFactorNodes); }
+int DecodeScaleFactor(AacBitReader* r) { return DecodeCodeword(r, HuffTableFor(0)); }
 
 int ics_info(AacBitReader* r, int samplingIndex, IcsInfo* info) {
     if (samplingIndex < 0 || samplingIndex >= kSamplingIndexCount) return kWalkBadSamplingIndex;
@@ -106,20 +98,13 @@ int ics_info(AacBitReader* r, int samplingIndex, IcsInfo* info) {
                 info->window_group_length[info->num_window_groups++] = 1;
             }
         }
-        const uint16_t* offsets = swb_offset_short_window[samplingIndex];
-        for (int g = 0; g < info->num_window_groups; ++g) {
-            for (int sfb = 0; sfb <= info->num_swb; ++sfb) {
-                info->sect_sfb_offset[g][sfb] =
-                    static_cast<uint16_t>(offsets[sfb] * info->window_group_length[g]);
-            }
-        }
+        info->swb_offset = swb_offset_short_window[samplingIndex];
     } else {
         info->num_windows = 1;
         info->num_window_groups = 1;
         info->window_group_length[0] = 1;
         info->num_swb = num_swb_long_window[samplingIndex];
-        const uint16_t* offsets = swb_offset_long_window[samplingIndex];
-        for (int sfb = 0; sfb <= info->num_swb; ++sfb) info->sect_sfb_offset[0][sfb] = offsets[sfb];
+        info->swb_offset = swb_offset_long_window[samplingIndex];
     }
     if (info->max_sfb > info->num_swb) return kWalkMaxSfb;
 
@@ -162,6 +147,7 @@ int scale_factor_data(AacBitReader* r, ChannelStream* cs) {
     const IcsInfo& info = cs->info;
     int scale_factor = cs->global_gain;
     bool noise_pcm_flag = true;
+    const HuffEntry* table = HuffTableFor(0);
     for (int g = 0; g < info.num_window_groups; ++g) {
         for (int sfb = 0; sfb < info.max_sfb; ++sfb) {
             const int cb = cs->sfb_cb[g][sfb];
@@ -170,7 +156,7 @@ int scale_factor_data(AacBitReader* r, ChannelStream* cs) {
                 noise_pcm_flag = false;
                 ReadBits(r, 9);  // dpcm_noise_nrg of the first noise band
             } else {
-                const int code = DecodeScaleFactor(r);
+                const int code = DecodeCodeword(r, table);
                 if (code < 0) return OutOfDataOr(r, kWalkBadCodeword);
                 if (cb != NOISE_HCB && cb != INTENSITY_HCB && cb != INTENSITY_HCB2) {
                     scale_factor += code - 60;
@@ -251,39 +237,28 @@ int gain_control_data(AacBitReader* r, const ChannelStream* cs) {
     return OutOfDataOr(r, 0);
 }
 
-int huffman_spectral_data(AacBitReader* r, int cb) {
-    const SpectralBook& book = hcb_table[cb];
-    const int index = DecodeCodeword(r, book.tree, book.nodes);
-    if (index < 0) return OutOfDataOr(r, kWalkBadCodeword);
-    if (book.isSigned) return 0;
-
-    int values[4];
-    int count = 0;
-    if (book.dimension == 4) {
-        values[0] = index / 27;
-        values[1] = index / 9 % 3;
-        values[2] = index / 3 % 3;
-        values[3] = index % 3;
-        count = 4;
-    } else {
-        const int modulus = book.lav + 1;
-        values[0] = index / modulus;
-        values[1] = index % modulus;
-        count = 2;
+// One codeword of an unsigned-or-signed spectral book with its sign bits and
+// escapes. The codeword and its sign bits are claimed together: data that ends
+// in either ends the element the same way.
+int huffman_spectral_data(AacBitReader* r, const HuffEntry* table) {
+    if (r->exhausted || RemainingBits(r) <= 0) {
+        r->exhausted = true;
+        return kWalkOutOfData;
     }
-    int signs = 0;
-    for (int i = 0; i < count; ++i) signs += values[i] != 0;
-    ReadBits(r, signs);
-
-    if (book.escape) {
-        for (int i = 0; i < count; ++i) {
-            if (values[i] != 16) continue;
-            int prefix = 0;
-            while (ReadBits(r, 1) == 1) {
-                if (++prefix > kMaxEscapePrefix) return kWalkBadCodeword;
-            }
-            ReadBits(r, prefix + 4);  // escape_word
+    const HuffEntry e = LookUpCodeword(r, table);
+    if (!(e.flags & kHuffEntryLeaf)) {
+        if (!Claim(r, e.length)) return kWalkOutOfData;
+        r->bitPos += e.length;
+        return kWalkBadCodeword;
+    }
+    if (!Claim(r, e.length + SignBits(e))) return kWalkOutOfData;
+    r->bitPos += e.length + SignBits(e);
+    for (int i = EscapeCount(e); i > 0; --i) {
+        int prefix = 0;
+        while (ReadBits(r, 1) == 1) {
+            if (++prefix > kMaxEscapePrefix) return kWalkBadCodeword;
         }
+        ReadBits(r, prefix + 4);  // escape_word
     }
     return OutOfDataOr(r, 0);
 }
@@ -296,10 +271,12 @@ int spectral_data(AacBitReader* r, const ChannelStream* cs) {
             if (cb == ZERO_HCB || cb == NOISE_HCB || cb == INTENSITY_HCB || cb == INTENSITY_HCB2) continue;
             // Book 12 is reserved: there is no table to read it with.
             if (cb < 1 || cb > ESC_HCB) return kWalkBadCodebook;
-            const int lines = info.sect_sfb_offset[g][sfb + 1] - info.sect_sfb_offset[g][sfb];
+            const int lines =
+                (info.swb_offset[sfb + 1] - info.swb_offset[sfb]) * info.window_group_length[g];
             const int step = hcb_table[cb].dimension;
+            const HuffEntry* table = HuffTableFor(cb);
             for (int k = 0; k < lines; k += step) {
-                const int result = huffman_spectral_data(r, cb);
+                const int result = huffman_spectral_data(r, table);
                 if (result != 0) return result;
             }
         }
@@ -324,7 +301,7 @@ int individual_channel_stream(AacBitReader* r, int samplingIndex, ChannelStream*
 
 int single_lfe_channel_element(AacBitReader* r, int samplingIndex) {
     ReadBits(r, 4);  // element_instance_tag
-    ChannelStream cs = {};
+    ChannelStream cs;
     const int result = individual_channel_stream(r, samplingIndex, &cs, false);
     return result < 0 ? 0 : result;
 }
@@ -332,8 +309,8 @@ int single_lfe_channel_element(AacBitReader* r, int samplingIndex) {
 int channel_pair_element(AacBitReader* r, int samplingIndex) {
     ReadBits(r, 4);  // element_instance_tag
     const bool common_window = ReadBits(r, 1) != 0;
-    ChannelStream first = {};
-    ChannelStream second = {};
+    ChannelStream first;
+    ChannelStream second;
     if (common_window) {
         const int result = ics_info(r, samplingIndex, &first.info);
         if (result != 0) return result;
@@ -368,7 +345,7 @@ int coupling_channel_element(AacBitReader* r, int samplingIndex) {
     ReadBits(r, 1);  // cc_domain
     ReadBits(r, 1);  // gain_element_sign
     ReadBits(r, 2);  // gain_element_scale
-    ChannelStream cs = {};
+    ChannelStream cs;
     const int result = individual_channel_stream(r, samplingIndex, &cs, false);
     if (result != 0) return result;
 
