@@ -6,17 +6,21 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <chrono>
 #include <cstdlib>
 #include <cstring>
 #include <filesystem>
 #include <random>
 #include <string>
+#include <thread>
 #include <tuple>
 #include <vector>
 
 #include "aac/aac_bits.h"
 #include "aac/aac_clip.h"
 #include "aac/aac_frame.h"
+#include "aac/aac_huffman.h"
+#include "aac/aac_tables.h"
 #include "aac/aac_walker.h"
 #include "core/file_access.h"
 #include "metainfo/aac.h"
@@ -317,6 +321,35 @@ TEST(AacClip, ChecksClipAndCodecOfEachFileShape) {
     EXPECT_EQ(type, MEDIA_TYPE_AAC);
 }
 
+// Clip information and codec share one walk of the frames; a file rewritten
+// between the queries is walked anew, whether it had settled before (its times
+// change) or was written moments ago (a rewrite may keep its times).
+TEST(AacClip, AFileRewrittenBetweenQueriesIsWalkedAnew) {
+    const Data lc = Frames(60, 200);
+    const Data sbr = Frames(60, 200, 4, 2, 1, 13);
+    ASSERT_EQ(lc.size(), sbr.size());
+    TempDir dir;
+    dir.Write("settled.aac", lc);
+    // Files this much older than their first read are trusted by their times.
+    std::this_thread::sleep_for(std::chrono::milliseconds(2200));
+    for (const char* name : {"settled.aac", "fresh.aac"}) {
+        const std::string path = dir.PathOf(name);
+        if (std::string(name) == "fresh.aac") dir.Write(name, lc);
+        _MMClipInfo clip{};
+        ASSERT_EQ(AAC_GetClipInfo(path.c_str(), &clip), MM_OK) << name;
+        EXPECT_EQ(clip.nSampleRate, 44100u) << name;
+        dir.Write(name, sbr);
+        _MM_CODECTYPE codec{};
+        ASSERT_EQ(AAC_GetCodecType(path.c_str(), &codec), MM_OK) << name;
+        EXPECT_EQ(codec.nAudioCodec, static_cast<uint32_t>(CODEC_AAC_PLUS_V1_ADTS)) << name;
+        ASSERT_EQ(AAC_GetClipInfo(path.c_str(), &clip), MM_OK) << name;
+        EXPECT_EQ(clip.nSampleRate, 88200u) << name;
+        dir.Write(name, lc);
+        ASSERT_EQ(AAC_GetCodecType(path.c_str(), &codec), MM_OK) << name;
+        EXPECT_EQ(codec.nAudioCodec, static_cast<uint32_t>(CODEC_AAC_ADTS)) << name;
+    }
+}
+
 TEST(AacClip, TruncatedAdifHeadersAnswerWithoutFault) {
     TempDir dir;
     AdifLayout layout;
@@ -491,6 +524,73 @@ TEST(AacExtractFfmpeg, CutsDecode) {
         const double seconds = static_cast<double>(ReadFileBytes(pcm).size()) / 2 / 8000;
         EXPECT_GT(seconds, 2.5) << cut;
         EXPECT_LT(seconds, 3.5) << cut;
+    }
+}
+
+namespace {
+
+struct Codeword {
+    std::vector<int> bits;
+    int index;
+};
+
+// Every codeword of a tree, by walking it.
+void CodewordsOf(const HuffNode* tree, int node, std::vector<int>* prefix, std::vector<Codeword>* out) {
+    if (tree[node].zero & kHuffLeaf) {
+        out->push_back({*prefix, tree[node].zero & (kHuffLeaf - 1)});
+        return;
+    }
+    for (int bit : {0, 1}) {
+        prefix->push_back(bit);
+        CodewordsOf(tree, bit ? tree[node].one : tree[node].zero, prefix, out);
+        prefix->pop_back();
+    }
+}
+
+// The bits packed most significant first, starting `offset` bits into the first byte.
+Data Pack(const std::vector<int>& bits, int offset) {
+    Data out(static_cast<size_t>(offset + static_cast<int>(bits.size()) + 7) / 8, 0);
+    for (size_t i = 0; i < bits.size(); ++i) {
+        const size_t at = static_cast<size_t>(offset) + i;
+        if (bits[i]) out[at / 8] = static_cast<uint8_t>(out[at / 8] | 0x80 >> (at % 8));
+    }
+    return out;
+}
+
+}  // namespace
+
+// The lookup tables against the trees they come from: every codeword of every
+// book, followed by other bits or ending the data exactly, decodes to its index
+// and length; one bit fewer exhausts the reader.
+TEST(AacHuffman, EveryCodewordOfEveryBookDecodesAsItsTree) {
+    std::mt19937 rng(7);
+    for (int book = 0; book <= 11; ++book) {
+        const HuffNode* tree = book == 0 ? hcb_sf : hcb_table[book].tree;
+        std::vector<Codeword> codewords;
+        std::vector<int> prefix;
+        CodewordsOf(tree, 0, &prefix, &codewords);
+        ASSERT_EQ(codewords.size(), book == 0 ? 121u : (hcb_table[book].nodes + 1u) / 2) << book;
+        for (const Codeword& c : codewords) {
+            const int length = static_cast<int>(c.bits.size());
+            std::vector<int> followed = c.bits;
+            for (int i = 0; i < 40; ++i) followed.push_back(static_cast<int>(rng() & 1));
+            const int offset = static_cast<int>(rng() % 8);
+            const Data data = Pack(followed, offset);
+            AacBitReader r = MakeAacBitReader(data.data(), static_cast<int>(data.size()), 0, 8 - offset);
+            EXPECT_EQ(DecodeCodeword(&r, HuffTableFor(book)), c.index) << book << " " << c.index;
+            EXPECT_EQ(r.bitPos, offset + length) << book << " " << c.index;
+
+            // The codeword as the last bits of the data, then without its last bit.
+            for (const int kept : {length, length - 1}) {
+                const std::vector<int> bits(c.bits.begin(), c.bits.begin() + kept);
+                const int start = (8 - kept % 8) % 8;
+                const Data tail = Pack(bits, start);
+                r = MakeAacBitReader(tail.data(), static_cast<int>(tail.size()), 0, 8 - start);
+                const int expected = kept == length ? c.index : -1;
+                EXPECT_EQ(DecodeCodeword(&r, HuffTableFor(book)), expected) << book << " " << c.index << " " << kept;
+                EXPECT_EQ(r.exhausted, kept < length) << book << " " << c.index;
+            }
+        }
     }
 }
 

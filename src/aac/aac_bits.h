@@ -2,7 +2,8 @@
 #pragma once
 
 #include <cstdint>
-#include <cstring>
+
+#include "core/byte_reader.h"
 
 namespace metainfo {
 
@@ -53,9 +54,7 @@ inline uint64_t BitWindow(const AacBitReader* r) {
     const int64_t at = r->bitPos >> 3;
     uint64_t word = 0;
     if (at + 8 <= r->size) {
-        uint8_t b[8];
-        std::memcpy(b, r->buf + at, sizeof b);
-        for (uint8_t byte : b) word = word << 8 | byte;
+        word = ReadBE64(r->buf + at);
     } else {
         for (int64_t i = at; i < at + 8; ++i) word = word << 8 | (i < r->size ? r->buf[i] : 0u);
     }

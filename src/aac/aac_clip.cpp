@@ -10,6 +10,7 @@
 #include "aac/aac_walker.h"
 #include "core/byte_reader.h"
 #include "core/file_access.h"
+#include "core/read_cache.h"
 
 namespace metainfo {
 
@@ -102,6 +103,52 @@ int32_t OpenPastTags(const char* path, _MMClipInfo* clip, int* handle, uint32_t*
     return MM_OK;
 }
 
+// Where a walk's bytes came from: the file, where its data starts, and when
+// they were read. A handle with no identity (protected, not a regular file)
+// has no key and its walks are not kept.
+struct WalkKey {
+    bool valid = false;
+    FileIdentity id;
+    int64_t start = 0;
+    int64_t readNs = 0;
+};
+
+WalkKey KeyOf(int h) {
+    WalkKey key;
+    key.valid = HandleIdentity(h, &key.id);
+    key.start = MEx_ftell(h);
+    key.readNs = NowNs();
+    return key;
+}
+
+// The walk of the file this thread asked about last: clip information and
+// codec both need it, and the second query takes it from here.
+struct WalkMemo {
+    WalkKey key;
+    AacWalk walk;
+};
+
+thread_local WalkMemo t_lastWalk;
+
+// True (and *walk filled) when this thread walked the same bytes of a file
+// that had settled before they were read.
+bool RecallWalk(const WalkKey& key, AacWalk* walk) {
+    const WalkKey& last = t_lastWalk.key;
+    if (!key.valid || !last.valid || !(last.id == key.id) || last.start != key.start ||
+        !LearntAfterSettling(last.id, last.readNs)) {
+        return false;
+    }
+    *walk = t_lastWalk.walk;
+    walk->walk = false;
+    return true;
+}
+
+void RememberWalk(const WalkKey& key, const AacWalk& walk) {
+    if (!key.valid) return;
+    t_lastWalk.key = key;
+    t_lastWalk.walk = walk;
+}
+
 }  // namespace
 
 int AdtsFrame(const uint8_t* frame, int available, uint32_t* walkerState, uint32_t* profile) {
@@ -130,7 +177,7 @@ int AdtsFrame(const uint8_t* frame, int available, uint32_t* walkerState, uint32
 }
 
 int32_t UnpackADTSHeader(const uint8_t* buf, int bytesRead, int offset, _MMClipInfo* clip,
-                         uint32_t skippedTagBytes, uint32_t* walkerState, uint32_t* profile) {
+                         uint32_t skippedTagBytes, AacWalk* walk) {
     const uint8_t* first = buf + offset;
     const uint32_t sampleRate = g_uSamplingFrequencyTable[(first[2] >> 2) & 0x0F];
     clip->nSampleRate = sampleRate;
@@ -138,14 +185,14 @@ int32_t UnpackADTSHeader(const uint8_t* buf, int bytesRead, int offset, _MMClipI
 
     uint32_t firstKind = 0;
     const int32_t firstSize = FrameSizeAt(buf, bytesRead, offset, &firstKind);
-    if (firstSize != MM_E_FAIL) AdtsFrame(first, bytesRead - offset, walkerState, profile);
+    if (firstSize != MM_E_FAIL && walk->walk) AdtsFrame(first, bytesRead - offset, &walk->state, &walk->profile);
     if (firstSize <= 0) return MM_E_UNSUPPORTED;
 
     uint32_t secondKind = 0;
     const int64_t secondOffset = static_cast<int64_t>(offset) + firstSize;
     const int32_t secondSize = FrameSizeAt(buf, bytesRead, secondOffset, &secondKind);
-    if (secondSize != MM_E_FAIL) {
-        AdtsFrame(buf + secondOffset, bytesRead - static_cast<int>(secondOffset), walkerState, profile);
+    if (secondSize != MM_E_FAIL && walk->walk) {
+        AdtsFrame(buf + secondOffset, bytesRead - static_cast<int>(secondOffset), &walk->state, &walk->profile);
     }
     if (secondSize <= 0 || secondKind != firstKind) return MM_E_UNSUPPORTED;
 
@@ -162,8 +209,8 @@ int32_t UnpackADTSHeader(const uint8_t* buf, int bytesRead, int offset, _MMClipI
         uint32_t kind = 0;
         const int32_t size = FrameSizeAt(buf, bytesRead, offset + at, &kind);
         sizes[count] = static_cast<uint32_t>(size);
-        if (at < static_cast<int64_t>(bytesRead) - kWalkMargin && size != MM_E_FAIL) {
-            AdtsFrame(first + at, bytesRead - static_cast<int>(offset + at), walkerState, profile);
+        if (at < static_cast<int64_t>(bytesRead) - kWalkMargin && size != MM_E_FAIL && walk->walk) {
+            AdtsFrame(first + at, bytesRead - static_cast<int>(offset + at), &walk->state, &walk->profile);
         }
         if (size == -1 || size == MM_E_FAIL) break;
         running += size;
@@ -189,7 +236,7 @@ int32_t UnpackADTSHeader(const uint8_t* buf, int bytesRead, int offset, _MMClipI
 }
 
 int32_t UnpackADIFHeader(const uint8_t* buf, int bytesRead, int offset, _MMClipInfo* clip,
-                         uint32_t skippedTagBytes, uint32_t* walkerState, uint32_t* profile) {
+                         uint32_t skippedTagBytes, AacWalk* walk) {
     // The fixed header fields, with bytes beyond the data read taken as zero.
     uint8_t h[kAdifHeaderBytes] = {};
     const int available = bytesRead - offset;
@@ -217,9 +264,9 @@ int32_t UnpackADIFHeader(const uint8_t* buf, int bytesRead, int offset, _MMClipI
     uint32_t objectType = 0;
     for (uint32_t i = 0; i <= num_program_config_elements; ++i) program_config_element(&r, &channels, &objectType);
     clip->nChannels = channels;
-    *profile = objectType;
+    walk->profile = objectType;
     AlignToByte(&r);
-    RawDataStream(&r, walkerState, samplingIndex);
+    if (walk->walk) RawDataStream(&r, &walk->state, samplingIndex);
     return MM_OK;
 }
 
@@ -227,6 +274,7 @@ int32_t ParseClipInfo(int h, _MMClipInfo* clip, uint32_t skippedTagBytes, uint32
     // Zeroed, so no byte of the buffer is ever undefined.
     uint8_t* buf = new (std::nothrow) uint8_t[kReadSize + 1]();
     if (buf == nullptr) return MM_E_FAIL;
+    const WalkKey key = KeyOf(h);
     const int bytesRead = MEx_fread(buf, 1, kReadSize, h);
     int32_t result = MM_E_UNSUPPORTED;
     if (bytesRead < 4) {
@@ -249,13 +297,18 @@ int32_t ParseClipInfo(int h, _MMClipInfo* clip, uint32_t skippedTagBytes, uint32
         if (start >= 0) {
             const uint32_t format = kFormatAac;
             std::memcpy(clip->szFormat, &format, sizeof format);
+            AacWalk walk;
+            walk.state = *codec;
+            walk.profile = *profile;
+            const bool recalled = RecallWalk(key, &walk);
             if (adts) {
-                result = UnpackADTSHeader(buf, bytesRead, start, clip, skippedTagBytes, codec, profile);
-                *codec = AdtsCode(*codec);
+                result = UnpackADTSHeader(buf, bytesRead, start, clip, skippedTagBytes, &walk);
             } else {
-                result = UnpackADIFHeader(buf, bytesRead, start, clip, skippedTagBytes, codec, profile);
-                *codec = AdifCode(*codec);
+                result = UnpackADIFHeader(buf, bytesRead, start, clip, skippedTagBytes, &walk);
             }
+            if (!recalled) RememberWalk(key, walk);
+            *profile = walk.profile;
+            *codec = adts ? AdtsCode(walk.state) : AdifCode(walk.state);
         }
     }
     delete[] buf;

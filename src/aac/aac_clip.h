@@ -24,13 +24,22 @@ int32_t Check_AAC_CodecType(const char* path, void* unused1, const uint8_t* buf,
 // bytes were read) while *walkerState is still 1, and writes its profile.
 int AdtsFrame(const uint8_t* frame, int available, uint32_t* walkerState, uint32_t* profile);
 
+// What the walk of a stream's first raw data blocks found: the walker state
+// (1 before the walk) and the profile. With `walk` false the blocks are not
+// walked again and the values are taken as they are.
+struct AacWalk {
+    uint32_t state = 1;
+    uint32_t profile = 0;
+    bool walk = true;
+};
+
 // Fill the clip info from the first ADTS frame / the ADIF header found at
 // `offset` in buf, of which bytesRead bytes hold file data. clip->nFileSize
 // must be set; skippedTagBytes is what the duration leaves out.
 int32_t UnpackADTSHeader(const uint8_t* buf, int bytesRead, int offset, _MMClipInfo* clip,
-                         uint32_t skippedTagBytes, uint32_t* walkerState, uint32_t* profile);
+                         uint32_t skippedTagBytes, AacWalk* walk);
 int32_t UnpackADIFHeader(const uint8_t* buf, int bytesRead, int offset, _MMClipInfo* clip,
-                         uint32_t skippedTagBytes, uint32_t* walkerState, uint32_t* profile);
+                         uint32_t skippedTagBytes, AacWalk* walk);
 
 // Reads the stream from the handle's position (just after any ID3v2 tag).
 // *codec holds the walker state (1) on entry and the codec code on return.

@@ -237,6 +237,18 @@ int gain_control_data(AacBitReader* r, const ChannelStream* cs) {
     return OutOfDataOr(r, 0);
 }
 
+// The escape sequences of a book-11 codeword's values of 16.
+int Escapes(AacBitReader* r, int count) {
+    for (int i = count; i > 0; --i) {
+        int prefix = 0;
+        while (ReadBits(r, 1) == 1) {
+            if (++prefix > kMaxEscapePrefix) return kWalkBadCodeword;
+        }
+        ReadBits(r, prefix + 4);  // escape_word
+    }
+    return OutOfDataOr(r, 0);
+}
+
 // One codeword of an unsigned-or-signed spectral book with its sign bits and
 // escapes. The codeword and its sign bits are claimed together: data that ends
 // in either ends the element the same way.
@@ -253,14 +265,51 @@ int huffman_spectral_data(AacBitReader* r, const HuffEntry* table) {
     }
     if (!Claim(r, e.length + SignBits(e))) return kWalkOutOfData;
     r->bitPos += e.length + SignBits(e);
-    for (int i = EscapeCount(e); i > 0; --i) {
-        int prefix = 0;
-        while (ReadBits(r, 1) == 1) {
-            if (++prefix > kMaxEscapePrefix) return kWalkBadCodeword;
+    return Escapes(r, EscapeCount(e));
+}
+
+// `codewords` codewords of one band. The bits are taken from a 64-bit word
+// loaded whole from inside the data and refilled when fewer than 32 remain
+// (a spectral codeword with its signs has at most 20), so no codeword needs
+// a check of the data's end; the last bytes go through huffman_spectral_data.
+int SpectralBand(AacBitReader* r, const HuffEntry* table, int codewords) {
+    const int64_t lastLoad = static_cast<int64_t>(r->size) * 8 - 64;
+    int64_t pos = r->bitPos;
+    uint64_t bits = 0;
+    int held = 0;
+    for (int i = 0; i < codewords; ++i) {
+        if (held < 32) {
+            if (pos > lastLoad || r->exhausted) {
+                r->bitPos = pos;
+                for (; i < codewords; ++i) {
+                    const int result = huffman_spectral_data(r, table);
+                    if (result != 0) return result;
+                }
+                return 0;
+            }
+            bits = ReadBE64(r->buf + (pos >> 3)) << (pos & 7);
+            held = 64 - static_cast<int>(pos & 7);
         }
-        ReadBits(r, prefix + 4);  // escape_word
+        HuffEntry e = table[bits >> (64 - kHuffRootBits)];
+        if (e.flags & kHuffEntryLink) e = table[e.value + ((bits << kHuffRootBits) >> (64 - e.length))];
+        if (!(e.flags & kHuffEntryLeaf)) {
+            r->bitPos = pos + e.length;
+            return kWalkBadCodeword;
+        }
+        const int taken = e.length + SignBits(e);
+        pos += taken;
+        bits <<= taken;
+        held -= taken;
+        if (EscapeCount(e) != 0) {
+            r->bitPos = pos;
+            const int result = Escapes(r, EscapeCount(e));
+            if (result != 0) return result;
+            pos = r->bitPos;
+            held = 0;
+        }
     }
-    return OutOfDataOr(r, 0);
+    r->bitPos = pos;
+    return 0;
 }
 
 int spectral_data(AacBitReader* r, const ChannelStream* cs) {
@@ -274,11 +323,8 @@ int spectral_data(AacBitReader* r, const ChannelStream* cs) {
             const int lines =
                 (info.swb_offset[sfb + 1] - info.swb_offset[sfb]) * info.window_group_length[g];
             const int step = hcb_table[cb].dimension;
-            const HuffEntry* table = HuffTableFor(cb);
-            for (int k = 0; k < lines; k += step) {
-                const int result = huffman_spectral_data(r, table);
-                if (result != 0) return result;
-            }
+            const int result = SpectralBand(r, HuffTableFor(cb), (lines + step - 1) / step);
+            if (result != 0) return result;
         }
     }
     return 0;

@@ -326,6 +326,13 @@ int MEx_stat(const char* path, struct stat* st) {
     return ::stat(path, st);
 }
 
+bool HandleIdentity(int h, FileIdentity* id) {
+    const MexHandle* handle = Lookup(h);
+    if (handle == nullptr || handle->drmKind != 0 || handle->fd < 0) return false;
+    *id = handle->id;
+    return true;
+}
+
 bool SeekToOffset(int h, uint64_t pos) {
     return pos <= static_cast<uint64_t>(INT64_MAX) && MEx_fseek(h, static_cast<int64_t>(pos), SEEK_SET) == 0;
 }

@@ -12,6 +12,8 @@
 
 namespace metainfo {
 
+struct FileIdentity;
+
 int MEx_fopen(const char* path, const char* mode);
 // Plain: items read; protected: bytes read; -1 for a bad handle.
 int MEx_fread(void* buf, unsigned size, unsigned count, int h);
@@ -28,6 +30,10 @@ int MEx_stat(const char* path, struct stat* st);
 // the descriptor's current position, and closing the handle leaves the
 // caller's descriptor open.
 int MEx_fdopen(int fd, const char* mode);
+
+// The identity of the file a plain handle reads with positional reads (a
+// regular file opened for reading); false for any other handle.
+bool HandleIdentity(int h, FileIdentity* id);
 
 // Moves to an absolute offset; false when it cannot be a file position or
 // the seek fails.

@@ -51,12 +51,6 @@ struct ThreadCache {
 
 thread_local ThreadCache t_cache;
 
-int64_t NowNs() {
-    struct timespec ts {};
-    ::clock_gettime(CLOCK_REALTIME, &ts);
-    return static_cast<int64_t>(ts.tv_sec) * 1000000000 + ts.tv_nsec;
-}
-
 void Restart(CachedFile& f) {
     f.Clear();
     f.end = UINT64_MAX;
@@ -129,6 +123,14 @@ bool Fill(CachedFile& f, int fd, uint64_t pos, size_t missing, uint64_t gapEnd) 
 
 }  // namespace
 
+int64_t NowNs() {
+    struct timespec ts {};
+    ::clock_gettime(CLOCK_REALTIME, &ts);
+    return static_cast<int64_t>(ts.tv_sec) * 1000000000 + ts.tv_nsec;
+}
+
+bool LearntAfterSettling(const FileIdentity& id, int64_t learntNs) { return learntNs - id.changedNs >= kSettledNs; }
+
 FileIdentity FileIdentity::Of(const struct stat& st) {
     FileIdentity id;
     id.device = static_cast<uint64_t>(st.st_dev);
@@ -141,7 +143,7 @@ FileIdentity FileIdentity::Of(const struct stat& st) {
 
 void OpenCachedFile(const FileIdentity& id) {
     CachedFile& f = FileFor(id);
-    if (f.startedNs - id.changedNs < kSettledNs) Restart(f);
+    if (!LearntAfterSettling(id, f.startedNs)) Restart(f);
 }
 
 size_t CachedRead(int fd, const FileIdentity& id, uint64_t pos, void* dst, size_t n) {

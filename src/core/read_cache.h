@@ -29,6 +29,13 @@ struct FileIdentity {
     }
 };
 
+// The real-time clock, which file times are kept in, in nanoseconds.
+int64_t NowNs();
+
+// True when what was learnt from the file at learntNs may serve a later
+// handle of the same identity: the file had settled before it was read.
+bool LearntAfterSettling(const FileIdentity& id, int64_t learntNs);
+
 // Called when a handle opens the file: what is held of it serves the new
 // handle only when the file had settled before it was read (see kSettledNs).
 void OpenCachedFile(const FileIdentity& id);
