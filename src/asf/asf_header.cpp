@@ -165,13 +165,12 @@ int32_t RunDeferred(int h, uint16_t mode, void* out, uint32_t allowance, uint32_
 
 int32_t ASF_GetMediaInfo(const char* path, uint16_t mode, void* out, int32_t flag) {
     uint32_t videoStream = kNoVideoStream;
-    uint64_t fileSize = 0;
-    s_asfFileSize = MEx_fsize(path, &fileSize) ? SaturateU32(fileSize) : 0;
-    if (!PrepareOutput(mode, out)) return kWalkFailed;
-
-    int h = MEx_fopen(path, "rb");
-    if (h == 0) return kWalkFailed;
+    const bool prepared = PrepareOutput(mode, out);
+    const int h = prepared ? MEx_fopen(path, "rb") : 0;
     FileCloser closer(h);
+    uint64_t fileSize = 0;
+    s_asfFileSize = OpenedFileSize(h, path, &fileSize) ? SaturateU32(fileSize) : 0;
+    if (h == 0) return kWalkFailed;
 
     uint8_t head[24];  // GUID and the size, which nothing uses
     if (!ReadExact(h, head, sizeof head) || !SameGuid(head, ASF_Header_Object)) return kWalkFailed;

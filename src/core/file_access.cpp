@@ -344,6 +344,15 @@ bool MEx_fsize(const char* path, uint64_t* size) {
     return true;
 }
 
+bool OpenedFileSize(int h, const char* path, uint64_t* size) {
+    FileIdentity id;
+    if (h != 0 && HandleIdentity(h, &id) && id.size >= 0) {
+        *size = static_cast<uint64_t>(id.size);
+        return true;
+    }
+    return MEx_fsize(path, size);
+}
+
 uint32_t GetUINT32(int h, bool bLittle) {
     uint8_t b[4] = {0, 0, 0, 0};
     MEx_fread(b, 1, 4, h);

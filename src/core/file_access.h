@@ -43,6 +43,10 @@ bool SeekToOffset(int h, uint64_t pos);
 // path cannot be looked at.
 bool MEx_fsize(const char* path, uint64_t* size);
 
+// The same for the file open as h from path: a plain handle knows its size
+// from when it was opened, any other handle (or none, 0) asks the path.
+bool OpenedFileSize(int h, const char* path, uint64_t* size);
+
 // A size or position kept in a 32-bit record field: 4 GiB and more reads as
 // 0xFFFFFFFF, the same on every target.
 inline uint32_t SaturateU32(uint64_t v) { return v > 0xFFFFFFFFu ? 0xFFFFFFFFu : static_cast<uint32_t>(v); }

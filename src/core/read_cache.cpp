@@ -110,6 +110,10 @@ bool Fill(CachedFile& f, int fd, uint64_t pos, size_t missing, uint64_t gapEnd) 
     f.chunk = pos == f.missEnd ? (f.chunk < kMaxChunk ? f.chunk * 2 : kMaxChunk) : kMinChunk;
     size_t want = missing > f.chunk ? missing : f.chunk;
     if (want > gapEnd - pos) want = static_cast<size_t>(gapEnd - pos);
+    // Reading ahead stops at the end the file had when it was opened, so a
+    // read near the end takes one call instead of a second that returns 0.
+    const uint64_t size = f.id.size > 0 ? static_cast<uint64_t>(f.id.size) : 0;
+    if (want > missing && pos + want > size) want = pos + missing >= size ? missing : static_cast<size_t>(size - pos);
     if (f.bytes + want > kCapacity) f.Clear();
     std::vector<uint8_t> data(want);
     const size_t got = ReadAt(fd, data.data(), want, pos);

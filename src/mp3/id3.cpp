@@ -251,7 +251,7 @@ int32_t ParseFrames(int h, ID3_MetaInfo* ctx) {
 
 int32_t GetMetaInfoOnHandle(int h, const char* path, _MMMetaInfo* meta, int pictureLimit) {
     ID3_MetaInfo ctx;
-    ID3_InitMetaData(path, meta, &ctx, pictureLimit);
+    ID3_InitMetaData(path, meta, &ctx, pictureLimit, h);
     if (MEx_fseek(h, 0, SEEK_SET) == 0 && ParseID3V2(h, &ctx) == MM_OK) return MM_OK;
     return ParseID3V1(h, meta) == MM_OK ? MM_OK : 1;
 }
@@ -398,10 +398,10 @@ int32_t ParseID3V1(int h, _MMMetaInfo* meta) {
     return MM_OK;
 }
 
-int32_t ID3_InitMetaData(const char* path, _MMMetaInfo* meta, ID3_MetaInfo* ctx, int pictureLimit) {
+int32_t ID3_InitMetaData(const char* path, _MMMetaInfo* meta, ID3_MetaInfo* ctx, int pictureLimit, int h) {
     if (meta == nullptr || ctx == nullptr) return MM_E_INVALIDARG;
     uint64_t size = 0;
-    const uint32_t fileSize = path != nullptr && MEx_fsize(path, &size) ? SaturateU32(size) : 0;
+    const uint32_t fileSize = path != nullptr && OpenedFileSize(h, path, &size) ? SaturateU32(size) : 0;
     ctx->meta = meta;
     ctx->sizeBound = fileSize;
     ctx->remaining = 0;

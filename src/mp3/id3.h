@@ -37,7 +37,8 @@ int32_t ParseID3V1(int h, _MMMetaInfo* meta);
 
 // Sets up a context as ID3_GetMetaInfo does and clears the items' lengths and
 // encodings, the picture fields, rating, play count and album artist.
-int32_t ID3_InitMetaData(const char* path, _MMMetaInfo* meta, ID3_MetaInfo* ctx, int pictureLimit);
+// h, when not 0, is the file open from path (its size is then known without a stat).
+int32_t ID3_InitMetaData(const char* path, _MMMetaInfo* meta, ID3_MetaInfo* ctx, int pictureLimit, int h = 0);
 
 // Steps of ParseID3V2, visible for tests.
 constexpr int32_t kID3ShortHeader = static_cast<int32_t>(0x80070005u);

@@ -240,7 +240,7 @@ int32_t GetMediaInfo_MP3(const char* path, void* out, int request) {
     FileCloser closer(h);
 
     uint64_t size = 0;
-    const uint32_t fileSize = MEx_fsize(path, &size) ? SaturateU32(size) : 0;
+    const uint32_t fileSize = OpenedFileSize(h, path, &size) ? SaturateU32(size) : 0;
     uint8_t probe[128];
     const int probed = MEx_fread(probe, 1, sizeof probe, h);
     if (probed < static_cast<int>(kMinProbe)) return MM_E_FAIL;

@@ -290,9 +290,9 @@ int32_t MP4_GetMediaInfo(const char* path, int mode, void* out) {
     const int h = MEx_fopen(path, "rb");
     if (h == 0) return kMp4NotOpened;
     FileCloser closer(h);
-    struct stat st;
-    if (MEx_stat(path, &st) != 0 || st.st_size < 0) return MM_E_FAIL;
-    return OpenedWalk(h, static_cast<uint64_t>(st.st_size), mode, out);
+    uint64_t size = 0;
+    if (!OpenedFileSize(h, path, &size)) return MM_E_FAIL;
+    return OpenedWalk(h, size, mode, out);
 }
 
 int32_t MP4_GetMediaInfoFd(int fd, int mode, void* out) {

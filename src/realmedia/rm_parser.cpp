@@ -144,7 +144,7 @@ int32_t RM_GetMediaInfo(const char* path, uint16_t request, void* out) {
     if (h == 0) return kRmNotRealMedia;
     FileCloser closer(h);
     uint64_t fileSize = 0;
-    if (!MEx_fsize(path, &fileSize)) return kRmNotRealMedia;
+    if (!OpenedFileSize(h, path, &fileSize)) return kRmNotRealMedia;
 
     unsigned char tag[4];
     if (!ReadTag(h, tag) || std::memcmp(tag, ".RMF", 4) != 0) return kRmNotRealMedia;
