@@ -22,7 +22,10 @@ std::vector<std::unique_ptr<Peer>> MakePeers(const std::vector<std::string>& wan
     all.push_back(bench::MakeAvformatPeer(false));
     all.push_back(bench::MakeAvformatPeer(true));
     all.push_back(bench::MakeMediainfoPeer());
-    all.push_back(bench::MakeMutagenPeer(worker, python));
+    // The mutagen peer starts a worker process: only when it is asked for.
+    if (wanted.empty() || std::find(wanted.begin(), wanted.end(), "mutagen") != wanted.end()) {
+        all.push_back(bench::MakeMutagenPeer(worker, python));
+    }
     std::vector<std::unique_ptr<Peer>> peers;
     for (auto& peer : all) {
         if (peer == nullptr) continue;
