@@ -5,10 +5,12 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <chrono>
 #include <cstdio>
 #include <cstring>
 #include <map>
 #include <string>
+#include <thread>
 #include <utility>
 #include <vector>
 
@@ -140,7 +142,8 @@ TEST(PlainFile, ReadsItemsSeeksAndTellsLikeStdio) {
 
 // Reads that hit, straddle and miss what earlier reads brought in, from two
 // handles on one file, small and large, up to and past the end; then the file
-// is rewritten in place with the same size, and a new handle reads the new bytes.
+// is rewritten in place with the same size, then replaced under its name, and
+// each time a new handle reads the new bytes.
 TEST(PlainFile, EveryReadAnswersTheFileBytesAndARewriteIsSeen) {
     struct Step {
         int handle;
@@ -155,33 +158,54 @@ TEST(PlainFile, EveryReadAnswersTheFileBytesAndARewriteIsSeen) {
         {1, 0, 307200},
     };
     constexpr size_t kSize = 307200;
-    TempDir dir;
-    std::vector<uint8_t> bytes(kSize);
-    for (size_t i = 0; i < kSize; ++i) bytes[i] = static_cast<uint8_t>(i * 7 + i / 251);
-    std::string path = dir.Write("a.bin", bytes);
-    int h[2] = {MEx_fopen(path.c_str(), "rb"), MEx_fopen(path.c_str(), "rb")};
-    ASSERT_NE(h[0], 0);
-    ASSERT_NE(h[1], 0);
-    for (const Step& s : kSteps) {
-        SCOPED_TRACE(testing::Message() << "read " << s.n << " at " << s.pos);
-        std::vector<uint8_t> got(s.n, 0xEE);
-        ASSERT_EQ(MEx_fseek(h[s.handle], s.pos, SEEK_SET), 0);
-        const size_t want = s.pos >= static_cast<int64_t>(kSize) ? 0 : std::min(s.n, kSize - static_cast<size_t>(s.pos));
-        EXPECT_EQ(MEx_fread(got.data(), 1, static_cast<unsigned>(s.n), h[s.handle]), static_cast<int>(want));
-        EXPECT_TRUE(std::equal(got.begin(), got.begin() + static_cast<std::ptrdiff_t>(want), bytes.begin() + static_cast<std::ptrdiff_t>(s.pos)));
-        EXPECT_EQ(MEx_feof(h[s.handle]), want < s.n ? 1 : 0);
-        EXPECT_EQ(MEx_ftell(h[s.handle]), s.pos + static_cast<int64_t>(want));
+    // A file older than two seconds whose bytes a thread holds is opened only
+    // when a read needs bytes not held; a fresh one at once.
+    for (const bool settled : {false, true}) {
+        SCOPED_TRACE(settled ? "settled" : "fresh");
+        TempDir dir;
+        std::vector<uint8_t> bytes(kSize);
+        for (size_t i = 0; i < kSize; ++i) bytes[i] = static_cast<uint8_t>(i * 7 + i / 251);
+        std::string path = dir.Write("a.bin", bytes);
+        if (settled) {
+            std::this_thread::sleep_for(std::chrono::milliseconds(2200));
+            const int first = MEx_fopen(path.c_str(), "rb");
+            std::vector<uint8_t> head(5000);
+            ASSERT_EQ(MEx_fread(head.data(), 1, 5000, first), 5000);
+            MEx_fclose(first);
+        }
+        int h[2] = {MEx_fopen(path.c_str(), "rb"), MEx_fopen(path.c_str(), "rb")};
+        ASSERT_NE(h[0], 0);
+        ASSERT_NE(h[1], 0);
+        ASSERT_EQ(MEx_fseek(h[1], 0, SEEK_END), 0);
+        EXPECT_EQ(MEx_ftell(h[1]), static_cast<int64_t>(kSize));
+        for (const Step& s : kSteps) {
+            SCOPED_TRACE(testing::Message() << "read " << s.n << " at " << s.pos);
+            std::vector<uint8_t> got(s.n, 0xEE);
+            ASSERT_EQ(MEx_fseek(h[s.handle], s.pos, SEEK_SET), 0);
+            const size_t want = s.pos >= static_cast<int64_t>(kSize) ? 0 : std::min(s.n, kSize - static_cast<size_t>(s.pos));
+            EXPECT_EQ(MEx_fread(got.data(), 1, static_cast<unsigned>(s.n), h[s.handle]), static_cast<int>(want));
+            EXPECT_TRUE(std::equal(got.begin(), got.begin() + static_cast<std::ptrdiff_t>(want), bytes.begin() + static_cast<std::ptrdiff_t>(s.pos)));
+            EXPECT_EQ(MEx_feof(h[s.handle]), want < s.n ? 1 : 0);
+            EXPECT_EQ(MEx_ftell(h[s.handle]), s.pos + static_cast<int64_t>(want));
+        }
+        MEx_fclose(h[0]);
+        MEx_fclose(h[1]);
+        // At once, so that the file's times are likely still those of the first write.
+        for (uint8_t& b : bytes) b ^= 0xFF;
+        dir.Write("a.bin", bytes);
+        int again = MEx_fopen(path.c_str(), "rb");
+        std::vector<uint8_t> got(kSize);
+        EXPECT_EQ(MEx_fread(got.data(), 1, kSize, again), static_cast<int>(kSize));
+        EXPECT_EQ(got, bytes);
+        MEx_fclose(again);
+        // Replaced under the same name by another file of the same size.
+        for (uint8_t& b : bytes) b = static_cast<uint8_t>(b + 1);
+        ASSERT_EQ(std::rename(dir.Write("b.bin", bytes).c_str(), path.c_str()), 0);
+        again = MEx_fopen(path.c_str(), "rb");
+        EXPECT_EQ(MEx_fread(got.data(), 1, kSize, again), static_cast<int>(kSize));
+        EXPECT_EQ(got, bytes);
+        MEx_fclose(again);
     }
-    MEx_fclose(h[0]);
-    MEx_fclose(h[1]);
-    // At once, so that the file's times are likely still those of the first write.
-    for (uint8_t& b : bytes) b ^= 0xFF;
-    dir.Write("a.bin", bytes);
-    int again = MEx_fopen(path.c_str(), "rb");
-    std::vector<uint8_t> got(kSize);
-    EXPECT_EQ(MEx_fread(got.data(), 1, kSize, again), static_cast<int>(kSize));
-    EXPECT_EQ(got, bytes);
-    MEx_fclose(again);
 }
 
 TEST(PlainFile, PathsOfFourCharactersOrFewerNeverOpen) {

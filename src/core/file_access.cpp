@@ -5,6 +5,7 @@
 
 #include <atomic>
 #include <cstdio>
+#include <cstdlib>
 #include <cstring>
 #include <new>
 
@@ -22,11 +23,15 @@ namespace metainfo {
 namespace {
 
 // A plain file is read with positional reads through this thread's cache
-// (fd set), or, when it is no regular file or is written, through stdio.
+// (positional set), or, when it is no regular file or is written, through
+// stdio. A positional handle over a file whose bytes the cache holds opens
+// the file (path kept) only when a read needs bytes the cache lacks.
 struct MexHandle {
     int drmKind = -1;
     FILE* stream = nullptr;
+    bool positional = false;
     int fd = -1;
+    char* path = nullptr;
     FileIdentity id;
     bool eof = false;
     bool hasClient = false;
@@ -149,6 +154,7 @@ bool ReadOnly(const char* mode) { return mode[0] == 'r' && std::strchr(mode, '+'
 bool TakeRegularFile(MexHandle* handle, int fd, int64_t position) {
     struct stat st;
     if (::fstat(fd, &st) != 0 || !S_ISREG(st.st_mode)) return false;
+    handle->positional = true;
     handle->fd = fd;
     handle->id = FileIdentity::Of(st);
     handle->position = position < 0 ? 0 : position;
@@ -156,11 +162,54 @@ bool TakeRegularFile(MexHandle* handle, int fd, int64_t position) {
     return true;
 }
 
+// A handle that opens nothing yet: the path names a settled file this thread
+// holds bytes of, as a stat (cheaper than an open) confirms.
+bool TakeHeldFile(MexHandle* handle, const char* path) {
+    if (!HoldsFileNamed(path)) return false;
+    struct stat st;
+    if (::stat(path, &st) != 0 || !S_ISREG(st.st_mode)) return false;
+    const FileIdentity id = FileIdentity::Of(st);
+    if (!HoldsSettled(path, id)) return false;
+    handle->path = ::strdup(path);
+    if (handle->path == nullptr) return false;
+    handle->positional = true;
+    handle->id = id;
+    OpenCachedFile(id);
+    return true;
+}
+
+// Opens the file of a handle made by TakeHeldFile. Should the path now name a
+// changed file, the handle goes on with that file's bytes, as a handle whose
+// file is rewritten while open would.
+bool OpenHeldFile(MexHandle* handle) {
+    if (handle->fd >= 0) return true;
+    if (handle->path == nullptr) return false;
+    const int fd = ::open(handle->path, O_RDONLY | O_CLOEXEC);
+    if (fd < 0) return false;
+    struct stat st;
+    if (::fstat(fd, &st) != 0 || !S_ISREG(st.st_mode)) {
+        ::close(fd);
+        return false;
+    }
+    handle->fd = fd;
+    const FileIdentity id = FileIdentity::Of(st);
+    if (!(id == handle->id)) {
+        handle->id = id;
+        OpenCachedFile(id);
+    }
+    NameCachedFile(id, handle->path);
+    return true;
+}
+
 bool OpenPlain(MexHandle* handle, const char* path, const char* mode) {
     if (ReadOnly(mode)) {
+        if (TakeHeldFile(handle, path)) return true;
         const int fd = ::open(path, O_RDONLY | O_CLOEXEC);
         if (fd < 0) return false;
-        if (TakeRegularFile(handle, fd, 0)) return true;
+        if (TakeRegularFile(handle, fd, 0)) {
+            NameCachedFile(handle->id, path);
+            return true;
+        }
         ::close(fd);
     }
     handle->stream = std::fopen(path, mode);
@@ -176,14 +225,21 @@ bool OpenPlain(MexHandle* handle, const char* path, const char* mode) {
 void ClosePlain(MexHandle* handle) {
     if (handle->fd >= 0) ::close(handle->fd);
     if (handle->stream != nullptr) (void)std::fclose(handle->stream);
+    std::free(handle->path);
     handle->fd = -1;
     handle->stream = nullptr;
+    handle->path = nullptr;
+    handle->positional = false;
 }
 
 int ReadPositional(MexHandle* handle, void* buf, unsigned size, unsigned count) {
     const size_t want = static_cast<size_t>(size) * count;
     if (want == 0) return 0;
-    const size_t got = CachedRead(handle->fd, handle->id, static_cast<uint64_t>(handle->position), buf, want);
+    const uint64_t at = static_cast<uint64_t>(handle->position);
+    size_t got = CachedRead(handle->fd, handle->id, at, buf, want);
+    if (got < want && handle->fd < 0 && OpenHeldFile(handle)) {
+        got += CachedRead(handle->fd, handle->id, at + got, static_cast<uint8_t*>(buf) + got, want - got);
+    }
     handle->position += static_cast<int64_t>(got);
     if (got < want) handle->eof = true;
     return static_cast<int>(got / size);
@@ -258,7 +314,7 @@ int MEx_fread(void* buf, unsigned size, unsigned count, int h) {
     MexHandle* handle = Lookup(h);
     if (handle == nullptr) return -1;
     if (buf == nullptr) return 0;
-    if (handle->fd >= 0) return ReadPositional(handle, buf, size, count);
+    if (handle->positional) return ReadPositional(handle, buf, size, count);
     if (handle->drmKind == 0) return static_cast<int>(std::fread(buf, size, count, handle->stream));
     return ReadProtected(handle, buf, size, count);
 }
@@ -266,14 +322,14 @@ int MEx_fread(void* buf, unsigned size, unsigned count, int h) {
 int MEx_fwrite(const void* buf, unsigned size, unsigned count, int h) {
     MexHandle* handle = Lookup(h);
     if (handle == nullptr || handle->drmKind != 0) return -1;
-    if (buf == nullptr || handle->fd >= 0) return 0;
+    if (buf == nullptr || handle->positional) return 0;
     return static_cast<int>(std::fwrite(buf, size, count, handle->stream));
 }
 
 int MEx_fseek(int h, int64_t offset, int whence) {
     MexHandle* handle = Lookup(h);
     if (handle == nullptr) return -1;
-    if (handle->fd >= 0) return SeekPositional(handle, offset, whence);
+    if (handle->positional) return SeekPositional(handle, offset, whence);
     if (handle->drmKind == 0) return ::fseeko(handle->stream, static_cast<off_t>(offset), whence);
     return SeekProtected(handle, offset, whence);
 }
@@ -281,7 +337,7 @@ int MEx_fseek(int h, int64_t offset, int whence) {
 int64_t MEx_ftell(int h) {
     MexHandle* handle = Lookup(h);
     if (handle == nullptr) return -1;
-    if (handle->fd >= 0) return handle->position;
+    if (handle->positional) return handle->position;
     if (handle->drmKind == 0) return static_cast<int64_t>(::ftello(handle->stream));
     return handle->position;
 }
@@ -289,7 +345,7 @@ int64_t MEx_ftell(int h) {
 int MEx_feof(int h) {
     MexHandle* handle = Lookup(h);
     if (handle == nullptr) return -1;
-    if (handle->fd >= 0) return handle->eof ? 1 : 0;
+    if (handle->positional) return handle->eof ? 1 : 0;
     if (handle->drmKind == 0) return std::feof(handle->stream);
     return handle->position >= handle->size ? 1 : 0;
 }
@@ -299,8 +355,9 @@ int MEx_fclose(int h) {
     if (handle == nullptr) return 0;
     Unregister(h);
     int result = 0;
-    if (handle->fd >= 0) {
-        result = ::close(handle->fd);
+    if (handle->positional) {
+        if (handle->fd >= 0) result = ::close(handle->fd);
+        std::free(handle->path);
     } else if (handle->drmKind == 0) {
         result = std::fclose(handle->stream);
     } else {
@@ -328,7 +385,7 @@ int MEx_stat(const char* path, struct stat* st) {
 
 bool HandleIdentity(int h, FileIdentity* id) {
     const MexHandle* handle = Lookup(h);
-    if (handle == nullptr || handle->drmKind != 0 || handle->fd < 0) return false;
+    if (handle == nullptr || handle->drmKind != 0 || !handle->positional) return false;
     *id = handle->id;
     return true;
 }

@@ -7,6 +7,7 @@
 #include <cstring>
 #include <iterator>
 #include <map>
+#include <string>
 #include <vector>
 
 namespace metainfo {
@@ -35,6 +36,7 @@ struct CachedFile {
     size_t chunk = kMinChunk;
     uint64_t end = UINT64_MAX;   // where a read came up short: nothing past it
     int64_t startedNs = 0;       // when the bytes held were first read
+    std::string path;            // what the file was last opened by
 
     void Clear() {
         extents.clear();
@@ -53,6 +55,7 @@ thread_local ThreadCache t_cache;
 
 void Restart(CachedFile& f) {
     f.Clear();
+    f.path.clear();
     f.end = UINT64_MAX;
     f.startedNs = NowNs();
 }
@@ -167,7 +170,7 @@ size_t CachedRead(int fd, const FileIdentity& id, uint64_t pos, void* dst, size_
                 continue;
             }
         }
-        if (at >= f.end) break;
+        if (at >= f.end || fd < 0) break;
         const uint64_t gapEnd = next != f.extents.end() ? next->first : UINT64_MAX;
         const size_t missing = gapEnd - at < n - done ? static_cast<size_t>(gapEnd - at) : n - done;
         if (missing >= kMaxChunk) {
@@ -182,6 +185,28 @@ size_t CachedRead(int fd, const FileIdentity& id, uint64_t pos, void* dst, size_
         if (!Fill(f, fd, at, missing, gapEnd)) break;
     }
     return done;
+}
+
+void NameCachedFile(const FileIdentity& id, const char* path) {
+    for (CachedFile& f : t_cache.files) {
+        if (f.used && f.id == id) f.path = path;
+    }
+}
+
+bool HoldsFileNamed(const char* path) {
+    for (const CachedFile& f : t_cache.files) {
+        if (f.used && f.path == path) return true;
+    }
+    return false;
+}
+
+bool HoldsSettled(const char* path, const FileIdentity& id) {
+    for (const CachedFile& f : t_cache.files) {
+        if (f.used && f.id == id && f.path == path && !f.extents.empty() && LearntAfterSettling(id, f.startedNs)) {
+            return true;
+        }
+    }
+    return false;
 }
 
 void ForgetCachedFile(uint64_t device, uint64_t inode) {

@@ -40,10 +40,20 @@ bool LearntAfterSettling(const FileIdentity& id, int64_t learntNs);
 // handle only when the file had settled before it was read (see kSettledNs).
 void OpenCachedFile(const FileIdentity& id);
 
+// Records the path a file was opened by, so that a later open of the same
+// path can be answered from what is held (see HoldsSettled).
+void NameCachedFile(const FileIdentity& id, const char* path);
+// True when this thread holds bytes of a file opened by this path.
+bool HoldsFileNamed(const char* path);
+// True when this thread holds bytes of the file id, opened by this path, and
+// they were read after the file had settled: a handle may then be served
+// from them without opening the file until it needs more.
+bool HoldsSettled(const char* path, const FileIdentity& id);
+
 // Copies up to n bytes at pos of the open file fd (known as id) into dst,
-// from this thread's cache where it holds them and from the file where not.
-// Answers the bytes copied: fewer than n only at the end of the file or on a
-// read error.
+// from this thread's cache where it holds them and from the file where not
+// (fd -1: what is held only). Answers the bytes copied: fewer than n only at
+// the end of the file, on a read error or, without fd, at bytes not held.
 size_t CachedRead(int fd, const FileIdentity& id, uint64_t pos, void* dst, size_t n);
 
 // Drops what this thread holds of a file that is about to be written.

@@ -109,6 +109,10 @@ int32_t VerifyMP3(int h, const uint8_t* /*probe*/, _FrameHeader_Info* info) {
     uint32_t secondSignature = 0;
     bool accepted = false;
     for (int i = 0; i <= n - 4; ++i) {
+        // Every candidate starts with 0xFF: jump to the next one.
+        const void* ff = std::memchr(b + i, 0xFF, static_cast<size_t>(n - 3 - i));
+        if (ff == nullptr) break;
+        i = static_cast<int>(static_cast<const uint8_t*>(ff) - b);
         if (!IsMP3SyncCandidate(b + i)) continue;
         _FrameHeader_Info frame;
         std::memset(&frame, 0, sizeof frame);
