@@ -236,8 +236,9 @@ int ReadPositional(MexHandle* handle, void* buf, unsigned size, unsigned count) 
     const size_t want = static_cast<size_t>(size) * count;
     if (want == 0) return 0;
     const uint64_t at = static_cast<uint64_t>(handle->position);
-    size_t got = CachedRead(handle->fd, handle->id, at, buf, want);
-    if (got < want && handle->fd < 0 && OpenHeldFile(handle)) {
+    bool needsFile = false;
+    size_t got = CachedRead(handle->fd, handle->id, at, buf, want, &needsFile);
+    if (needsFile && OpenHeldFile(handle)) {
         got += CachedRead(handle->fd, handle->id, at + got, static_cast<uint8_t*>(buf) + got, want - got);
     }
     handle->position += static_cast<int64_t>(got);

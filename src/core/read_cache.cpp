@@ -18,6 +18,9 @@ namespace {
 // cache does not hold goes straight to the caller's buffer.
 constexpr size_t kMinChunk = 4096;
 constexpr size_t kMaxChunk = size_t{64} * 1024;
+// What the first read of a file brings in from its end besides: tags and
+// indexes often lie there, and a later query then needs no open.
+constexpr size_t kTail = 4096;
 // What one file may hold; past it the file's bytes are dropped and read anew.
 constexpr size_t kCapacity = size_t{1024} * 1024;
 constexpr int kFiles = 2;
@@ -37,6 +40,7 @@ struct CachedFile {
     uint64_t end = UINT64_MAX;   // where a read came up short: nothing past it
     int64_t startedNs = 0;       // when the bytes held were first read
     std::string path;            // what the file was last opened by
+    bool tailRead = false;       // the end was read with the first read
 
     void Clear() {
         extents.clear();
@@ -56,6 +60,7 @@ thread_local ThreadCache t_cache;
 void Restart(CachedFile& f) {
     f.Clear();
     f.path.clear();
+    f.tailRead = false;
     f.end = UINT64_MAX;
     f.startedNs = NowNs();
 }
@@ -128,6 +133,28 @@ bool Fill(CachedFile& f, int fd, uint64_t pos, size_t missing, uint64_t gapEnd) 
     return true;
 }
 
+// Reads the last kTail bytes of the file, or what of them is not held.
+void ReadTail(CachedFile& f, int fd) {
+    f.tailRead = true;
+    const uint64_t size = f.id.size > 0 ? static_cast<uint64_t>(f.id.size) : 0;
+    uint64_t start = size > kTail ? size - kTail : 0;
+    auto next = f.extents.lower_bound(start);
+    if (next != f.extents.begin()) {
+        const auto held = std::prev(next);
+        const uint64_t heldEnd = held->first + held->second.size();
+        if (heldEnd > start) start = heldEnd;
+    }
+    next = f.extents.lower_bound(start);
+    const uint64_t end = next != f.extents.end() && next->first < size ? next->first : size;
+    if (start >= end || f.end <= start || f.bytes + (end - start) > kCapacity) return;
+    std::vector<uint8_t> data(static_cast<size_t>(end - start));
+    const size_t got = ReadAt(fd, data.data(), data.size(), start);
+    if (got < data.size()) f.end = start + got;
+    if (got == 0) return;
+    data.resize(got);
+    Insert(f, start, std::move(data));
+}
+
 }  // namespace
 
 int64_t NowNs() {
@@ -153,8 +180,9 @@ void OpenCachedFile(const FileIdentity& id) {
     if (!LearntAfterSettling(id, f.startedNs)) Restart(f);
 }
 
-size_t CachedRead(int fd, const FileIdentity& id, uint64_t pos, void* dst, size_t n) {
+size_t CachedRead(int fd, const FileIdentity& id, uint64_t pos, void* dst, size_t n, bool* needsFile) {
     CachedFile& f = FileFor(id);
+    if (needsFile != nullptr) *needsFile = false;
     auto* out = static_cast<uint8_t*>(dst);
     size_t done = 0;
     while (done < n) {
@@ -170,7 +198,11 @@ size_t CachedRead(int fd, const FileIdentity& id, uint64_t pos, void* dst, size_
                 continue;
             }
         }
-        if (at >= f.end || fd < 0) break;
+        if (at >= f.end) break;
+        if (fd < 0) {
+            if (needsFile != nullptr) *needsFile = true;
+            break;
+        }
         const uint64_t gapEnd = next != f.extents.end() ? next->first : UINT64_MAX;
         const size_t missing = gapEnd - at < n - done ? static_cast<size_t>(gapEnd - at) : n - done;
         if (missing >= kMaxChunk) {
@@ -183,6 +215,7 @@ size_t CachedRead(int fd, const FileIdentity& id, uint64_t pos, void* dst, size_
             continue;
         }
         if (!Fill(f, fd, at, missing, gapEnd)) break;
+        if (!f.tailRead) ReadTail(f, fd);
     }
     return done;
 }

@@ -52,9 +52,10 @@ bool HoldsSettled(const char* path, const FileIdentity& id);
 
 // Copies up to n bytes at pos of the open file fd (known as id) into dst,
 // from this thread's cache where it holds them and from the file where not
-// (fd -1: what is held only). Answers the bytes copied: fewer than n only at
-// the end of the file, on a read error or, without fd, at bytes not held.
-size_t CachedRead(int fd, const FileIdentity& id, uint64_t pos, void* dst, size_t n);
+// (fd -1: what is held only, and *needsFile set where bytes that are not held
+// were needed). Answers the bytes copied: fewer than n only at the end of the
+// file, on a read error or, without fd, at bytes not held.
+size_t CachedRead(int fd, const FileIdentity& id, uint64_t pos, void* dst, size_t n, bool* needsFile = nullptr);
 
 // Drops what this thread holds of a file that is about to be written.
 void ForgetCachedFile(uint64_t device, uint64_t inode);
