@@ -82,12 +82,15 @@ CachedFile& FileFor(const FileIdentity& id) {
     return *oldest;
 }
 
-// pread until n bytes, the end of the file or an error.
-size_t ReadAt(int fd, uint8_t* dst, size_t n, uint64_t pos) {
+// pread until n bytes, the end of the file or an error. A short read that
+// reached `size` (the size the file had when opened) is taken as the end
+// without another call to confirm it.
+size_t ReadAt(int fd, uint8_t* dst, size_t n, uint64_t pos, uint64_t size) {
     size_t done = 0;
     while (done < n) {
         const uint64_t at = pos + done;
         if (at > static_cast<uint64_t>(INT64_MAX)) break;
+        if (done > 0 && size > 0 && at >= size) break;
         const ssize_t got = ::pread(fd, dst + done, n - done, static_cast<off_t>(at));
         if (got < 0 && errno == EINTR) continue;
         if (got <= 0) break;
@@ -95,6 +98,8 @@ size_t ReadAt(int fd, uint8_t* dst, size_t n, uint64_t pos) {
     }
     return done;
 }
+
+uint64_t SizeOf(const CachedFile& f) { return f.id.size > 0 ? static_cast<uint64_t>(f.id.size) : 0; }
 
 // Adds bytes read at pos, joining the extents they touch.
 void Insert(CachedFile& f, uint64_t pos, std::vector<uint8_t> data) {
@@ -120,11 +125,11 @@ bool Fill(CachedFile& f, int fd, uint64_t pos, size_t missing, uint64_t gapEnd) 
     if (want > gapEnd - pos) want = static_cast<size_t>(gapEnd - pos);
     // Reading ahead stops at the end the file had when it was opened, so a
     // read near the end takes one call instead of a second that returns 0.
-    const uint64_t size = f.id.size > 0 ? static_cast<uint64_t>(f.id.size) : 0;
+    const uint64_t size = SizeOf(f);
     if (want > missing && pos + want > size) want = pos + missing >= size ? missing : static_cast<size_t>(size - pos);
     if (f.bytes + want > kCapacity) f.Clear();
     std::vector<uint8_t> data(want);
-    const size_t got = ReadAt(fd, data.data(), want, pos);
+    const size_t got = ReadAt(fd, data.data(), want, pos, SizeOf(f));
     if (got < want) f.end = pos + got;
     if (got == 0) return false;
     data.resize(got);
@@ -136,7 +141,7 @@ bool Fill(CachedFile& f, int fd, uint64_t pos, size_t missing, uint64_t gapEnd) 
 // Reads the last kTail bytes of the file, or what of them is not held.
 void ReadTail(CachedFile& f, int fd) {
     f.tailRead = true;
-    const uint64_t size = f.id.size > 0 ? static_cast<uint64_t>(f.id.size) : 0;
+    const uint64_t size = SizeOf(f);
     uint64_t start = size > kTail ? size - kTail : 0;
     auto next = f.extents.lower_bound(start);
     if (next != f.extents.begin()) {
@@ -148,7 +153,7 @@ void ReadTail(CachedFile& f, int fd) {
     const uint64_t end = next != f.extents.end() && next->first < size ? next->first : size;
     if (start >= end || f.end <= start || f.bytes + (end - start) > kCapacity) return;
     std::vector<uint8_t> data(static_cast<size_t>(end - start));
-    const size_t got = ReadAt(fd, data.data(), data.size(), start);
+    const size_t got = ReadAt(fd, data.data(), data.size(), start, size);
     if (got < data.size()) f.end = start + got;
     if (got == 0) return;
     data.resize(got);
@@ -206,7 +211,7 @@ size_t CachedRead(int fd, const FileIdentity& id, uint64_t pos, void* dst, size_
         const uint64_t gapEnd = next != f.extents.end() ? next->first : UINT64_MAX;
         const size_t missing = gapEnd - at < n - done ? static_cast<size_t>(gapEnd - at) : n - done;
         if (missing >= kMaxChunk) {
-            const size_t got = ReadAt(fd, out + done, missing, at);
+            const size_t got = ReadAt(fd, out + done, missing, at, SizeOf(f));
             done += got;
             if (got < missing) {
                 f.end = at + got;
