@@ -1,9 +1,11 @@
 /* libmetainfo: the exported C interface.
  *
  * Ask for the media type of a path, then pass that type back to the queries.
- * Every query opens, parses and closes the file anew; nothing is kept between
- * calls. Buffers handed out by the library belong to the caller and are
- * released with MM_MediaExtractor_FreeBuffer (pictures: FreeMetaInfo). */
+ * Every query parses the file anew. A thread keeps the bytes it read of its
+ * last two files, known by device, inode, size and times, so the queries of
+ * one probe read each byte once; a changed file is read anew. Buffers handed
+ * out by the library belong to the caller and are released with
+ * MM_MediaExtractor_FreeBuffer (pictures: FreeMetaInfo). */
 #ifndef METAINFO_METAINFO_H
 #define METAINFO_METAINFO_H
 
@@ -11,6 +13,7 @@
 #include <stdint.h>
 
 #include "records.h"
+#include "version.h"
 
 #ifdef __cplusplus
 extern "C" {
