@@ -39,7 +39,6 @@ TEST(DecodeItemText, InvalidInputBecomesReplacementCharacters) {
     EXPECT_EQ(probe::DecodeItemText(overlong).size(), 128u) << "never past the payload";
 }
 
-TEST(JsonString, EscapesQuotesBackslashesAndControls) {
-    EXPECT_EQ(probe::JsonString("a\"b\\c\n\x01"), "\"a\\\"b\\\\c\\n\\u0001\"");
+TEST(ResultText, IsTheCodeInHexadecimal) {
     EXPECT_EQ(probe::ResultText(static_cast<int32_t>(0x80004005u)), "0x80004005");
 }

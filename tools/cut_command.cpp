@@ -1,11 +1,11 @@
 #include "cut_command.h"
 
 #include <cstdio>
-#include <cstdlib>
 
 #include "metainfo/aac.h"
 #include "metainfo/extract.h"
 #include "metainfo/metainfo.h"
+#include "file_problem.h"
 #include "probe_format.h"
 
 namespace probe {
@@ -34,29 +34,30 @@ MM_AudioToFileFn CutterFor(int type) {
 
 }  // namespace
 
-int CutCommand(int argc, char** argv) {
-    if (argc != 4) {
-        std::fprintf(stderr, "usage: metainfo cut FILE START END OUT\n");
-        return 2;
+int CutCommand(const std::string& file, int startSec, int endSec, const std::string& out) {
+    const char* path = file.c_str();
+    const std::string problem = FileProblem(file);
+    if (!problem.empty()) {
+        std::fprintf(stderr, "metainfo: %s: %s\n", path, problem.c_str());
+        return 1;
     }
-    const char* path = argv[0];
     int type = MEDIA_TYPE_UNKNOWN;
     int32_t result = MM_MediaExtractor_DetectMediaType(path, &type);
     if (result != MM_OK) {
-        std::fprintf(stderr, "%s: not probed (%s)\n", path, ResultText(result).c_str());
+        std::fprintf(stderr, "metainfo: %s: not a media file (%s)\n", path, ResultText(result).c_str());
         return 1;
     }
     MM_AudioToFileFn cut = CutterFor(type);
     if (cut == nullptr) {
-        std::fprintf(stderr, "%s: %s audio cannot be cut\n", path, MediaTypeName(type));
+        std::fprintf(stderr, "metainfo: %s: %s audio cannot be cut\n", path, MediaTypeName(type));
         return 1;
     }
-    result = cut(path, std::atoi(argv[1]), std::atoi(argv[2]), argv[3]);
+    result = cut(path, startSec, endSec, out.c_str());
     if (result != MM_OK) {
-        std::fprintf(stderr, "%s: cut failed (%s)\n", path, ResultText(result).c_str());
+        std::fprintf(stderr, "metainfo: %s: cut failed (%s)\n", path, ResultText(result).c_str());
         return 1;
     }
-    std::printf("%s: seconds %s..%s written to %s\n", path, argv[1], argv[2], argv[3]);
+    std::printf("%s: seconds %d..%d written to %s\n", path, startSec, endSec, out.c_str());
     return 0;
 }
 

@@ -1,5 +1,3 @@
-// metainfo frames FILE [--stream N] [--seek MS]
-//
 // Reads an AVI file's index through the exported parser object, lists the
 // entries of one stream, then delivers that stream's frames (from the seek
 // point when one is given) with their time, size and key-frame flag.
@@ -15,20 +13,6 @@
 
 namespace probe {
 namespace {
-
-int FramesUsage() {
-    std::fprintf(stderr, "usage: metainfo frames FILE [--stream N] [--seek MS]\n");
-    return 2;
-}
-
-bool ParseNumber(const char* text, unsigned long* out) {
-    if (text == nullptr || *text == '\0') return false;
-    char* end = nullptr;
-    unsigned long v = std::strtoul(text, &end, 10);
-    if (*end != '\0') return false;
-    *out = v;
-    return true;
-}
 
 std::string FourccText(uint32_t v) {
     std::string s;
@@ -102,25 +86,8 @@ int ReadFrames(CAVIParser* parser, uint32_t stream) {
 
 }  // namespace
 
-int FramesCommand(int argc, char** argv) {
-    const char* path = nullptr;
-    unsigned long stream = 0;
-    unsigned long seekMs = 0;
-    bool seek = false;
-    for (int i = 0; i < argc; ++i) {
-        if (std::strcmp(argv[i], "--stream") == 0 && i + 1 < argc) {
-            if (!ParseNumber(argv[++i], &stream)) return FramesUsage();
-        } else if (std::strcmp(argv[i], "--seek") == 0 && i + 1 < argc) {
-            if (!ParseNumber(argv[++i], &seekMs)) return FramesUsage();
-            seek = true;
-        } else if (path == nullptr && argv[i][0] != '-') {
-            path = argv[i];
-        } else {
-            return FramesUsage();
-        }
-    }
-    if (path == nullptr || stream > 0xFFFF || seekMs > 0xFFFFFFFFul) return FramesUsage();
-
+int FramesCommand(const std::string& file, uint32_t stream, bool seek, uint32_t seekMs) {
+    const char* path = file.c_str();
     CAVIParser* parser = nullptr;
     if (CreateAVIParserObject(&parser) != MM_OK) return 1;
     std::printf("%s\n", path);
@@ -128,22 +95,23 @@ int FramesCommand(int argc, char** argv) {
     int32_t r = parser->init(path, nullptr);
     if (r != MM_OK) {
         std::printf("  init failed (0x%08X)\n", static_cast<unsigned>(r));
+        std::fprintf(stderr, "metainfo: %s: not a readable AVI file (0x%08X)\n", path, static_cast<unsigned>(r));
         status = 1;
     } else {
         PrintStreams(parser);
         if (!ReadIndex(parser)) {
             status = 1;
         } else {
-            uint32_t s = static_cast<uint32_t>(stream);
+            const uint32_t s = stream;
             PrintEntries(parser, s);
             if (seek) {
                 uint32_t actual = 0;
-                r = parser->setMediaTime(s, static_cast<uint32_t>(seekMs), &actual);
+                r = parser->setMediaTime(s, seekMs, &actual);
                 if (r != MM_OK) {
-                    std::printf("  seek to %lu ms failed (0x%08X)\n", seekMs, static_cast<unsigned>(r));
+                    std::printf("  seek to %u ms failed (0x%08X)\n", seekMs, static_cast<unsigned>(r));
                     status = 1;
                 } else {
-                    std::printf("  seek to %lu ms: at %u ms\n", seekMs, actual);
+                    std::printf("  seek to %u ms: at %u ms\n", seekMs, actual);
                 }
             }
             if (status == 0) status = ReadFrames(parser, s);

@@ -32,32 +32,21 @@ void PrintBuffer(const char* label, const unsigned char* data, uint32_t size, bo
     std::printf("\n");
 }
 
-int Usage() {
-    std::fprintf(stderr, "usage: metainfo maker FILE [--thumbnail OUT]\n");
-    return 2;
-}
-
 }  // namespace
 
-int MakerCommand(int argc, char** argv) {
-    const char* file = nullptr;
-    const char* thumbnailOut = nullptr;
-    for (int i = 0; i < argc; ++i) {
-        if (std::strcmp(argv[i], "--thumbnail") == 0 && i + 1 < argc) {
-            thumbnailOut = argv[++i];
-        } else if (file == nullptr) {
-            file = argv[i];
-        } else {
-            return Usage();
-        }
-    }
-    if (file == nullptr) return Usage();
-
+int MakerCommand(const std::string& path, const std::string& thumbnail) {
+    const char* file = path.c_str();
+    const char* thumbnailOut = thumbnail.empty() ? nullptr : thumbnail.c_str();
     _MAKERINFO maker;
     std::memset(&maker, 0, sizeof maker);
     const int32_t result = MM_MediaExtractor_GetMakerInfo(file, &maker);
     std::printf("%s\n  maker: %s\n", file, result == MM_OK ? "ok" : ResultText(result).c_str());
+    if (result != MM_OK) std::fprintf(stderr, "metainfo: %s: no maker box (%s)\n", file, ResultText(result).c_str());
     int status = result == MM_OK ? 0 : 1;
+    if (result == MM_OK && maker.nValid == 0) {
+        std::fprintf(stderr, "metainfo: %s: no maker box\n", file);
+        status = 1;
+    }
     if (result == MM_OK) {
         std::printf("  %-12s %u\n", "valid", maker.nValid);
         if (maker.nValid != 0) {

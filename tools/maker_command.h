@@ -1,9 +1,11 @@
+// metainfo maker FILE [--thumbnail OUT]: the maker box of an MP4 file.
 #pragma once
+
+#include <string>
 
 namespace probe {
 
-// metainfo maker FILE [--thumbnail OUT]: prints the maker record of an MP4
-// file and writes its thumbnail to OUT.
-int MakerCommand(int argc, char** argv);
+// thumbnail, when not empty, is where the thumbnail is written. 0 or 1.
+int MakerCommand(const std::string& path, const std::string& thumbnail);
 
 }  // namespace probe

@@ -1,4 +1,4 @@
-// Presentation helpers of the metainfo tool: names, texts and JSON.
+// Presentation helpers of the metainfo tool: names and texts.
 #pragma once
 
 #include <cstdint>
@@ -20,8 +20,5 @@ std::string DecodeItemText(const _MMMetaItem& item);
 
 // A result code as the library writes it: "0x80004005".
 std::string ResultText(int32_t result);
-
-// s as a JSON string literal, quotes included.
-std::string JsonString(const std::string& s);
 
 }  // namespace probe

@@ -26,7 +26,7 @@ run(${CMAKE_COMMAND} --install ${BUILD} --prefix ${prefix})
 string(REGEX MATCH "^[0-9]+" major ${VERSION})
 foreach(f ${LIBDIR}/libmetainfo.so.${VERSION} ${LIBDIR}/libmetainfo.so.${major} ${LIBDIR}/libmetainfo.so
           ${LIBDIR}/libmetainfo.a include/metainfo/metainfo.h include/metainfo/version.h bin/metainfo
-          ${LIBDIR}/pkgconfig/metainfo.pc ${LIBDIR}/cmake/metainfo/metainfoConfig.cmake)
+          ${LIBDIR}/pkgconfig/metainfo.pc ${LIBDIR}/cmake/metainfo/metainfoConfig.cmake share/man/man1/metainfo.1)
   if(NOT EXISTS ${prefix}/${f})
     message(FATAL_ERROR "not installed: ${f}")
   endif()

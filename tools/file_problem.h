@@ -1,0 +1,14 @@
+// Why a path cannot be probed before any query is made: what a user is told
+// instead of a bare result code.
+#pragma once
+
+#include <string>
+
+namespace probe {
+
+// "no such file", "is a directory", "permission denied", "empty",
+// "not a regular file", or another system reason; empty when the path names
+// a readable regular file with bytes in it.
+std::string FileProblem(const std::string& path);
+
+}  // namespace probe

@@ -1,0 +1,163 @@
+#include "probe_command.h"
+
+#include <sys/stat.h>
+
+#include <cstdio>
+#include <cstring>
+
+#include "codec_names.h"
+#include "file_problem.h"
+#include "probe_format.h"
+#include "probe_json.h"
+
+namespace probe {
+namespace {
+
+std::string TakeString(char* s, uint32_t length) {
+    std::string out = s != nullptr ? std::string(s, strnlen(s, length)) : std::string();
+    MM_MediaExtractor_FreeBuffer(s);
+    return out;
+}
+
+std::string TakeBuffer(unsigned char* data, uint32_t size) {
+    std::string out = data != nullptr ? std::string(reinterpret_cast<const char*>(data), size) : std::string();
+    MM_MediaExtractor_FreeBuffer(data);
+    return out;
+}
+
+void ProbeMaker(const std::string& path, Report* r) {
+    _MAKERINFO maker;
+    std::memset(&maker, 0, sizeof maker);
+    r->makerResult = MM_MediaExtractor_GetMakerInfo(path.c_str(), &maker);
+    if (r->makerResult == MM_OK && maker.nValid == 0) r->makerResult = MM_E_FAIL;
+    r->phoneModel = TakeBuffer(maker.pPhoneModel, maker.nPhoneModelSize);
+    r->smartAlbum = TakeBuffer(maker.pSmartAlbum, maker.nSmartAlbumSize);
+    r->thumbnailSize = maker.pThumbnail != nullptr ? maker.nThumbnailSize : 0;
+    MM_MediaExtractor_FreeBuffer(maker.pThumbnail);
+}
+
+std::string Status(int32_t result) { return result == MM_OK ? "ok" : ResultText(result); }
+
+std::string CodecText(uint32_t code) {
+    const char* name = CodecCodeName(code);
+    return std::string(name != nullptr ? name : "?") + " (" + ResultText(static_cast<int32_t>(code)) + ")";
+}
+
+void PrintCodecField(const char* label, uint32_t code) {
+    if (code != 0) std::printf("    %-14s %s\n", label, CodecText(code).c_str());
+}
+
+void PrintClip(const _MMClipInfo& c) {
+    std::printf("    format %s, size %u, duration %u ms, bit rate %u\n", c.szFormat, c.nFileSize, c.nDuration,
+                c.nBitrate);
+    if (c.bHasAudio) {
+        std::printf("    audio x%u: %u Hz, %u ch, %u bits, %u samples/frame, %u bit/s\n", c.bHasAudio, c.nSampleRate,
+                    c.nChannels, c.nBitsPerSample, c.nSamplesPerFrame, c.nAudioBitrate);
+    }
+    if (c.bHasVideo) {
+        std::printf("    video x%u: %ux%u, %u fps, %u bit/s\n", c.bHasVideo, c.nWidth, c.nHeight, c.nFrameRate,
+                    c.nVideoBitrate);
+    }
+    if (c.nReserved1 != 0) std::printf("    creation time %u\n", c.nReserved1);
+}
+
+void PrintMeta(const _MMMetaInfo& meta) {
+    for (int k = 0; k < MM_META_ITEMS; ++k) {
+        if (meta.aItems[k].nLength == 0) continue;
+        std::printf("    %-12s %s\n", MetaItemName(k), DecodeItemText(meta.aItems[k]).c_str());
+    }
+    if (meta.stAlbumArtist.nLength != 0) {
+        std::printf("    %-12s %s\n", "album_artist", DecodeItemText(meta.stAlbumArtist).c_str());
+    }
+    if (meta.nRating != 0) std::printf("    %-12s %u\n", "rating", meta.nRating);
+    if (meta.nPlayCount != 0) std::printf("    %-12s %u\n", "play_count", meta.nPlayCount);
+    if (meta.pPicture != nullptr) std::printf("    %-12s %u bytes\n", "picture", meta.nPictureSize);
+}
+
+void PrintCsvRow(const std::vector<std::string>& row) {
+    std::string line;
+    for (size_t i = 0; i < row.size(); ++i) line += (i == 0 ? "" : ",") + CsvField(row[i]);
+    std::printf("%s\r\n", line.c_str());
+}
+
+}  // namespace
+
+Report::~Report() { MM_MediaExtractor_FreeMetaInfo(&meta); }
+
+void Probe(const std::string& path, Report* r) {
+    r->path = path;
+    r->problem = FileProblem(path);
+    if (!r->problem.empty()) return;
+    uint64_t size = 0;
+    struct stat st;
+    if (::stat(path.c_str(), &st) == 0) size = static_cast<uint64_t>(st.st_size);
+    r->size = size;
+    const char* p = path.c_str();
+    r->detectResult = MM_MediaExtractor_DetectMediaType(p, &r->type);
+    if (r->detectResult != MM_OK) {
+        r->problem = "not a media file (" + ResultText(r->detectResult) + ")";
+        return;
+    }
+    r->checkResult = MM_MediaExtractor_CheckMediaType(p);
+    r->trackResult = MM_MediaExtractor_GetTrackType(p, r->type, &r->mask);
+    r->codecResult = MM_MediaExtractor_GetCodecType(p, r->type, &r->codec);
+    _MM_MIMETYPE mime{};
+    r->mimeResult = MM_MediaExtractor_GetMIMEType(p, &mime);
+    r->mime = TakeString(mime.pszMimeType, mime.nMimeLength);
+    r->videoMime = TakeString(mime.pszVideoMimeType, mime.nVideoMimeLength);
+    r->clipResult = MM_MediaExtractor_GetClipInfo(p, r->type, &r->clip);
+    r->metaResult = MM_MediaExtractor_GetMetaInfo(p, r->type, &r->meta);
+    if (r->type == MEDIA_TYPE_MP4) ProbeMaker(path, r);
+}
+
+void PrintText(const Report& r) {
+    std::printf("%s\n", r.path.c_str());
+    std::printf("  media type: %d (%s)\n", r.type, MediaTypeName(r.type));
+    std::printf("  extension check: %s\n", Status(r.checkResult).c_str());
+    std::printf("  track type: %s", Status(r.trackResult).c_str());
+    if (r.trackResult == MM_OK) {
+        std::printf(" [%s%s]", (r.mask & TRACK_AUDIO) ? "audio" : "",
+                    (r.mask & TRACK_VIDEO) ? ((r.mask & TRACK_AUDIO) ? " video" : "video") : "");
+    }
+    std::printf("\n  codec: %s\n", Status(r.codecResult).c_str());
+    if (r.codecResult == MM_OK) {
+        PrintCodecField("audio codec", r.codec.nAudioCodec);
+        PrintCodecField("audio profile", r.codec.nAudioProfile);
+        PrintCodecField("audio subtype", r.codec.nAudioSubType);
+        PrintCodecField("video codec", r.codec.nVideoCodec);
+        PrintCodecField("video profile", r.codec.nVideoProfile);
+        PrintCodecField("video level", r.codec.nVideoLevel);
+    }
+    std::printf("  mime: %s", Status(r.mimeResult).c_str());
+    if (!r.mime.empty()) std::printf(" %s", r.mime.c_str());
+    if (!r.videoMime.empty()) std::printf(" (video %s)", r.videoMime.c_str());
+    std::printf("\n  clip: %s\n", Status(r.clipResult).c_str());
+    if (r.clipResult == MM_OK) PrintClip(r.clip);
+    std::printf("  metadata: %s\n", Status(r.metaResult).c_str());
+    if (r.metaResult == MM_OK) PrintMeta(r.meta);
+}
+
+ProbePrinter::ProbePrinter(Output output) : output_(output) {
+    if (output_ == Output::kCsv) PrintCsvRow(CsvColumns());
+}
+
+bool ProbePrinter::Print(const std::string& path) {
+    Report r;
+    Probe(path, &r);
+    if (!r.problem.empty()) std::fprintf(stderr, "metainfo: %s: %s\n", path.c_str(), r.problem.c_str());
+    switch (output_) {
+        case Output::kJson:
+            std::printf("%s\n", ReportJson(r).dump(-1, ' ', false, Json::error_handler_t::replace).c_str());
+            break;
+        case Output::kCsv:
+            PrintCsvRow(CsvRow(ReportJson(r)));
+            break;
+        case Output::kText:
+            if (r.problem.empty()) PrintText(r);
+            break;
+    }
+    std::fflush(stdout);
+    return r.problem.empty();
+}
+
+}  // namespace probe
