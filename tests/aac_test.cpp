@@ -369,7 +369,7 @@ TEST(AacClip, TruncatedAdifHeadersAnswerWithoutFault) {
 // AAC readers without a fault or a leaked handle; known files give their values.
 TEST(AacCorpus, EveryFileIsAnsweredWithoutFaultAndKnownFilesGiveTheirValues) {
     const std::string corpus = CorpusDir();
-    if (corpus.empty()) GTEST_SKIP() << "no corpus of real files at " << testing_support::CorpusDir();
+    if (corpus.empty()) GTEST_SKIP() << testing_support::NoCorpusReason();
     const int before = OpenDescriptors();
     for (const char* sub : {"/mutagen", "/taglib"}) {
         for (const auto& entry : std::filesystem::directory_iterator(corpus + sub)) {

@@ -438,7 +438,7 @@ TEST(AsfMeta, PicturesAndBanners) {
 
 TEST(AsfCorpus, EveryWmaIsAnsweredAndAgreesWithFfprobe) {
     const std::string corpus = CorpusDir();
-    if (corpus.empty()) GTEST_SKIP() << "no corpus of real files at " << testing_support::CorpusDir();
+    if (corpus.empty()) GTEST_SKIP() << testing_support::NoCorpusReason();
     int files = 0;
     for (const char* sub : {"/mutagen/", "/taglib/"}) {
         for (const auto& entry : std::filesystem::directory_iterator(corpus + sub)) {

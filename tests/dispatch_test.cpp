@@ -333,7 +333,7 @@ TEST(CheckMediaType, EveryExtensionGroupAcceptsItsContentAndRejectsOther) {
 
 TEST(Corpus, DetectionAnswersEveryReadableFileAndKnowsTheObviousOnes) {
     const std::string root = testing_support::CorpusDir();
-    if (root.empty()) GTEST_SKIP() << "no corpus of real files at " << testing_support::CorpusDir();
+    if (root.empty()) GTEST_SKIP() << testing_support::NoCorpusReason();
     const std::set<std::string> mp3 = {"/mutagen/silence-44-s.mp3", "/mutagen/silence-44-s-v1.mp3", "/mutagen/xing.mp3",
                                        "/mutagen/vbri.mp3", "/mutagen/lame.mp3", "/mutagen/silence-44-s-mpeg2.mp3",
                                        "/mutagen/silence-44-s-mpeg25.mp3", "/taglib/lame_cbr.mp3", "/taglib/lame_vbr.mp3"};

@@ -664,7 +664,7 @@ TEST(Mp3Extract, CutFilesDecodeForTheRequestedSpan) {
 
 TEST(Mp3Corpus, EveryFileIsAnsweredWithoutFaultAndKnownFilesAsByHand) {
     const std::string corpus = CorpusDir();
-    if (corpus.empty()) GTEST_SKIP() << "no corpus of real files at " << testing_support::CorpusDir();
+    if (corpus.empty()) GTEST_SKIP() << testing_support::NoCorpusReason();
     TempDir dir;
     for (const char* sub : {"/mutagen", "/taglib"}) {
         for (const auto& entry : std::filesystem::directory_iterator(corpus + sub)) {

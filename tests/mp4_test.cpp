@@ -495,7 +495,7 @@ TEST_F(Mp4, MakerBox) {
 
 TEST(Mp4Corpus, EveryMp4FamilyFileIsAnsweredWithoutAFault) {
     const std::string root = CorpusDir();
-    if (root.empty()) GTEST_SKIP() << "no corpus of real files at " << testing_support::CorpusDir();
+    if (root.empty()) GTEST_SKIP() << testing_support::NoCorpusReason();
     size_t files = 0;
     for (const char* sub : {"/taglib", "/mutagen"}) {
         for (const auto& entry : std::filesystem::directory_iterator(root + sub)) {
@@ -518,7 +518,7 @@ TEST(Mp4Corpus, EveryMp4FamilyFileIsAnsweredWithoutAFault) {
 // 3.7 s are 3 whole seconds.
 TEST(Mp4Corpus, TaggedAndUntaggedM4aAsByHand) {
     const std::string root = CorpusDir();
-    if (root.empty()) GTEST_SKIP() << "no corpus of real files at " << testing_support::CorpusDir();
+    if (root.empty()) GTEST_SKIP() << testing_support::NoCorpusReason();
     const struct { const char* name; const char* clip; const char* codec; const char* meta; } cases[] = {
         {"has-tags.m4a", "m4a size=5108 dur=3000 bps=13621 c1=3237234137 audio=1 abps=2914 hz=44100 ch=2 bits=16",
          "a=4008/0/2102 v=0/0/0", "artist=5:Test Artist"},

@@ -512,7 +512,7 @@ TEST_F(WaveExtract, CutFileIsAcceptedByFfprobeWithTheRequestedDuration) {
 
 TEST(WaveCorpus, EveryFileIsAnsweredWithoutAFaultOrALeak) {
     std::string corpus = CorpusDir();
-    if (corpus.empty()) GTEST_SKIP() << "no corpus of real files at " << testing_support::CorpusDir();
+    if (corpus.empty()) GTEST_SKIP() << testing_support::NoCorpusReason();
     TempDir dir;
     int before = OpenDescriptors();
     int files = 0;
@@ -540,7 +540,7 @@ TEST(WaveCorpus, EveryFileIsAnsweredWithoutAFaultOrALeak) {
 
 TEST(WaveCorpus, KnownFilesGiveTheirFormats) {
     std::string corpus = CorpusDir();
-    if (corpus.empty()) GTEST_SKIP() << "no corpus of real files at " << testing_support::CorpusDir();
+    if (corpus.empty()) GTEST_SKIP() << testing_support::NoCorpusReason();
     _MM_CODECTYPE codec{};
     ASSERT_EQ(metainfo::WAVE_GetCodecType((corpus + "/taglib/alaw.wav").c_str(), &codec), MM_OK);
     EXPECT_EQ(codec.nAudioCodec, 0x1032u);

@@ -62,6 +62,14 @@ std::string CorpusDir() {
     return "";
 }
 
+std::string NoCorpusReason() {
+#ifdef METAINFO_CORPUS_DIR
+    return std::string("no corpus of real files at ") + METAINFO_CORPUS_DIR + " (a clone without ../shared/)";
+#else
+    return "no corpus of real files: METAINFO_CORPUS_DIR is not set";
+#endif
+}
+
 bool HaveFfmpeg() { return access("/usr/bin/ffmpeg", X_OK) == 0 && access("/usr/bin/ffprobe", X_OK) == 0; }
 
 int OpenDescriptors() {

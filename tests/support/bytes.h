@@ -63,6 +63,8 @@ std::vector<uint8_t> ReadFileBytes(const std::string& path);
 
 // Folder of real-world media kept beside the project, or "" when absent.
 std::string CorpusDir();
+// Why a test over the corpus skips: where it looked.
+std::string NoCorpusReason();
 
 // True when ffmpeg and ffprobe are installed (tests that use them skip otherwise).
 bool HaveFfmpeg();
