@@ -94,10 +94,11 @@ void Probe(const std::string& path, Report* r) {
     r->size = size;
     const char* p = path.c_str();
     r->detectResult = MM_MediaExtractor_DetectMediaType(p, &r->type);
-    if (r->detectResult != MM_OK) {
-        r->problem = "not a media file (" + ResultText(r->detectResult) + ")";
+    if (r->detectResult != MM_OK || r->type == MEDIA_TYPE_UNKNOWN) {
+        r->problem = "not a media file (" + (r->detectResult != MM_OK ? ResultText(r->detectResult) : "no known type") + ")";
         return;
     }
+    r->probed = true;
     r->checkResult = MM_MediaExtractor_CheckMediaType(p);
     r->trackResult = MM_MediaExtractor_GetTrackType(p, r->type, &r->mask);
     r->codecResult = MM_MediaExtractor_GetCodecType(p, r->type, &r->codec);
@@ -108,6 +109,9 @@ void Probe(const std::string& path, Report* r) {
     r->clipResult = MM_MediaExtractor_GetClipInfo(p, r->type, &r->clip);
     r->metaResult = MM_MediaExtractor_GetMetaInfo(p, r->type, &r->meta);
     if (r->type == MEDIA_TYPE_MP4) ProbeMaker(path, r);
+    // A failure (rather than "unsupported") of the clip information of a file
+    // whose type was recognised means its structure breaks off or is broken.
+    if (r->clipResult == MM_E_FAIL) r->problem = "damaged or truncated (clip information " + ResultText(r->clipResult) + ")";
 }
 
 void PrintText(const Report& r) {
@@ -153,7 +157,7 @@ bool ProbePrinter::Print(const std::string& path) {
             PrintCsvRow(CsvRow(ReportJson(r)));
             break;
         case Output::kText:
-            if (r.problem.empty()) PrintText(r);
+            if (r.probed) PrintText(r);
             break;
     }
     std::fflush(stdout);

@@ -13,7 +13,8 @@ namespace probe {
 // The C interface's answers for one file, as they came.
 struct Report {
     std::string path;
-    std::string problem;  // why the file was not probed; empty when it was
+    std::string problem;  // why the file failed; empty when it did not
+    bool probed = false;  // its type was recognised and every query asked
     uint64_t size = 0;
     int32_t detectResult = MM_E_FAIL;
     int type = MEDIA_TYPE_UNKNOWN;

@@ -240,8 +240,8 @@ Json ReportJson(const Report& r) {
     j["path"] = Utf8(r.path, &exactName);
     // A name that is not UTF-8 is given losslessly too, as hexadecimal bytes.
     j["path_bytes"] = exactName ? Json(nullptr) : Json(Hex(r.path));
-    const bool probed = r.problem.empty();
-    j["size"] = r.problem.empty() || r.size != 0 ? Json(r.size) : Json(nullptr);
+    const bool probed = r.probed;
+    j["size"] = r.size != 0 || r.problem == "empty" ? Json(r.size) : Json(nullptr);
     j["format"] = probed ? NameOrNull(MediaTypeName(r.type)) : nullptr;
     j["mime"] = probed ? TextOrNull(r.mime) : nullptr;
     const bool clip = probed && r.clipResult == MM_OK;

@@ -45,6 +45,7 @@ def files(tmp_path_factory):
     d = tmp_path_factory.mktemp("cli")
     (d / "empty.mp3").write_bytes(b"")
     (d / "text.txt").write_text("not media\n")
+    (d / "cut.wav").write_bytes(b"RIFF" + struct.pack("<I", 1000) + b"WAVEfmt " + struct.pack("<I", 16) + b"\x01\x00")
     (d / "folder").mkdir()
     locked = d / "locked.mp3"
     locked.write_bytes(open(MP3, "rb").read())
@@ -65,6 +66,7 @@ CASES = [
     (["probe", "{dir}/empty.mp3"], 1, "empty.mp3: empty", ""),
     (["probe", "{dir}/text.txt"], 1, r"text.txt: not a media file \(0x80004005\)", ""),
     (["probe", MP3, "{dir}/missing.mp3"], 1, "no such file", "media type: 1"),
+    (["probe", "{dir}/cut.wav"], 1, r"cut.wav: damaged or truncated \(clip information 0x80004005\)", "media type"),
     (["probe"], 2, "required", ""),
     (["probe", "--bogus", MP3], 2, "--bogus", ""),
     (["probe", "--json", "--csv", MP3], 2, "excludes", ""),
