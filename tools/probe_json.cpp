@@ -93,35 +93,44 @@ Json Iso8601(int64_t unixSeconds) {
     return text;
 }
 
+// Whether the file has a stream of a kind: the clip information counts it, or
+// the codec query names its codec.
+bool HasStream(const Report& r, uint32_t count, uint32_t codec) {
+    return (r.clipResult == MM_OK && count != 0) || (r.codecResult == MM_OK && codec != 0);
+}
+
+// A number of the clip information; null when that query failed or it is 0.
+Json ClipNumber(const Report& r, uint32_t v) { return r.clipResult == MM_OK ? CountOrNull(v) : Json(nullptr); }
+
+// A name taken from the codec query's answer; null when that query failed.
+Json CodecName(const Report& r, const char* name) { return r.codecResult == MM_OK ? NameOrNull(name) : Json(nullptr); }
+
 Json AudioJson(const Report& r) {
     const _MMClipInfo& c = r.clip;
-    const bool codecKnown = r.codecResult == MM_OK;
-    if (!(r.clipResult == MM_OK && c.bHasAudio) && !(codecKnown && r.codec.nAudioCodec != 0)) return nullptr;
-    Json a;
+    if (!HasStream(r, c.bHasAudio, r.codec.nAudioCodec)) return nullptr;
     const uint32_t bits = r.clipResult == MM_OK ? c.nBitsPerSample : 0;
-    a["codec"] = codecKnown ? NameOrNull(FfprobeCodecName(r.codec.nAudioCodec, bits)) : nullptr;
-    a["profile"] = codecKnown ? NameOrNull(FfprobeAudioProfile(r.codec.nAudioCodec, r.codec.nAudioSubType)) : nullptr;
-    const bool clip = r.clipResult == MM_OK;
-    a["sample_rate"] = clip ? CountOrNull(c.nSampleRate) : nullptr;
-    a["channels"] = clip && c.nChannels != 0xFFFFFFFFu ? CountOrNull(c.nChannels) : nullptr;
-    a["bits_per_sample"] = clip ? CountOrNull(c.nBitsPerSample) : nullptr;
-    a["bit_rate"] = clip ? CountOrNull(c.nAudioBitrate) : nullptr;
+    Json a;
+    a["codec"] = CodecName(r, FfprobeCodecName(r.codec.nAudioCodec, bits));
+    a["profile"] = CodecName(r, FfprobeAudioProfile(r.codec.nAudioCodec, r.codec.nAudioSubType));
+    a["sample_rate"] = ClipNumber(r, c.nSampleRate);
+    // A channel configuration of 0 reads as 0xFFFFFFFF: unknown.
+    a["channels"] = ClipNumber(r, c.nChannels != 0xFFFFFFFFu ? c.nChannels : 0);
+    a["bits_per_sample"] = ClipNumber(r, c.nBitsPerSample);
+    a["bit_rate"] = ClipNumber(r, c.nAudioBitrate);
     return a;
 }
 
 Json VideoJson(const Report& r) {
     const _MMClipInfo& c = r.clip;
-    const bool codecKnown = r.codecResult == MM_OK;
-    if (!(r.clipResult == MM_OK && c.bHasVideo) && !(codecKnown && r.codec.nVideoCodec != 0)) return nullptr;
+    if (!HasStream(r, c.bHasVideo, r.codec.nVideoCodec)) return nullptr;
     Json v;
-    v["codec"] = codecKnown ? NameOrNull(FfprobeCodecName(r.codec.nVideoCodec, 0)) : nullptr;
-    v["profile"] = codecKnown ? NameOrNull(VideoProfileName(r.codec.nVideoProfile)) : nullptr;
+    v["codec"] = CodecName(r, FfprobeCodecName(r.codec.nVideoCodec, 0));
+    v["profile"] = CodecName(r, VideoProfileName(r.codec.nVideoProfile));
     v["level"] = nullptr;
-    const bool clip = r.clipResult == MM_OK;
-    v["width"] = clip ? CountOrNull(c.nWidth) : nullptr;
-    v["height"] = clip ? CountOrNull(c.nHeight) : nullptr;
-    v["frame_rate"] = clip ? CountOrNull(c.nFrameRate) : nullptr;
-    v["bit_rate"] = clip ? CountOrNull(c.nVideoBitrate) : nullptr;
+    v["width"] = ClipNumber(r, c.nWidth);
+    v["height"] = ClipNumber(r, c.nHeight);
+    v["frame_rate"] = ClipNumber(r, c.nFrameRate);
+    v["bit_rate"] = ClipNumber(r, c.nVideoBitrate);
     return v;
 }
 
