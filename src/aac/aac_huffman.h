@@ -33,17 +33,16 @@ constexpr int kHuffRootBits = 9;
 // on first use, from the codebook trees.
 const HuffEntry* HuffTableFor(int book);
 
-// The entry of the codeword at the reader's position, without consuming
-// it: a leaf or `invalid`, with the length the tree walk would read.
-inline HuffEntry LookUpCodeword(const AacBitReader* r, const HuffEntry* table) {
-    const uint64_t window = BitWindow(r);
-    HuffEntry e = table[window >> (64 - kHuffRootBits)];
-    if (e.flags & kHuffEntryLink) {
-        const uint64_t rest = window << kHuffRootBits;
-        e = table[e.value + (rest >> (64 - e.length))];
-    }
-    return e;
+// The entry of the codeword that starts a 64-bit window: a leaf or
+// `invalid`, with the length the tree walk would read.
+inline HuffEntry EntryOf(uint64_t window, const HuffEntry* table) {
+    const HuffEntry e = table[window >> (64 - kHuffRootBits)];
+    if (!(e.flags & kHuffEntryLink)) return e;
+    return table[e.value + ((window << kHuffRootBits) >> (64 - e.length))];
 }
+
+// The entry of the codeword at the reader's position, without consuming it.
+inline HuffEntry LookUpCodeword(const AacBitReader* r, const HuffEntry* table) { return EntryOf(BitWindow(r), table); }
 
 // Index of the next codeword, or -1: a bit pattern that is no codeword (its
 // bits consumed) or data that ends inside the codeword (reader exhausted).

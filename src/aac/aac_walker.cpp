@@ -148,6 +148,11 @@ int scale_factor_data(AacBitReader* r, ChannelStream* cs) {
     int scale_factor = cs->global_gain;
     bool noise_pcm_flag = true;
     const HuffEntry* table = HuffTableFor(0);
+    // While a whole 64-bit load lies inside the data, codewords (19 bits at
+    // most) come from a word refilled below 32 bits, with no end check.
+    const int64_t lastLoad = static_cast<int64_t>(r->size) * 8 - 64;
+    uint64_t bits = 0;
+    int held = 0;
     for (int g = 0; g < info.num_window_groups; ++g) {
         for (int sfb = 0; sfb < info.max_sfb; ++sfb) {
             const int cb = cs->sfb_cb[g][sfb];
@@ -155,8 +160,22 @@ int scale_factor_data(AacBitReader* r, ChannelStream* cs) {
             if (cb == NOISE_HCB && noise_pcm_flag) {
                 noise_pcm_flag = false;
                 ReadBits(r, 9);  // dpcm_noise_nrg of the first noise band
+                held = 0;
             } else {
-                const int code = DecodeCodeword(r, table);
+                int code;
+                if (held < 32 && !r->exhausted && r->bitPos <= lastLoad) {
+                    bits = ReadBE64(r->buf + (r->bitPos >> 3)) << (r->bitPos & 7);
+                    held = 64 - static_cast<int>(r->bitPos & 7);
+                }
+                if (held >= 32) {
+                    const HuffEntry e = EntryOf(bits, table);
+                    r->bitPos += e.length;
+                    bits <<= e.length;
+                    held -= e.length;
+                    code = (e.flags & kHuffEntryLeaf) ? e.value : -1;
+                } else {
+                    code = DecodeCodeword(r, table);
+                }
                 if (code < 0) return OutOfDataOr(r, kWalkBadCodeword);
                 if (cb != NOISE_HCB && cb != INTENSITY_HCB && cb != INTENSITY_HCB2) {
                     scale_factor += code - 60;
