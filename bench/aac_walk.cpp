@@ -78,8 +78,8 @@ int main(int argc, char** argv) {
         const double walk = NanosecondsPerPass(repeats, [&] {
             uint64_t ends = 0;
             for (const Frame& f : frames) {
-                metainfo::AacBitReader r = metainfo::MakeAacBitReader(data.data() + f.offset,
-                                                                      static_cast<int>(f.length), f.headerSize);
+                metainfo::AacBitReader r =
+                    metainfo::MakeAacBitReader(data.data() + f.offset, static_cast<int>(f.length), f.headerSize);
                 uint32_t state = metainfo::kWalkPlain;
                 metainfo::RawDataStream(&r, &state, f.samplingIndex);
                 ends += static_cast<uint64_t>(r.bitPos) + state;
@@ -91,8 +91,8 @@ int main(int argc, char** argv) {
         const double once = NanosecondsPerPass(repeats, [&] {
             uint64_t sum = 0;
             for (const Frame& f : frames) {
-                metainfo::AacBitReader r = metainfo::MakeAacBitReader(data.data() + f.offset,
-                                                                      static_cast<int>(f.length), f.headerSize);
+                metainfo::AacBitReader r =
+                    metainfo::MakeAacBitReader(data.data() + f.offset, static_cast<int>(f.length), f.headerSize);
                 while (!r.exhausted) sum += metainfo::ReadBits(&r, 7);
             }
             return sum;

@@ -12,8 +12,8 @@ struct BenchFile {
     std::string path;
     std::string family;
     int64_t size = 0;
-    std::string variant;   // "mp3-cbr" of "mp3-cbr.100s.mp3"; empty outside the scaling set
-    int seconds = 0;       // 100 of the same name
+    std::string variant;  // "mp3-cbr" of "mp3-cbr.100s.mp3"; empty outside the scaling set
+    int seconds = 0;  // 100 of the same name
 };
 
 // Files named on the command line and the regular files under folders named

@@ -14,7 +14,8 @@ namespace {
 
 using bench::Peer;
 
-std::vector<std::unique_ptr<Peer>> MakePeers(const std::vector<std::string>& wanted, const std::string& worker, const std::string& python) {
+std::vector<std::unique_ptr<Peer>> MakePeers(const std::vector<std::string>& wanted, const std::string& worker,
+                                             const std::string& python) {
     std::vector<std::unique_ptr<Peer>> all;
     all.push_back(bench::MakeMetainfoPeer());
     all.push_back(bench::MakeTaglibPeer(false));
@@ -44,7 +45,7 @@ bench::Results Measure(std::vector<bench::BenchFile> files, std::vector<std::uni
     for (const auto& peer : peers) r.peers.push_back(peer->Name());
     r.samples.assign(r.files.size(), std::vector<std::vector<bench::Sample>>(peers.size()));
     const size_t n = peers.size();
-    for (int round = -1; round < rounds; ++round) {   // round -1 warms up
+    for (int round = -1; round < rounds; ++round) {  // round -1 warms up
         for (size_t i = 0; i < r.files.size(); ++i) {
             for (size_t k = 0; k < n; ++k) {
                 const size_t p = (i + static_cast<size_t>(round + 1) + k) % n;
@@ -89,8 +90,9 @@ int main(int argc, char** argv) {
 
     std::vector<bench::BenchFile> files = bench::CollectFiles(roots);
     if (!family.empty()) {
-        files.erase(std::remove_if(files.begin(), files.end(), [&](const bench::BenchFile& f) { return f.family != family; }),
-                    files.end());
+        files.erase(
+            std::remove_if(files.begin(), files.end(), [&](const bench::BenchFile& f) { return f.family != family; }),
+            files.end());
     }
     if (count) {
         std::printf("%zu\n", files.size());

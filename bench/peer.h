@@ -11,9 +11,9 @@
 namespace bench {
 
 struct Sample {
-    int64_t ns = 0;      // wall time of the job
-    int64_t bytes = 0;   // bytes read by the job (rchar of /proc/self/io)
-    bool ok = false;     // the peer recognised the file
+    int64_t ns = 0;  // wall time of the job
+    int64_t bytes = 0;  // bytes read by the job (rchar of /proc/self/io)
+    bool ok = false;  // the peer recognised the file
 };
 
 class Peer {
@@ -33,8 +33,9 @@ int64_t ReadCharCount();
 std::unique_ptr<Peer> MakeMetainfoPeer();
 std::unique_ptr<Peer> MakeTaglibPeer(bool fast);
 std::unique_ptr<Peer> MakeAvformatPeer(bool streamInfo);
-std::unique_ptr<Peer> MakeMediainfoPeer();   // null when built without it
-std::unique_ptr<Peer> MakeMutagenPeer(const std::string& worker, const std::string& python);   // null when python3-mutagen is missing
+std::unique_ptr<Peer> MakeMediainfoPeer();  // null when built without it
+std::unique_ptr<Peer> MakeMutagenPeer(const std::string& worker,
+                                      const std::string& python);  // null when python3-mutagen is missing
 
 }  // namespace bench
 

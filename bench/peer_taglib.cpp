@@ -16,7 +16,8 @@ public:
             TagLib::FileRef ref(path.c_str(), true, style);
             if (ref.isNull()) return false;
             if (const TagLib::Tag* tag = ref.tag()) sink_ += tag->title().size() + tag->year();
-            if (const TagLib::AudioProperties* audio = ref.audioProperties()) sink_ += static_cast<unsigned>(audio->lengthInMilliseconds());
+            if (const TagLib::AudioProperties* audio = ref.audioProperties())
+                sink_ += static_cast<unsigned>(audio->lengthInMilliseconds());
             return true;
         });
     }

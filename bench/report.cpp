@@ -105,8 +105,9 @@ void PrintSpeedups(const Results& r) {
 }
 
 void PrintBytes(const Results& r) {
-    std::printf("\nBytes read per job / file size: median (max); last column: most bytes %s read from a file over 1 MiB\n\n",
-                r.peers[0].c_str());
+    std::printf(
+        "\nBytes read per job / file size: median (max); last column: most bytes %s read from a file over 1 MiB\n\n",
+        r.peers[0].c_str());
     std::printf("| %-10s | files |", "family");
     for (const std::string& peer : r.peers) std::printf(" %15s |", peer.c_str());
     std::printf(" >1 MiB max |\n|------------|------:|");
@@ -118,7 +119,9 @@ void PrintBytes(const Results& r) {
         for (size_t p = 0; p < r.peers.size(); ++p) {
             std::vector<double> ratios;
             for (size_t i : files) {
-                if (r.files[i].size > 0) ratios.push_back(static_cast<double>(r.samples[i][p].front().bytes) / static_cast<double>(r.files[i].size));
+                if (r.files[i].size > 0)
+                    ratios.push_back(static_cast<double>(r.samples[i][p].front().bytes) /
+                                     static_cast<double>(r.files[i].size));
             }
             char text[40];
             std::snprintf(text, sizeof text, "%.2f (%.2f)", Median(ratios),

@@ -11,7 +11,7 @@ namespace bench {
 
 struct Results {
     std::vector<BenchFile> files;
-    std::vector<std::string> peers;   // peers[0] is the library under test
+    std::vector<std::string> peers;  // peers[0] is the library under test
     // samples[file][peer]: one sample per round
     std::vector<std::vector<std::vector<Sample>>> samples;
 };

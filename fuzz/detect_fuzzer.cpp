@@ -4,9 +4,11 @@
 
 namespace {
 const char* const kSuffixes[] = {
-    ".mp3", ".MPGA", ".aac", ".wma", ".wmv", ".asf", ".rm",  ".RAM", ".rmvb", ".ra",   ".rv",
-    ".m4a", ".mp4",  ".3ga", ".3gp", ".mid", ".xmf", ".imy", ".wav", ".avi",  ".Qcp",  ".evc",
-    ".amr", ".awb",  "",     ".txt", ".mp3?cid=7",   ".toolongextension", ".dcf", ".fl",
+    ".mp3", ".MPGA", ".aac", ".wma", ".wmv", ".asf",       ".rm",
+    ".RAM", ".rmvb", ".ra",  ".rv",  ".m4a", ".mp4",       ".3ga",
+    ".3gp", ".mid",  ".xmf", ".imy", ".wav", ".avi",       ".Qcp",
+    ".evc", ".amr",  ".awb", "",     ".txt", ".mp3?cid=7", ".toolongextension",
+    ".dcf", ".fl",
 };
 }
 

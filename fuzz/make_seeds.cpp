@@ -93,11 +93,12 @@ void PutForType(int type, const std::string& name, const Seed& bytes) {
 
 int TypeByExtension(const std::string& name) {
     static const std::pair<const char*, int> kExtensions[] = {
-        {".mp3", MEDIA_TYPE_MP3}, {".aac", MEDIA_TYPE_AAC},  {".m4a", MEDIA_TYPE_MP4},  {".mp4", MEDIA_TYPE_MP4},
-        {".3gp", MEDIA_TYPE_MP4}, {".m4b", MEDIA_TYPE_MP4},  {".wma", MEDIA_TYPE_ASF},  {".asf", MEDIA_TYPE_ASF},
-        {".wmv", MEDIA_TYPE_ASF}, {".rm", MEDIA_TYPE_REALMEDIA}, {".ra", MEDIA_TYPE_REALMEDIA},
-        {".avi", MEDIA_TYPE_AVI}, {".amr", MEDIA_TYPE_AMR_NB}, {".awb", MEDIA_TYPE_AMR_WB},
-        {".wav", MEDIA_TYPE_WAVE}, {".qcp", MEDIA_TYPE_QCP}, {".evc", MEDIA_TYPE_EVRC}, {".mid", MEDIA_TYPE_MIDI},
+        {".mp3", MEDIA_TYPE_MP3},      {".aac", MEDIA_TYPE_AAC},      {".m4a", MEDIA_TYPE_MP4},
+        {".mp4", MEDIA_TYPE_MP4},      {".3gp", MEDIA_TYPE_MP4},      {".m4b", MEDIA_TYPE_MP4},
+        {".wma", MEDIA_TYPE_ASF},      {".asf", MEDIA_TYPE_ASF},      {".wmv", MEDIA_TYPE_ASF},
+        {".rm", MEDIA_TYPE_REALMEDIA}, {".ra", MEDIA_TYPE_REALMEDIA}, {".avi", MEDIA_TYPE_AVI},
+        {".amr", MEDIA_TYPE_AMR_NB},   {".awb", MEDIA_TYPE_AMR_WB},   {".wav", MEDIA_TYPE_WAVE},
+        {".qcp", MEDIA_TYPE_QCP},      {".evc", MEDIA_TYPE_EVRC},     {".mid", MEDIA_TYPE_MIDI},
     };
     const size_t dot = name.rfind('.');
     if (dot == std::string::npos) return MEDIA_TYPE_UNKNOWN;

@@ -223,7 +223,8 @@ void CheckClip(const _MMClipInfo& clip) {
 
 void ReleaseMeta(_MMMetaInfo* meta) {
     for (int i = 0; i < MM_META_ITEMS; ++i) {
-        if (meta->aItems[i].nLength > MM_META_DATA_SIZE) Fail("metadata item longer than its buffer", std::to_string(i));
+        if (meta->aItems[i].nLength > MM_META_DATA_SIZE)
+            Fail("metadata item longer than its buffer", std::to_string(i));
     }
     if (meta->stAlbumArtist.nLength > MM_META_DATA_SIZE) Fail("album artist longer than its buffer");
     if (meta->pPicture != nullptr) Touch(meta->pPicture, meta->nPictureSize);

@@ -68,7 +68,8 @@ std::string Probe(const std::string& path) {
     const int32_t clipResult = AAC_GetClipInfo(path.c_str(), &clip);
     const int32_t codecResult = AAC_GetCodecType(path.c_str(), &codec);
     if (clipResult != MM_OK) return std::to_string(clipResult);
-    return ClipSummary(clip) + (codecResult == MM_OK ? " " + CodecSummary(codec) : " codec " + std::to_string(codecResult));
+    return ClipSummary(clip) +
+           (codecResult == MM_OK ? " " + CodecSummary(codec) : " codec " + std::to_string(codecResult));
 }
 
 int32_t Verify(const std::string& path) {
@@ -108,7 +109,11 @@ std::vector<uint8_t> AdifWithoutSync(uint32_t bitrate) {
     return Join(AdifFile(layout, AacBlock(false, 0, 20)), std::vector<uint8_t>(5000, 0x11));
 }
 
-struct BufResult { int32_t result; std::vector<uint8_t> data; bool terminated; };
+struct BufResult {
+    int32_t result;
+    std::vector<uint8_t> data;
+    bool terminated;
+};
 
 BufResult CutToBuffer(const std::string& path, int start, int end) {
     unsigned char* data = nullptr;
@@ -122,7 +127,10 @@ BufResult CutToBuffer(const std::string& path, int start, int end) {
     return r;
 }
 
-struct Frame { size_t offset, length; int samplingIndex, headerSize, rawBlocks; };
+struct Frame {
+    size_t offset, length;
+    int samplingIndex, headerSize, rawBlocks;
+};
 
 std::vector<Frame> AdtsFramesOf(const std::vector<uint8_t>& data) {
     std::vector<Frame> frames;
@@ -148,8 +156,8 @@ std::string WalkEveryFrame(const std::vector<uint8_t>& data, size_t* walked, siz
     for (const Frame& f : AdtsFramesOf(data)) {
         if (f.rawBlocks != 0) continue;
         // The whole file is the data, so a walk that overruns the frame shows.
-        AacBitReader r = MakeAacBitReader(data.data(), static_cast<int>(data.size()),
-                                          static_cast<int>(f.offset) + f.headerSize);
+        AacBitReader r =
+            MakeAacBitReader(data.data(), static_cast<int>(data.size()), static_cast<int>(f.offset) + f.headerSize);
         uint32_t state = metainfo::kWalkPlain;
         RawDataStream(&r, &state, f.samplingIndex);
         const size_t end = static_cast<size_t>(metainfo::BytePosition(r));
@@ -215,7 +223,8 @@ TEST(AacClip, ChecksClipAndCodecOfEachFileShape) {
     const Data sbrThird = Cat({Frames(2, 200), Frames(1, 200, 4, 2, 1, 13)});
     // An ID3v2 tag with a footer is skipped whole (20 bytes past its size) but only
     // its body leaves the count; a trailing 128-byte tag leaves it too.
-    const Data footerTag = Cat({Id3v2Tag(4, Zeros(100), 0x10), Bytes().str("3DI").u8(4).u8(0).u8(0x10).syncsafe32(100).data()});
+    const Data footerTag =
+        Cat({Id3v2Tag(4, Zeros(100), 0x10), Bytes().str("3DI").u8(4).u8(0).u8(0x10).syncsafe32(100).data()});
     const Data speech = Frames(15, 128, 11, 1);  // 8 kHz frames of 128 bytes: 8000 bit/s
     AdifLayout pces;  // pairs count twice; a misread field of the first element would garble the second
     pces.variableRate = true;
@@ -230,7 +239,12 @@ TEST(AacClip, ChecksClipAndCodecOfEachFileShape) {
     pces.pces[1].objectType = 2;
     pces.pces[1].side = {true, false};
     const Data adif = AdifFile(AdifLayout{}, AacBlock(false, 0, 20));
-    const struct { const char* name; Data file; int32_t check; const char* clip; } cases[] = {
+    const struct {
+        const char* name;
+        Data file;
+        int32_t check;
+        const char* clip;
+    } cases[] = {
         // An SBR fill element (extension 13 or 14) gives the AAC+ code and doubles the rate;
         // the profile goes into the subtype; a reserved sampling index gives rate, bit rate
         // and duration 0.
@@ -359,7 +373,8 @@ TEST(AacClip, TruncatedAdifHeadersAnswerWithoutFault) {
     const Data full = AdifFile(layout, AacBlock(true, 13, 30));
     const Data tag = Id3v2Tag(3, Zeros(20));
     for (size_t cut = 5; cut < full.size(); cut += 3) {
-        const std::string path = dir.Write("t.aac", Cat({tag, Data(full.begin(), full.begin() + static_cast<long>(cut))}));
+        const std::string path =
+            dir.Write("t.aac", Cat({tag, Data(full.begin(), full.begin() + static_cast<long>(cut))}));
         _MMClipInfo clip;
         EXPECT_EQ(AAC_GetClipInfo(path.c_str(), &clip), MM_OK) << cut;
     }
@@ -381,11 +396,11 @@ TEST(AacCorpus, EveryFileIsAnsweredWithoutFaultAndKnownFilesGiveTheirValues) {
         }
     }
     EXPECT_EQ(before, OpenDescriptors());
-    EXPECT_EQ(Probe(corpus + "/mutagen/adif.aac"), 
+    EXPECT_EQ(Probe(corpus + "/mutagen/adif.aac"),
               "aac size=4096 bps=128000 audio=1 abps=128000 hz=48000 ch=2 bits=16 a=2001/0/1234 v=0/0/0");
-    EXPECT_EQ(Probe(corpus + "/mutagen/empty.aac"), 
+    EXPECT_EQ(Probe(corpus + "/mutagen/empty.aac"),
               "aac size=2577 dur=3 bps=5167 audio=1 abps=5167 hz=44100 ch=2 bits=16 a=2011/0/2102 v=0/0/0");
-    EXPECT_EQ(Probe(corpus + "/taglib/empty1s.aac"), 
+    EXPECT_EQ(Probe(corpus + "/taglib/empty1s.aac"),
               "aac size=147 bps=1378 audio=1 abps=1378 hz=11025 ch=1 bits=16 a=2011/0/2102 v=0/0/0");
 }
 
@@ -482,7 +497,10 @@ TEST(AacExtract, RejectedRangesAnswerOneAndCloseTheirFiles) {
     const std::string missing = dir.PathOf("missing.aac");
     const std::string out = dir.PathOf("out.aac");
     const int before = OpenDescriptors();
-    struct Case { const std::string* file; int start, end; };
+    struct Case {
+        const std::string* file;
+        int start, end;
+    };
     for (const Case& c : {Case{&path, 3, 3}, Case{&path, 4, 2}, Case{&path, 12, 20}, Case{&path, 50, 60},
                           Case{&zeroDuration, -5, 5}, Case{&notAac, 0, 1}, Case{&missing, 0, 1}, Case{&tiny, -1, 1}}) {
         EXPECT_EQ(1, AAC_GetAuidoData_File(c.file->c_str(), c.start, c.end, out.c_str())) << *c.file << c.start;
@@ -509,8 +527,10 @@ TEST(AacExtractFfmpeg, CutsDecode) {
     if (!HaveFfmpeg()) GTEST_SKIP() << "ffmpeg not installed";
     TempDir dir;
     const std::string in = dir.PathOf("in.aac");
-    const std::string cmd = "/usr/bin/ffmpeg -hide_banner -loglevel error -y -f lavfi -i "
-                            "\"anoisesrc=d=6:c=pink:a=0.3:seed=7:r=44100\" -ac 2 -c:a aac \"" + in + "\"";
+    const std::string cmd =
+        "/usr/bin/ffmpeg -hide_banner -loglevel error -y -f lavfi -i "
+        "\"anoisesrc=d=6:c=pink:a=0.3:seed=7:r=44100\" -ac 2 -c:a aac \"" +
+        in + "\"";
     ASSERT_EQ(0, std::system(cmd.c_str()));
     const std::string fileCut = dir.PathOf("cut.aac");
     ASSERT_EQ(MM_OK, AAC_GetAuidoData_File(in.c_str(), 1, 4, fileCut.c_str()));
@@ -630,9 +650,9 @@ TEST(AacWalker, OnlySbrFillExtensionsSetTheState) {
 
 TEST(AacWalker, MaxSfbAboveBandCountStopsElementAndWalkGoesOn) {
     BitWriter w;
-    w.put(0, 3).put(0, 4).put(100, 8);           // SCE, tag, global_gain
+    w.put(0, 3).put(0, 4).put(100, 8);  // SCE, tag, global_gain
     w.put(0, 1).put(0, 2).put(0, 1).put(63, 6);  // long window, max_sfb 63 > 49 bands at 44.1 kHz
-    PutFill(w, 13, 1);                           // read as the next element
+    PutFill(w, 13, 1);  // read as the next element
     PutEnd(w);
     AacBitReader r = MakeAacBitReader(w.bytes().data(), static_cast<int>(w.bytes().size()), 0, 5);
     EXPECT_EQ(metainfo::kWalkMaxSfb, metainfo::single_lfe_channel_element(&r, 4));
@@ -651,8 +671,10 @@ TEST(AacWalker, CorruptStreamsNeverReadPastTheData) {
         std::vector<uint8_t> data(size);
         for (auto& b : data) b = static_cast<uint8_t>(rng());
         // Bias some buffers towards long runs of ones and zeros (escapes, sections).
-        if (round % 3 == 1) for (size_t i = 0; i < size; i += 2) data[i] = 0xFF;
-        if (round % 3 == 2) for (size_t i = 0; i < size; i += 3) data[i] = 0x00;
+        if (round % 3 == 1)
+            for (size_t i = 0; i < size; i += 2) data[i] = 0xFF;
+        if (round % 3 == 2)
+            for (size_t i = 0; i < size; i += 3) data[i] = 0x00;
         AacBitReader r = MakeAacBitReader(data.data(), static_cast<int>(size), 0);
         uint32_t state = metainfo::kWalkPlain;
         RawDataStream(&r, &state, static_cast<int>(rng() % 16));
@@ -664,7 +686,8 @@ TEST(AacWalker, TruncatedRealBlocksEndAtTheCut) {
     const std::vector<uint8_t> full = AacBlock(true, 13, 40);
     for (size_t cut = 1; cut < full.size(); ++cut) {
         uint32_t state;
-        EXPECT_TRUE(Walk(std::vector<uint8_t>(full.begin(), full.begin() + static_cast<long>(cut)), 4, &state).exhausted)
+        EXPECT_TRUE(
+            Walk(std::vector<uint8_t>(full.begin(), full.begin() + static_cast<long>(cut)), 4, &state).exhausted)
             << cut;
     }
 }
@@ -676,7 +699,12 @@ TEST(AacWalker, TruncatedRealBlocksEndAtTheCut) {
 TEST(AacWalker, FfmpegStreamsWalkToEveryFrameEnd) {
     if (!HaveFfmpeg()) GTEST_SKIP() << "ffmpeg not installed";
     TempDir dir;
-    struct Case { const char* name; std::string input; const char* options; uint32_t rate, channels, kbps, profile; };
+    struct Case {
+        const char* name;
+        std::string input;
+        const char* options;
+        uint32_t rate, channels, kbps, profile;
+    };
     const std::string clicks =
         "aevalsrc=if(lt(mod(t\\,0.25)\\,0.004)\\,0.9*sin(2*PI*3000*t)\\,0.02*random(0))"
         "|0.5*sin(2*PI*440*t)+0.3*random(1):d=2:s=";
@@ -696,8 +724,8 @@ TEST(AacWalker, FfmpegStreamsWalkToEveryFrameEnd) {
     };
     for (const Case& c : cases) {
         const std::string out = dir.PathOf(std::string(c.name) + ".aac");
-        const std::string cmd = "/usr/bin/ffmpeg -hide_banner -loglevel error -y -f lavfi -i \"" + c.input +
-                                "\" " + c.options + " -c:a aac \"" + out + "\"";
+        const std::string cmd = "/usr/bin/ffmpeg -hide_banner -loglevel error -y -f lavfi -i \"" + c.input + "\" " +
+                                c.options + " -c:a aac \"" + out + "\"";
         ASSERT_EQ(0, std::system(cmd.c_str())) << cmd;
         const std::vector<uint8_t> data = ReadFileBytes(out);
         size_t walked = 0;
@@ -711,7 +739,8 @@ TEST(AacWalker, FfmpegStreamsWalkToEveryFrameEnd) {
         ASSERT_EQ(AAC_GetClipInfo(out.c_str(), &clip), MM_OK) << c.name;
         ASSERT_EQ(AAC_GetCodecType(out.c_str(), &codec), MM_OK) << c.name;
         EXPECT_EQ(std::make_tuple(clip.nSampleRate, clip.nChannels, codec.nAudioCodec, codec.nAudioSubType),
-                  std::make_tuple(c.rate, c.channels, 0x2011u, c.profile)) << c.name;
+                  std::make_tuple(c.rate, c.channels, 0x2011u, c.profile))
+            << c.name;
         if (c.kbps != 0) {
             EXPECT_GT(clip.nBitrate, c.kbps * 1000 / 2) << c.name;
             EXPECT_LT(clip.nBitrate, c.kbps * 1000 * 2) << c.name;
@@ -725,13 +754,13 @@ TEST(AacWalker, FfmpegStreamsWalkToEveryFrameEnd) {
 // a block written that way walks to its end.
 TEST(AacWalker, ShortWindowTnsCoefficientsAreOneBitShorter) {
     BitWriter w;
-    w.put(0, 3).put(0, 4).put(100, 8);                       // SCE, tag, global_gain
-    w.put(0, 1).put(2, 2).put(0, 1).put(0, 4).put(0, 7);     // eight short windows, max_sfb 0
-    w.put(0, 1).put(1, 1);                                   // no pulse data, TNS present
+    w.put(0, 3).put(0, 4).put(100, 8);  // SCE, tag, global_gain
+    w.put(0, 1).put(2, 2).put(0, 1).put(0, 4).put(0, 7);  // eight short windows, max_sfb 0
+    w.put(0, 1).put(1, 1);  // no pulse data, TNS present
     w.put(1, 1).put(1, 1).put(5, 4).put(2, 3).put(0, 1).put(0, 1);  // window 0: one filter of order 2
-    w.put(5, 3).put(2, 3);                                   // two coefficients of 1 + 3 - 0 - 1 bits
-    for (int win = 1; win < 8; ++win) w.put(0, 1);           // no filters in the other windows
-    w.put(0, 1);                                             // no gain control
+    w.put(5, 3).put(2, 3);  // two coefficients of 1 + 3 - 0 - 1 bits
+    for (int win = 1; win < 8; ++win) w.put(0, 1);  // no filters in the other windows
+    w.put(0, 1);  // no gain control
     PutEnd(w);
     uint32_t state;
     const AacBitReader r = Walk(w.bytes(), 4, &state);

@@ -56,7 +56,8 @@ int Failures(const std::string& path) {
 Bytes Wma(uint16_t tag, uint32_t rate, uint32_t bitsPerSecond, int stream = 1) {
     return AsfAudioStream(stream, tag, rate, 2, bitsPerSecond);
 }
-Bytes Wmv(const std::string& fourcc, const std::vector<uint8_t>& data, int stream = 2, uint32_t w = 176, uint32_t h = 144) {
+Bytes Wmv(const std::string& fourcc, const std::vector<uint8_t>& data, int stream = 2, uint32_t w = 176,
+          uint32_t h = 144) {
     return AsfVideoStream(stream, fourcc, w, h, data);
 }
 // STRUCT_C's first two bytes: profile, FRMRTQ_POSTPROC, BITRTQ_POSTPROC, interlace.
@@ -92,7 +93,10 @@ std::vector<uint8_t> PictureValue(size_t n, const std::string& description = "")
     return AsfWmPicture(3, "image/jpeg", description, Jpeg(n)).data();
 }
 
-struct LogLine { int priority; std::string tag, message; };
+struct LogLine {
+    int priority;
+    std::string tag, message;
+};
 std::vector<LogLine> g_lines;
 void Capture(int priority, const char* tag, const char* message) {
     g_lines.push_back({priority, tag != nullptr ? tag : "", message});
@@ -121,7 +125,8 @@ uint32_t Number(const std::map<std::string, std::string>& v, const char* key) {
 
 std::string Narrow(const _MMMetaItem& item) {
     std::string s;
-    for (uint32_t i = 0; i + 1 < item.nLength && item.szData[i] != 0; i += 2) s.push_back(static_cast<char>(item.szData[i]));
+    for (uint32_t i = 0; i + 1 < item.nLength && item.szData[i] != 0; i += 2)
+        s.push_back(static_cast<char>(item.szData[i]));
     return s;
 }
 
@@ -151,10 +156,14 @@ struct Answers {
 TEST(AsfClip, FilePropertiesAndTheFirstStreamsGiveTheClip) {
     TempDir dir;
     const Bytes props = AsfFileProperties(1000, kSecond, 0, 500000);
-    const struct { const char* name; std::vector<uint8_t> file; const char* clip; } cases[] = {
-        {"song.wma", AsfFile({AsfFileProperties(123456, 3 * kSecond, 500, 128000),
-                              AsfAudioStream(1, 0x0161, 22050, 1, 32000, 8),
-                              AsfAudioStream(2, 0x0161, 48000, 2, 320000, 24)}),
+    const struct {
+        const char* name;
+        std::vector<uint8_t> file;
+        const char* clip;
+    } cases[] = {
+        {"song.wma",
+         AsfFile({AsfFileProperties(123456, 3 * kSecond, 500, 128000), AsfAudioStream(1, 0x0161, 22050, 1, 32000, 8),
+                  AsfAudioStream(2, 0x0161, 48000, 2, 320000, 24)}),
          "wma size=123456 dur=2 bps=128000 audio=2 abps=32000 hz=22050 ch=1 bits=8"},
         {"a.wma", AsfFile({AsfFileProperties(1000, 15 * kSecond / 10, 3000, 64000)}),
          "wma size=1000 dur=4294967295 bps=64000"},
@@ -166,14 +175,17 @@ TEST(AsfClip, FilePropertiesAndTheFirstStreamsGiveTheClip) {
          "wmv video=1 w=176 h=144"},
         // The first video stream is chosen for bit rate and frame rate (10000000 / 666666)
         // whatever the object order.
-        {"x.wmv", AsfFile({AsfStreamBitrates({{1, 96000}, {3, 111000}, {5, 222000}}),
-                           AsfHeaderExtension({AsfObject(asf_guid::kPadding, Bytes().zeros(8)),
-                                               AsfExtStreamProperties(5, 400000), AsfExtStreamProperties(3, 666666)}),
-                           props, AsfAudioStream(1, 0x0161, 44100, 2, 96000), Wmv("WMV2", {0, 0, 0, 0}, 3),
-                           Wmv("WMV2", {0, 0, 0, 0}, 5, 640, 480)}),
-         "wmv size=1000 dur=1 bps=500000 audio=1 video=2 abps=96000 hz=44100 ch=2 bits=16 vbps=111000 w=176 h=144 fps=15"},
+        {"x.wmv",
+         AsfFile({AsfStreamBitrates({{1, 96000}, {3, 111000}, {5, 222000}}),
+                  AsfHeaderExtension({AsfObject(asf_guid::kPadding, Bytes().zeros(8)),
+                                      AsfExtStreamProperties(5, 400000), AsfExtStreamProperties(3, 666666)}),
+                  props, AsfAudioStream(1, 0x0161, 44100, 2, 96000), Wmv("WMV2", {0, 0, 0, 0}, 3),
+                  Wmv("WMV2", {0, 0, 0, 0}, 5, 640, 480)}),
+         "wmv size=1000 dur=1 bps=500000 audio=1 video=2 abps=96000 hz=44100 ch=2 bits=16 vbps=111000 w=176 h=144 "
+         "fps=15"},
         // Fewer objects than counted end at the file end.
-        {"b.wma", AsfHeader({AsfFileProperties(1000, 3 * kSecond, 0, 1), AsfAudioStream(1, 0x0161, 8000, 1, 8000)}, 9).data(),
+        {"b.wma",
+         AsfHeader({AsfFileProperties(1000, 3 * kSecond, 0, 1), AsfAudioStream(1, 0x0161, 8000, 1, 8000)}, 9).data(),
          "wma size=1000 dur=3 bps=1 audio=1 abps=8000 hz=8000 ch=1 bits=16"},
         // The format is the extension without its dot, cut to eight characters.
         {"x.Asf", AsfFile({AsfFileProperties(1000, kSecond, 0, 1)}), "Asf size=1000 dur=1 bps=1"},
@@ -184,8 +196,9 @@ TEST(AsfClip, FilePropertiesAndTheFirstStreamsGiveTheClip) {
     for (const auto& c : cases) EXPECT_EQ(ClipOf(dir.Write(c.name, c.file)), c.clip) << c.name;
     // Audio 0x1, video 0x10 and so on up to binary 0x1000000, OR-ed; padding adds nothing.
     std::vector<Bytes> streams;
-    for (const char* type : {asf_guid::kAudio, asf_guid::kVideo, asf_guid::kCommand, asf_guid::kJfif,
-                             asf_guid::kDegradableJpeg, asf_guid::kFileTransfer, asf_guid::kBinary, asf_guid::kPadding}) {
+    for (const char* type :
+         {asf_guid::kAudio, asf_guid::kVideo, asf_guid::kCommand, asf_guid::kJfif, asf_guid::kDegradableJpeg,
+          asf_guid::kFileTransfer, asf_guid::kBinary, asf_guid::kPadding}) {
         streams.push_back(AsfStreamProperties(type, static_cast<int>(streams.size()) + 1, Bytes().zeros(20)));
     }
     int mask = -1;
@@ -204,7 +217,11 @@ TEST(AsfClip, BrokenHeadersFailAndCloseTheFile) {
     badGuid[3] ^= 1;
     const Bytes shortStream =
         AsfObject(asf_guid::kStreamProperties, Bytes().raw(AsfGuid(asf_guid::kAudio)).zeros(60), 10);
-    struct Case { const char* name; std::vector<uint8_t> bytes; int otherFailures; };
+    struct Case {
+        const char* name;
+        std::vector<uint8_t> bytes;
+        int otherFailures;
+    };
     const Case cases[] = {
         {"257", AsfFile(many, 257), 3},
         {"guid", badGuid, 3},
@@ -214,8 +231,10 @@ TEST(AsfClip, BrokenHeadersFailAndCloseTheFile) {
         {"stream", AsfFile({shortStream}), 3},
         // The Header Extension is walked in the clip and metadata queries only.
         {"extSize", AsfFile({AsfHeaderExtension({}, 1 << 20), AsfVideoStream(1, "WMV2", 8, 8)}), 1},
-        {"extZero", AsfFile({AsfHeaderExtension({AsfObject(asf_guid::kPadding, Bytes().zeros(8), 0)}),
-                             AsfVideoStream(1, "WMV2", 8, 8)}), 1},
+        {"extZero",
+         AsfFile({AsfHeaderExtension({AsfObject(asf_guid::kPadding, Bytes().zeros(8), 0)}),
+                  AsfVideoStream(1, "WMV2", 8, 8)}),
+         1},
     };
     const int before = OpenDescriptors();
     for (const Case& c : cases) {
@@ -245,7 +264,10 @@ TEST(AsfCodec, CodesProfilesAndLevelsOfTheStreams) {
     const auto wmv3 = [](int profile, int fps, int kbps, bool interlaced, uint32_t w, uint32_t h) {
         return std::vector<Bytes>{Wmv("WMV3", SequenceHeader(profile, fps, kbps, interlaced), 2, w, h)};
     };
-    const struct { std::vector<Bytes> streams; const char* codec; } cases[] = {
+    const struct {
+        std::vector<Bytes> streams;
+        const char* codec;
+    } cases[] = {
         {{Wma(0x0161, 44100, 128000)}, "a=6001/6010/0 v=0/0/0"},
         {{Wma(0x0161, 48000, 320000)}, "a=6001/6011/0 v=0/0/0"},
         {{Wma(0x0161, 49153, 128000)}, "a=6001/0/0 v=0/0/0"},
@@ -298,9 +320,9 @@ TEST(AsfCodec, CodesProfilesAndLevelsOfTheStreams) {
 TEST(AsfCodec, Wmv9LevelRulesFireInTheirOrder) {
     constexpr uint32_t kLow = 0x5020, kMedium = 0x5021;
     constexpr uint32_t kL0 = 0x5023, kL1 = 0x5024, kL2 = 0x5025, kL3 = 0x5026, kL4 = 0x5027;
-    EXPECT_EQ(ASF_SimpleProfileLevel(416, 14, 176, 144), 0u);      // above 384 kbps before MEDIUM
+    EXPECT_EQ(ASF_SimpleProfileLevel(416, 14, 176, 144), 0u);  // above 384 kbps before MEDIUM
     EXPECT_EQ(ASF_SimpleProfileLevel(160, 14, 352, 288), kMedium);
-    EXPECT_EQ(ASF_MainProfileLevel(0, 22, true, 320, 240), kLow);    // LOW before the interlace rule
+    EXPECT_EQ(ASF_MainProfileLevel(0, 22, true, 320, 240), kLow);  // LOW before the interlace rule
     EXPECT_EQ(ASF_MainProfileLevel(0, 26, false, 720, 576), kMedium);
     EXPECT_EQ(ASF_MainProfileLevel(0, 30, false, 1920, 1088), 0u);
     EXPECT_EQ(ASF_AdvancedProfileLevel(30, true, 352, 288), kL0);
@@ -334,30 +356,42 @@ TEST(AsfLog, DiagnosticsGoToTheLogAtVerbosePriority) {
 TEST(AsfMeta, SourcesTheirOrderEncodingsAndRatings) {
     Bytes brokenPicture = AsfMetadata({{"WM/Picture", kBytes, {3, 0, 0, 0, 0}}});  // a value length beyond the file
     brokenPicture.patch_le32(brokenPicture.size() - 5 - Utf16("WM/Picture").size() - 4, 0xFFFFFFF0u);
-    const struct { const char* name; std::vector<Bytes> objects; std::string meta; } cases[] = {
-        {"content description", {AsfContentDescription(std::string(100, 'x'), "Author", "(c)", "Words", "")},
+    const struct {
+        const char* name;
+        std::vector<Bytes> objects;
+        std::string meta;
+    } cases[] = {
+        {"content description",
+         {AsfContentDescription(std::string(100, 'x'), "Author", "(c)", "Words", "")},
          "0 title=6~" + std::string(64, 'x') + " artist=6~Author\\x00 copyright=6~(c)\\x00 comment=6~Words\\x00"},
-        {"descriptors", {AsfExtContentDescription({
-             {"WM/AlbumTitle", kString, U16("Album")}, {"WM/AlbumArtist", kString, U16("Band")},
-             {"WM/Genre", kBytes, std::vector<uint8_t>(300, 'z')}, {"WM/Year", kString, U16("2004")},
-             {"WM/Composer", kString, U16("Comp")}, {"WM/Language", kString, U16("en")},
-             {"WM/Unknown", kString, U16("skipped")}, {"WM/OriginalArtist", kBytes, {1, 2, 3}},
-             {"WM/TrackNumber", kDword, {7, 0, 0, 0}}})},
+        {"descriptors",
+         {AsfExtContentDescription({{"WM/AlbumTitle", kString, U16("Album")},
+                                    {"WM/AlbumArtist", kString, U16("Band")},
+                                    {"WM/Genre", kBytes, std::vector<uint8_t>(300, 'z')},
+                                    {"WM/Year", kString, U16("2004")},
+                                    {"WM/Composer", kString, U16("Comp")},
+                                    {"WM/Language", kString, U16("en")},
+                                    {"WM/Unknown", kString, U16("skipped")},
+                                    {"WM/OriginalArtist", kBytes, {1, 2, 3}},
+                                    {"WM/TrackNumber", kDword, {7, 0, 0, 0}}})},
          "0 artist=2:\\x01\\x02\\x03 album=6~Album\\x00 genre=2:" + std::string(128, 'z') +
-             " year=6~2004\\x00 composer=6~Comp\\x00 track=0:\\x07\\x00\\x00\\x00 language=6~en\\x00 albumartist=6~Band\\x00"},
-        {"first source wins", {AsfMetadata({{"WM/TrackNumber", kString, U16("99")}}),
-                               AsfHeaderExtension({AsfMetadata({{"WM/AlbumTitle", kString, U16("FromMetadata")},
-                                                                {"WM/Genre", kString, U16("Rock")},
-                                                                {"WM/TrackNumber", kString, U16("12")}}),
-                                                   AsfMetadata({{"WM/Genre", kString, U16("Pop")}}, true)}),
-                               AsfExtContentDescription({{"WM/AlbumTitle", kString, U16("FromExtended")},
-                                                         {"WM/OriginalArtist", kString, U16("Original")},
-                                                         {"WM/AlbumTitle", kString, U16("Second")}}),
-                               AsfContentDescription("T", "Author", "", "", "")},
+             " year=6~2004\\x00 composer=6~Comp\\x00 track=0:\\x07\\x00\\x00\\x00 language=6~en\\x00 "
+             "albumartist=6~Band\\x00"},
+        {"first source wins",
+         {AsfMetadata({{"WM/TrackNumber", kString, U16("99")}}),
+          AsfHeaderExtension({AsfMetadata({{"WM/AlbumTitle", kString, U16("FromMetadata")},
+                                           {"WM/Genre", kString, U16("Rock")},
+                                           {"WM/TrackNumber", kString, U16("12")}}),
+                              AsfMetadata({{"WM/Genre", kString, U16("Pop")}}, true)}),
+          AsfExtContentDescription({{"WM/AlbumTitle", kString, U16("FromExtended")},
+                                    {"WM/OriginalArtist", kString, U16("Original")},
+                                    {"WM/AlbumTitle", kString, U16("Second")}}),
+          AsfContentDescription("T", "Author", "", "", "")},
          "0 title=6~T\\x00 artist=6~Author\\x00 album=6~FromExtended\\x00 genre=6~Rock\\x00 track=6~12\\x00"},
         // A data type above six is corruption; what was read stays.
-        {"data type 7", {AsfContentDescription("Kept", "", "", "", ""),
-                         AsfExtContentDescription({{"WM/Year", kString, U16("1")}, {"WM/Genre", 7, {1, 2}}})},
+        {"data type 7",
+         {AsfContentDescription("Kept", "", "", "", ""),
+          AsfExtContentDescription({{"WM/Year", kString, U16("1")}, {"WM/Genre", 7, {1, 2}}})},
          "1 title=6~Kept\\x00 year=6~1\\x00"},
         // A name or a Header Extension that claims more than the file holds fails.
         {"long name", {AsfObject(asf_guid::kExtContentDescription, Bytes().le16(1).le16(0xFFFF).str("W"))}, "1 "},
@@ -393,29 +427,45 @@ TEST(AsfMeta, PicturesAndBanners) {
     const AsfDescriptor large{"WM/Picture", kBytes, PictureValue(600000, "cover")};
     Bytes lying = AsfWmPicture(3, "image/jpeg", "", Jpeg(16));
     lying.patch_le32(1, 5000);  // claiming more than its value
-    const struct { const char* name; std::vector<Bytes> objects; int allowance; const char* meta; } cases[] = {
+    const struct {
+        const char* name;
+        std::vector<Bytes> objects;
+        int allowance;
+        const char* meta;
+    } cases[] = {
         {"small", {AsfExtContentDescription({small})}, 1, "0 picformat=6~image/jpeg\\x00cover\\x00 pic=1000"},
-        {"just above the ceiling", {AsfHeaderExtension({AsfMetadata({{"WM/Picture", kBytes, PictureValue(0x80001)}}, true)})},
-         1, "0 "},
+        {"just above the ceiling",
+         {AsfHeaderExtension({AsfMetadata({{"WM/Picture", kBytes, PictureValue(0x80001)}}, true)})},
+         1,
+         "0 "},
         {"large, allowance 1", {AsfHeaderExtension({AsfMetadata({large}, true)})}, 1, "0 "},
         {"large, allowance below its size", {AsfHeaderExtension({AsfMetadata({large}, true)})}, 599999, "0 "},
-        {"large, allowance of its size", {AsfHeaderExtension({AsfMetadata({large}, true)})}, 600000,
+        {"large, allowance of its size",
+         {AsfHeaderExtension({AsfMetadata({large}, true)})},
+         600000,
          "0 picformat=6~image/jpeg\\x00cover\\x00 pic=600000"},
-        {"claiming more", {AsfExtContentDescription({{"WM/Picture", kBytes, lying.data()}, {"WM/Year", kString, U16("7")}})},
-         1, "0 year=6~7\\x00"},
+        {"claiming more",
+         {AsfExtContentDescription({{"WM/Picture", kBytes, lying.data()}, {"WM/Year", kString, U16("7")}})},
+         1,
+         "0 year=6~7\\x00"},
         {"shorter than its fields", {AsfExtContentDescription({{"WM/Picture", kBytes, {3, 1}}})}, 1, "0 "},
-        {"banner", {AsfContentBranding(2, Jpeg(300), "http://b", "http://c"),
-                    AsfExtContentDescription({{"WM/Picture", kBytes, PictureValue(10)}}),
-                    AsfContentDescription("After", "", "", "", "")},
-         1, "0 title=6~After\\x00 picformat=2:image/jpeg\\x00 pic=300"},
-        {"banner, allowance 0", {AsfContentBranding(1, Jpeg(300)), AsfExtContentDescription({{"WM/Picture", kBytes,
-                                                                                              PictureValue(10)}}),
-                                 AsfContentDescription("After", "", "", "", "")},
-         0, "0 title=6~After\\x00 picformat=2:image/bmp\\x00 picsize=300"},
+        {"banner",
+         {AsfContentBranding(2, Jpeg(300), "http://b", "http://c"),
+          AsfExtContentDescription({{"WM/Picture", kBytes, PictureValue(10)}}),
+          AsfContentDescription("After", "", "", "", "")},
+         1,
+         "0 title=6~After\\x00 picformat=2:image/jpeg\\x00 pic=300"},
+        {"banner, allowance 0",
+         {AsfContentBranding(1, Jpeg(300)), AsfExtContentDescription({{"WM/Picture", kBytes, PictureValue(10)}}),
+          AsfContentDescription("After", "", "", "", "")},
+         0,
+         "0 title=6~After\\x00 picformat=2:image/bmp\\x00 picsize=300"},
         // Image type 0 leaves the walk inside the object.
         {"image type 0", {AsfContentBranding(0, Bytes()), AsfContentDescription("Lost", "", "", "", "")}, 1, "0 "},
         // A second banner replaces the first picture: the size word never describes a buffer it does not match.
-        {"two banners", {AsfContentBranding(2, Jpeg(300)), AsfContentBranding(3, Jpeg(600000))}, 1,
+        {"two banners",
+         {AsfContentBranding(2, Jpeg(300)), AsfContentBranding(3, Jpeg(600000))},
+         1,
          "0 picformat=2:image/gif\\x00 picsize=600000"},
     };
     for (const auto& c : cases) {
@@ -423,7 +473,8 @@ TEST(AsfMeta, PicturesAndBanners) {
         EXPECT_EQ(m.Text(), c.meta) << c.name;
         if (m.info.pPicture != nullptr) {
             EXPECT_EQ(std::vector<uint8_t>(m.info.pPicture, m.info.pPicture + m.info.nPictureSize),
-                      Jpeg(m.info.nPictureSize).data()) << c.name;
+                      Jpeg(m.info.nPictureSize).data())
+                << c.name;
         }
     }
     // The public interface loads pictures up to the ceiling.
@@ -463,14 +514,22 @@ TEST(AsfCorpus, EveryWmaIsAnsweredAndAgreesWithFfprobe) {
 TEST(AsfFfmpeg, WrittenFilesAgreeWithFfprobe) {
     if (!HaveFfmpeg()) GTEST_SKIP() << "ffmpeg not installed";
     TempDir dir;
-    struct Case { const char* name; const char* videoInput; const char* videoCodec; uint32_t videoCode; };
-    for (const Case& c : {Case{"tone.wma", "", "", 0}, Case{"v1.wmv", "-f lavfi -i testsrc=d=2:s=176x144:r=15", "-c:v wmv1", 0x5001},
-                          Case{"v2.wmv", "-f lavfi -i testsrc=d=2:s=320x240:r=25", "-c:v wmv2", 0x5002}}) {
+    struct Case {
+        const char* name;
+        const char* videoInput;
+        const char* videoCodec;
+        uint32_t videoCode;
+    };
+    for (const Case& c :
+         {Case{"tone.wma", "", "", 0}, Case{"v1.wmv", "-f lavfi -i testsrc=d=2:s=176x144:r=15", "-c:v wmv1", 0x5001},
+          Case{"v2.wmv", "-f lavfi -i testsrc=d=2:s=320x240:r=25", "-c:v wmv2", 0x5002}}) {
         SCOPED_TRACE(c.name);
         const std::string path = dir.PathOf(c.name);
         const std::string cmd = std::string("/usr/bin/ffmpeg -nostdin -v error -y ") + c.videoInput +
-                                " -f lavfi -i sine=f=440:d=2 " + c.videoCodec + " -ar 44100 -c:a wmav2 -b:a 128k "
-                                "-metadata title=Tone -metadata artist=Someone -metadata album=Record '" + path + "'";
+                                " -f lavfi -i sine=f=440:d=2 " + c.videoCodec +
+                                " -ar 44100 -c:a wmav2 -b:a 128k "
+                                "-metadata title=Tone -metadata artist=Someone -metadata album=Record '" +
+                                path + "'";
         ASSERT_EQ(std::system(cmd.c_str()), 0) << cmd;
         const Answers a(path);
         auto format = Probe(path, "-show_entries format=duration,size:format_tags=title,artist,album");
@@ -486,7 +545,8 @@ TEST(AsfFfmpeg, WrittenFilesAgreeWithFfprobe) {
         EXPECT_EQ(a.clip.nDuration % 1000, 0u);
         EXPECT_EQ(std::make_tuple(a.clip.nSampleRate, a.clip.nChannels, a.clip.bHasAudio, a.clip.bHasVideo),
                   std::make_tuple(Number(audio, "sample_rate"), Number(audio, "channels"), 1u, hasVideo ? 1u : 0u));
-        EXPECT_EQ(std::make_pair(a.clip.nWidth, a.clip.nHeight), std::make_pair(Number(video, "width"), Number(video, "height")));
+        EXPECT_EQ(std::make_pair(a.clip.nWidth, a.clip.nHeight),
+                  std::make_pair(Number(video, "width"), Number(video, "height")));
         EXPECT_EQ(format["TAG:title"], "Tone");
         EXPECT_EQ(Narrow(a.meta.aItems[META_TITLE]), format["TAG:title"]);
         EXPECT_EQ(Narrow(a.meta.aItems[META_ARTIST]), format["TAG:artist"]);

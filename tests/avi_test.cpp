@@ -73,8 +73,9 @@ std::vector<uint8_t> Interleaved(uint32_t videoFrames, uint32_t audioChunks) {
     AviMainFields main;
     main.totalFrames = videoFrames;
     main.streams = 2;
-    Bytes hdrl = AviHdrl(main, {AviStrl(AviVideoStream(1, 25, videoFrames), AviVideoFormat(16, 16, "FMP4")),
-                                AviStrl(AviAudioStream(16000, audioChunks * 4000), AviAudioFormat(1, 1, 8000, 16000, 2, 16))});
+    Bytes hdrl =
+        AviHdrl(main, {AviStrl(AviVideoStream(1, 25, videoFrames), AviVideoFormat(16, 16, "FMP4")),
+                       AviStrl(AviAudioStream(16000, audioChunks * 4000), AviAudioFormat(1, 1, 8000, 16000, 2, 16))});
     std::vector<AviFrame> frames;
     for (uint32_t i = 0; i < videoFrames || i < audioChunks; ++i) {
         if (i < videoFrames) frames.push_back({0, "dc", Bytes().be32(i).zeros(5), i % 10 == 0 ? 0x10u : 0u});
@@ -134,18 +135,26 @@ TEST_F(AviHeaders, ClipAndStreamsOfEachHeaderList) {
         AviMainFields main;
         const char *clip, *parser;
     } cases[] = {
-        {"ntsc", {AviStrl(AviVideoStream(1001, 30000, 300), AviVideoFormat(320, 240, "FMP4"))}, ntsc,
+        {"ntsc",
+         {AviStrl(AviVideoStream(1001, 30000, 300), AviVideoFormat(320, 240, "FMP4"))},
+         ntsc,
          "avi size=224 dur=10 bps=179 video=1 vbps=179 w=320 h=240 fps=30",
          "ms=10010 streams=1 types=464d5034/ffffffff/ffffffff flags=10000000 index=0"},
-        {"junk", {VideoStrl(), RiffChunk("JUNK", Bytes().zeros(24)), AudioStrl()}, AviMainFields(),
+        {"junk",
+         {VideoStrl(), RiffChunk("JUNK", Bytes().zeros(24)), AudioStrl()},
+         AviMainFields(),
          "avi size=358 dur=2 bps=1432 video=1 vbps=1432 w=64 h=48",
          "ms=2000 streams=1 types=464d5034/ffffffff/ffffffff flags=10000000 index=0"},
-        {"no rate", {VideoStrl(0), AudioStrl(48000)}, AviMainFields(),
+        {"no rate",
+         {VideoStrl(0), AudioStrl(48000)},
+         AviMainFields(),
          "avi size=326 dur=3 bps=869 audio=1 video=1 abps=16000 hz=8000 ch=1 bits=16 vbps=4294952165 w=64 h=48",
          "ms=3000 streams=2 types=464d5034/1/ffffffff flags=10000000 index=0"},
-        {"three streams", {AviStrl(xvid, AviVideoFormat(64, 48, "XVID")), AudioStrl(),
-                           AviStrl(AviVideoStream(1, 30, 90), AviVideoFormat(999, 999, "DIVX"))},
-         AviMainFields(), "avi size=450 dur=2 bps=1800 audio=1 video=1 abps=16000 hz=8000 ch=1 bits=16 vbps=4294953096 w=64 h=48",
+        {"three streams",
+         {AviStrl(xvid, AviVideoFormat(64, 48, "XVID")), AudioStrl(),
+          AviStrl(AviVideoStream(1, 30, 90), AviVideoFormat(999, 999, "DIVX"))},
+         AviMainFields(),
+         "avi size=450 dur=2 bps=1800 audio=1 video=1 abps=16000 hz=8000 ch=1 bits=16 vbps=4294953096 w=64 h=48",
          "ms=2000 streams=2 types=58564944/1/ffffffff flags=10000000 index=0"},
     };
     for (const auto& c : cases) {
@@ -175,8 +184,9 @@ TEST_F(AviHeaders, AudioBitRateIsBytesPerSecondAndVideoGetsTheDifference) {
     ASSERT_EQ(padded.size(), 2000000u);
     std::string path = dir.Write("hundred.avi", padded);
     EXPECT_EQ(metainfo::AVI_GetClipInfo(path.c_str(), &clip), MM_OK);
-    EXPECT_EQ(ClipSummary(clip), "avi size=2000000 dur=100 bps=160000 audio=1 video=1 abps=16000 hz=8000 ch=1 bits=16 "
-                                 "vbps=144000 w=64 h=48 fps=25");
+    EXPECT_EQ(ClipSummary(clip),
+              "avi size=2000000 dur=100 bps=160000 audio=1 video=1 abps=16000 hz=8000 ch=1 bits=16 "
+              "vbps=144000 w=64 h=48 fps=25");
     int mask = 0;
     EXPECT_EQ(MM_MediaExtractor_GetTrackType(path.c_str(), MEDIA_TYPE_AVI, &mask), MM_OK);
     EXPECT_EQ(mask, TRACK_AUDIO | TRACK_VIDEO);
@@ -217,7 +227,8 @@ TEST_F(AviHeaders, OversizedAndTruncatedChunksAreRejectedWithoutFaults) {
     EXPECT_EQ(metainfo::AVI_GetClipInfo(Write({RiffList("strl", {odd})}).c_str(), &clip), MM_OK);
     // Every truncation of a valid file.
     for (size_t n = 0; n < good.size(); ++n) {
-        std::string path = dir.Write("cut.avi", std::vector<uint8_t>(good.begin(), good.begin() + static_cast<long>(n)));
+        std::string path =
+            dir.Write("cut.avi", std::vector<uint8_t>(good.begin(), good.begin() + static_cast<long>(n)));
         metainfo::AVI_GetClipInfo(path.c_str(), &clip);
         int mask = 0;
         metainfo::AVI_GetTrackType(path.c_str(), &mask);
@@ -239,10 +250,13 @@ TEST_F(AviHeaders, InitTwiceStartsAfresh) {
 // length; entries keep their fields; an entry of a stream without a slot stops
 // the index, keeping the earlier entries.
 TEST(AviIndex, EntryTimesAndFields) {
-    const struct { std::vector<uint8_t> file; uint32_t stream; std::vector<uint32_t> times; } cases[] = {
-        {AviVideoOnly(5, 1), 0, {0, 40, 80, 120, 160}},
-        {AviVideoOnly(4, 1, 1001, 30000), 0, {0, 33, 66, 99}},
-        {Interleaved(10, 4), 1, {0, 250, 500, 750}}};
+    const struct {
+        std::vector<uint8_t> file;
+        uint32_t stream;
+        std::vector<uint32_t> times;
+    } cases[] = {{AviVideoOnly(5, 1), 0, {0, 40, 80, 120, 160}},
+                 {AviVideoOnly(4, 1, 1001, 30000), 0, {0, 33, 66, 99}},
+                 {Interleaved(10, 4), 1, {0, 250, 500, 750}}};
     for (const auto& c : cases) {
         Indexed f(c.file);
         ASSERT_EQ(f.Open(), MM_OK);
@@ -256,8 +270,10 @@ TEST(AviIndex, EntryTimesAndFields) {
     EXPECT_EQ(f.Entry(1).wStream, 1u);
     EXPECT_EQ(f.Entry(1).wType, 0x7762u) << "wb";
     Bytes hdrl = AviHdrl(AviMainFields(), {AviStrl(AviVideoStream(1, 25, 3), AviVideoFormat(16, 16, "FMP4"))});
-    std::vector<AviFrame> frames{{0, "dc", Bytes().zeros(4), 0x10}, {0, "dc", Bytes().zeros(4), 0},
-                                 {5, "tx", Bytes().zeros(4), 0}, {0, "dc", Bytes().zeros(4), 0}};
+    std::vector<AviFrame> frames{{0, "dc", Bytes().zeros(4), 0x10},
+                                 {0, "dc", Bytes().zeros(4), 0},
+                                 {5, "tx", Bytes().zeros(4), 0},
+                                 {0, "dc", Bytes().zeros(4), 0}};
     Indexed stopped(AviFile(hdrl, frames));
     EXPECT_EQ(stopped.Open(), MM_E_FAIL);
     ASSERT_EQ(stopped->getIndexCount(), 4u);
@@ -344,8 +360,8 @@ TEST(AviFrames, SeekingAndReadingNeedTheIndexAndValidArguments) {
 TEST(AviFrames, OffsetsAndLengthsOutsideMoviAreRefused) {
     Bytes file(VideoWithFlags({0x10, 0x10, 0x10, 0x10}));
     size_t idx1 = file.size() - 4 * 16;
-    file.patch_le32(idx1 + 8, 0x7FFFFFF0);                               // entry 0: offset far past movi
-    file.patch_le32(idx1 + 16 + 12, 0x7FFFFFF0);                         // entry 1: length above movi
+    file.patch_le32(idx1 + 8, 0x7FFFFFF0);  // entry 0: offset far past movi
+    file.patch_le32(idx1 + 16 + 12, 0x7FFFFFF0);  // entry 1: length above movi
     file.patch_le32(idx1 + 32 + 8, static_cast<uint32_t>(file.size()));  // entry 2: data past the file
     Indexed f(file.data());
     ASSERT_EQ(f.Open(), MM_OK);
@@ -388,7 +404,8 @@ TEST_P(AviFromFfmpeg, ClipAndFramesAgreeWithFfprobe) {
     TempDir dir;
     std::string path = dir.PathOf("out.avi");
     if (!FfmpegWrite(std::string("-f lavfi -i testsrc=d=2:s=176x144:r=25 -f lavfi -i sine=d=2 -c:v ") +
-                         GetParam().video + " -c:a " + GetParam().audio, path)) {
+                         GetParam().video + " -c:a " + GetParam().audio,
+                     path)) {
         GTEST_SKIP() << "ffmpeg could not write " << GetParam().video;
     }
 

@@ -229,9 +229,12 @@ TEST(Records, ByteReaderAndSync) {
     const uint8_t syncsafe[] = {0x00, 0x00, 0x02, 0x01};
     EXPECT_EQ(ReadSyncsafe32(syncsafe), 257u);
     // Unsynchronisation drops the zero after each FF but looks no further.
-    const struct { std::vector<uint8_t> in, out; } cases[] = {
-        {{0xFF, 0x00}, {0xFF}}, {{0xFF, 0x00, 0x00}, {0xFF, 0x00}}, {{0xFF, 0xFF, 0x00}, {0xFF, 0xFF, 0x00}},
-        {{0x12, 0xFF, 0x00, 0xE0, 0xFF}, {0x12, 0xFF, 0xE0, 0xFF}}};
+    const struct {
+        std::vector<uint8_t> in, out;
+    } cases[] = {{{0xFF, 0x00}, {0xFF}},
+                 {{0xFF, 0x00, 0x00}, {0xFF, 0x00}},
+                 {{0xFF, 0xFF, 0x00}, {0xFF, 0xFF, 0x00}},
+                 {{0x12, 0xFF, 0x00, 0xE0, 0xFF}, {0x12, 0xFF, 0xE0, 0xFF}}};
     for (auto c : cases) {
         c.in.resize(static_cast<size_t>(Sync(c.in.data(), static_cast<int>(c.in.size()))));
         EXPECT_EQ(c.in, c.out);
@@ -241,7 +244,11 @@ TEST(Records, ByteReaderAndSync) {
 
 TEST(Detect, EverySignatureGivesItsMediaType) {
     TempDir dir;
-    const struct { const char* name; Bytes head; int type; } cases[] = {
+    const struct {
+        const char* name;
+        Bytes head;
+        int type;
+    } cases[] = {
         {"ftyp", Bytes().be32(24).str("ftypisom"), MEDIA_TYPE_MP4},
         {"mdat", Bytes().be32(8).str("mdat"), MEDIA_TYPE_MP4},
         {"asf", AsfHead(), MEDIA_TYPE_ASF},
@@ -282,7 +289,10 @@ TEST(Detect, ShortMissingAndNullInputsFail) {
 
 TEST(CheckMediaType, EveryExtensionGroupAcceptsItsContentAndRejectsOther) {
     TempDir dir;
-    const struct { std::vector<const char*> extensions; Bytes content; } groups[] = {
+    const struct {
+        std::vector<const char*> extensions;
+        Bytes content;
+    } groups[] = {
         {{".mp3", ".mpga"}, Mp3Stream()},
         {{".aac"}, AdtsStream()},
         {{".wma", ".wmv", ".asf"}, AsfHead()},
@@ -301,14 +311,19 @@ TEST(CheckMediaType, EveryExtensionGroupAcceptsItsContentAndRejectsOther) {
         for (const char* ext : g.extensions) {
             std::string name = "f" + std::to_string(n++);
             EXPECT_EQ(MM_MediaExtractor_CheckMediaType(dir.Write(name + ext, Head(g.content)).c_str()), MM_OK) << ext;
-            EXPECT_NE(MM_MediaExtractor_CheckMediaType(dir.Write(name + "z" + ext, Head(Bytes().str("JUNK"))).c_str()), MM_OK)
+            EXPECT_NE(MM_MediaExtractor_CheckMediaType(dir.Write(name + "z" + ext, Head(Bytes().str("JUNK"))).c_str()),
+                      MM_OK)
                 << ext;
         }
     }
     // A sixteen-byte WAVE file matches only WAVE extensions; unlisted extensions and
     // Sun audio fail even when detected; a path without a dot has no extension.
     const Bytes wave = Bytes().str("RIFF").le32(8).str("WAVE").zeros(4);
-    const struct { const char* name; std::vector<uint8_t> file; int32_t result; } cases[] = {
+    const struct {
+        const char* name;
+        std::vector<uint8_t> file;
+        int32_t result;
+    } cases[] = {
         {"a.wav", wave.data(), MM_OK},
         {"b.WAV", wave.data(), MM_OK},
         {"c.avi", wave.data(), MM_E_UNSUPPORTED},
@@ -317,7 +332,8 @@ TEST(CheckMediaType, EveryExtensionGroupAcceptsItsContentAndRejectsOther) {
         {"nodot", Head(Bytes().str("#!AMR\n")), MM_E_NOEXTENSION},
     };
     ASSERT_EQ(dir.path().find('.'), std::string::npos) << "temporary folder must not contain a dot";
-    for (const auto& c : cases) EXPECT_EQ(MM_MediaExtractor_CheckMediaType(dir.Write(c.name, c.file).c_str()), c.result) << c.name;
+    for (const auto& c : cases)
+        EXPECT_EQ(MM_MediaExtractor_CheckMediaType(dir.Write(c.name, c.file).c_str()), c.result) << c.name;
     EXPECT_EQ(Detect(dir.PathOf("a.wav")), MEDIA_TYPE_WAVE);
     EXPECT_EQ(Detect(dir.PathOf("nodot")), MEDIA_TYPE_AMR_NB);
     // The ".aac" check passes the AAC check's result through, whatever the file is detected as.
@@ -334,9 +350,15 @@ TEST(CheckMediaType, EveryExtensionGroupAcceptsItsContentAndRejectsOther) {
 TEST(Corpus, DetectionAnswersEveryReadableFileAndKnowsTheObviousOnes) {
     const std::string root = testing_support::CorpusDir();
     if (root.empty()) GTEST_SKIP() << testing_support::NoCorpusReason();
-    const std::set<std::string> mp3 = {"/mutagen/silence-44-s.mp3", "/mutagen/silence-44-s-v1.mp3", "/mutagen/xing.mp3",
-                                       "/mutagen/vbri.mp3", "/mutagen/lame.mp3", "/mutagen/silence-44-s-mpeg2.mp3",
-                                       "/mutagen/silence-44-s-mpeg25.mp3", "/taglib/lame_cbr.mp3", "/taglib/lame_vbr.mp3"};
+    const std::set<std::string> mp3 = {"/mutagen/silence-44-s.mp3",
+                                       "/mutagen/silence-44-s-v1.mp3",
+                                       "/mutagen/xing.mp3",
+                                       "/mutagen/vbri.mp3",
+                                       "/mutagen/lame.mp3",
+                                       "/mutagen/silence-44-s-mpeg2.mp3",
+                                       "/mutagen/silence-44-s-mpeg25.mp3",
+                                       "/taglib/lame_cbr.mp3",
+                                       "/taglib/lame_vbr.mp3"};
     size_t mp3Found = 0;
     for (const char* sub : {"/mutagen", "/taglib"}) {
         for (const auto& entry : std::filesystem::directory_iterator(root + sub)) {
@@ -357,7 +379,9 @@ TEST(Corpus, DetectionAnswersEveryReadableFileAndKnowsTheObviousOnes) {
                 EXPECT_EQ(type, MEDIA_TYPE_MP3) << path;
             } else if (ext == ".m4a" || ext == ".mp4" || ext == ".3g2" || ext == ".m4b" || ext == ".m4v") {
                 // MP4 is known by a leading "ftyp" or "mdat"; the 64bit files open with "moov".
-                if (path.find("64bit") == std::string::npos) { EXPECT_EQ(type, MEDIA_TYPE_MP4) << path; }
+                if (path.find("64bit") == std::string::npos) {
+                    EXPECT_EQ(type, MEDIA_TYPE_MP4) << path;
+                }
             } else if (ext == ".wma") {
                 EXPECT_EQ(type, MEDIA_TYPE_ASF) << path;
             } else if (ext == ".wav" && path.find("rf64") == std::string::npos) {

@@ -151,11 +151,9 @@ TEST(PlainFile, EveryReadAnswersTheFileBytesAndARewriteIsSeen) {
         size_t n;
     };
     const Step kSteps[] = {
-        {0, 0, 128},        {1, 300000, 64},    {0, 20000, 10},     {0, 12288, 7712},
-        {1, 12000, 9000},   {0, 4000, 200},     {1, 0, 10},         {0, 70000, 9000},
-        {1, 65536, 200000}, {0, 299990, 50},    {1, 8192, 4096},    {0, 4096, 100000},
-        {1, 307190, 20},    {0, 307200, 10},    {1, 123456, 1},     {0, 200000, 107200},
-        {1, 0, 307200},
+        {0, 0, 128},     {1, 300000, 64},  {0, 20000, 10},     {0, 12288, 7712},    {1, 12000, 9000}, {0, 4000, 200},
+        {1, 0, 10},      {0, 70000, 9000}, {1, 65536, 200000}, {0, 299990, 50},     {1, 8192, 4096},  {0, 4096, 100000},
+        {1, 307190, 20}, {0, 307200, 10},  {1, 123456, 1},     {0, 200000, 107200}, {1, 0, 307200},
     };
     constexpr size_t kSize = 307200;
     // A file older than two seconds whose bytes a thread holds is opened only
@@ -182,9 +180,11 @@ TEST(PlainFile, EveryReadAnswersTheFileBytesAndARewriteIsSeen) {
             SCOPED_TRACE(testing::Message() << "read " << s.n << " at " << s.pos);
             std::vector<uint8_t> got(s.n, 0xEE);
             ASSERT_EQ(MEx_fseek(h[s.handle], s.pos, SEEK_SET), 0);
-            const size_t want = s.pos >= static_cast<int64_t>(kSize) ? 0 : std::min(s.n, kSize - static_cast<size_t>(s.pos));
+            const size_t want =
+                s.pos >= static_cast<int64_t>(kSize) ? 0 : std::min(s.n, kSize - static_cast<size_t>(s.pos));
             EXPECT_EQ(MEx_fread(got.data(), 1, static_cast<unsigned>(s.n), h[s.handle]), static_cast<int>(want));
-            EXPECT_TRUE(std::equal(got.begin(), got.begin() + static_cast<std::ptrdiff_t>(want), bytes.begin() + static_cast<std::ptrdiff_t>(s.pos)));
+            EXPECT_TRUE(std::equal(got.begin(), got.begin() + static_cast<std::ptrdiff_t>(want),
+                                   bytes.begin() + static_cast<std::ptrdiff_t>(s.pos)));
             EXPECT_EQ(MEx_feof(h[s.handle]), want < s.n ? 1 : 0);
             EXPECT_EQ(MEx_ftell(h[s.handle]), s.pos + static_cast<int64_t>(want));
         }
@@ -298,9 +298,9 @@ TEST_F(Protected, CheckDRMDecidesByCaseSensitiveSuffixAndServiceAnswer) {
 
 TEST_F(Protected, MetadataKeysAreExactHexParsedCutAndLastWins) {
     std::string longId(600, 'i');
-    service.metadata["/m.dcf"] = {{"contentid", longId}, {"contenttype", "audio/mpeg"},
-                                  {"rightsuri", "http://r"}, {"contentlen", "1f4"},
-                                  {"ContentLen", "ffff"}, {"drmtype", "2"}, {"drmtype", "3"}};
+    service.metadata["/m.dcf"] = {{"contentid", longId}, {"contenttype", "audio/mpeg"}, {"rightsuri", "http://r"},
+                                  {"contentlen", "1f4"}, {"ContentLen", "ffff"},        {"drmtype", "2"},
+                                  {"drmtype", "3"}};
     _DRM_METADATA meta;
     ASSERT_EQ(GetDRMMetaInfo("/m.dcf", nullptr, &meta), 0);
     EXPECT_EQ(meta.nContentLength, 500u);
@@ -316,8 +316,8 @@ TEST_F(Protected, MetadataKeysAreExactHexParsedCutAndLastWins) {
 }
 
 TEST_F(Protected, ReadsCountBytesAndStopAtTheContentLength) {
-    std::string path = WriteProtected("song.dcf", Bytes().str("0123456789ABCDEF"),
-                                      {{"drmtype", "1"}, {"contentlen", "c"}});
+    std::string path =
+        WriteProtected("song.dcf", Bytes().str("0123456789ABCDEF"), {{"drmtype", "1"}, {"contentlen", "c"}});
     int h = MEx_fopen(path.c_str(), "rb");
     ASSERT_NE(h, 0);
     char buf[16] = {0};
@@ -395,8 +395,8 @@ TEST_F(Protected, SessionKindsAndDetection) {
     EXPECT_EQ(service.openSessions, 0);
     MEx_fclose(h);
 
-    std::string wave = WriteProtected("tone.dcf", Bytes().str("RIFF").le32(28).str("WAVE").str("fmt ").le32(16).zeros(16),
-                                      {{"drmtype", "1"}});
+    std::string wave = WriteProtected(
+        "tone.dcf", Bytes().str("RIFF").le32(28).str("WAVE").str("fmt ").le32(16).zeros(16), {{"drmtype", "1"}});
     int type = -1;
     ASSERT_EQ(MM_MediaExtractor_DetectMediaType(wave.c_str(), &type), MM_OK);
     EXPECT_EQ(type, MEDIA_TYPE_WAVE);

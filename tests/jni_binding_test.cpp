@@ -113,7 +113,8 @@ struct FakeJvm {
         };
         functions.RegisterNatives = [](JNIEnv*, jclass, const JNINativeMethod* methods, jint n) -> jint {
             Enter("RegisterNatives");
-            for (jint i = 0; i < n; ++i) g_jvm->registered.push_back(std::string(methods[i].name) + methods[i].signature);
+            for (jint i = 0; i < n; ++i)
+                g_jvm->registered.push_back(std::string(methods[i].name) + methods[i].signature);
             if (g_jvm->registerResult < 0) Raise("java/lang/NoSuchMethodError");
             return g_jvm->registerResult;
         };

@@ -60,16 +60,18 @@ std::string InfoSummary(const Probe& p) {
     if (p.infoResult != MM_OK) return std::to_string(p.infoResult);
     const _MP3AudioInfo& i = p.info;
     char text[256];
-    std::snprintf(text, sizeof text, "kind=%u tag=%u avg=%u dur=%u spf=%u xing=%u/%x frames=%u bytes=%u q=%d toc=%d vbri=%x/%u",
-                  i.headerKind, i.tagBytes, i.avgBitRate, i.duration, i.samplesPerFrame, i.xingOffset, i.xingFlags,
-                  i.totalFrames, i.totalBytes, i.quality, i.xingToc != nullptr ? i.xingToc[50] : -1, i.vbriDelay,
-                  i.vbriFramesPerEntry);
+    std::snprintf(
+        text, sizeof text, "kind=%u tag=%u avg=%u dur=%u spf=%u xing=%u/%x frames=%u bytes=%u q=%d toc=%d vbri=%x/%u",
+        i.headerKind, i.tagBytes, i.avgBitRate, i.duration, i.samplesPerFrame, i.xingOffset, i.xingFlags, i.totalFrames,
+        i.totalBytes, i.quality, i.xingToc != nullptr ? i.xingToc[50] : -1, i.vbriDelay, i.vbriFramesPerEntry);
     return text;
 }
 
 using Frames = std::vector<Data>;
 
-std::string Item(const _MMMetaItem& item) { return std::string(reinterpret_cast<const char*>(item.szData), item.nLength); }
+std::string Item(const _MMMetaItem& item) {
+    return std::string(reinterpret_cast<const char*>(item.szData), item.nLength);
+}
 
 struct Meta {
     _MMMetaInfo meta;
@@ -110,13 +112,15 @@ int32_t ParseAt(const Data& file, long offset, uint32_t bound, Meta* m,
 }
 
 constexpr uint32_t kFrame = 417;  // MPEG-1 Layer III, 128 kbit/s, 44100 Hz
-constexpr int kFrames = 1152;     // 480,384 bytes: 30 s at 16,000 bytes/s
+constexpr int kFrames = 1152;  // 480,384 bytes: 30 s at 16,000 bytes/s
 
 struct Buffer {
     unsigned char* data = nullptr;
     int size = 0;
     int32_t result = 0;
-    Buffer(const std::string& path, int start, int end) { result = MP3_GetAudioData2Buf(path.c_str(), start, end, &data, &size); }
+    Buffer(const std::string& path, int start, int end) {
+        result = MP3_GetAudioData2Buf(path.c_str(), start, end, &data, &size);
+    }
     Buffer(const Buffer&) = delete;
     ~Buffer() { MM_MediaExtractor_FreeBuffer(data); }
 };
@@ -135,8 +139,10 @@ std::string RunCommand(const std::string& command) {
 // when ffmpeg cannot decode it cleanly.
 double DecodedSeconds(const std::string& path) {
     if (RunCommand("/usr/bin/ffmpeg -nostdin -v error -i '" + path + "' -f null - 2>&1") != "") return -1;
-    const std::string out = RunCommand("/usr/bin/ffprobe -v error -count_frames -select_streams a:0 -show_entries "
-                                       "stream=nb_read_frames,sample_rate -of csv=p=0 '" + path + "'");
+    const std::string out = RunCommand(
+        "/usr/bin/ffprobe -v error -count_frames -select_streams a:0 -show_entries "
+        "stream=nb_read_frames,sample_rate -of csv=p=0 '" +
+        path + "'");
     unsigned rate = 0, frames = 0;
     if (std::sscanf(out.c_str(), "%u,%u", &rate, &frames) != 2 || rate == 0) return -1;
     return frames * 1152.0 / rate;
@@ -178,9 +184,14 @@ int AskEverything(const std::string& path, const std::string& out) {
 
 TEST(Mp3Frame, SizesFieldsAndRejectedHeaders) {
     // {version, layer, bitrateIndex, samplingIndex, padding}
-    const struct { Mp3Shape shape; int size; } sizes[] = {
-        {{}, 417}, {{3, 3, 9, 0, 1}, 418}, {{3, 1, 1, 1, 1}, (32000 * 12 / 48000 + 1) * 4},
-        {{2, 3, 8}, 64000 * 72 / 22050}, {{0, 3, 1, 2}, 72}};
+    const struct {
+        Mp3Shape shape;
+        int size;
+    } sizes[] = {{{}, 417},
+                 {{3, 3, 9, 0, 1}, 418},
+                 {{3, 1, 1, 1, 1}, (32000 * 12 / 48000 + 1) * 4},
+                 {{2, 3, 8}, 64000 * 72 / 22050},
+                 {{0, 3, 1, 2}, 72}};
     uint32_t signature = 0;
     for (const auto& c : sizes) EXPECT_EQ(MP3GetFrameSize(Mp3Header(c.shape).data(), &signature, nullptr), c.size);
     const Data bad[] = {
@@ -197,7 +208,8 @@ TEST(Mp3Frame, SizesFieldsAndRejectedHeaders) {
     ASSERT_GT(MP3GetFrameSize(Mp3Header({2, 2, 9, 1, 0, 3, true}).data(), &signature, &info), 0);
     EXPECT_EQ(std::make_tuple(info.versionId, info.layerIndex, info.channelMode, info.protectionBit),
               std::make_tuple(2, 1, 3, 0));
-    EXPECT_EQ(std::make_tuple(info.sampleRate, info.bitRate, info.samplesPerFrame), std::make_tuple(24000u, 80000u, 1152u));
+    EXPECT_EQ(std::make_tuple(info.sampleRate, info.bitRate, info.samplesPerFrame),
+              std::make_tuple(24000u, 80000u, 1152u));
     EXPECT_EQ(signature, 1u << 4 | 2u << 6 | 1u << 2);  // LSF Layer II index 9 is 80 kbit/s
 }
 
@@ -207,23 +219,36 @@ TEST(Mp3Sync, TagsAreSkippedAndTwoConsecutiveFramesMakeAStream) {
     const Data tag = Id3v2Tag(3, Data(20, 0x11));  // 30 bytes
     const Data footer = Cat({Id3v2Tag(4, Data(20, 0x11), 0x10), Data(10, 0)});
     const Data frames = Mp3Frames(3);
-    const struct { const char* name; Data file; int32_t result; long position; } tags[] = {
-        {"untagged", frames, MM_OK, 0},           {"two tags", Cat({tag, tag, frames}), MM_OK, 60},
-        {"footer", Cat({footer, frames}), MM_OK, 40}, {"fourth tag stays", Cat({tag, tag, tag, tag, frames}), MM_OK, 90},
-        {"9 bytes", Bytes().str("ID3").zeros(6).data(), MM_E_FAIL, -1},
-        {"10 bytes", Bytes().str("ID3").zeros(7).data(), MM_OK, 0}};
+    const struct {
+        const char* name;
+        Data file;
+        int32_t result;
+        long position;
+    } tags[] = {{"untagged", frames, MM_OK, 0},
+                {"two tags", Cat({tag, tag, frames}), MM_OK, 60},
+                {"footer", Cat({footer, frames}), MM_OK, 40},
+                {"fourth tag stays", Cat({tag, tag, tag, tag, frames}), MM_OK, 90},
+                {"9 bytes", Bytes().str("ID3").zeros(6).data(), MM_E_FAIL, -1},
+                {"10 bytes", Bytes().str("ID3").zeros(7).data(), MM_OK, 0}};
     TempDir dir;
     for (const auto& c : tags) {
         const int h = MEx_fopen(dir.Write("t.mp3", c.file).c_str(), "rb");
         EXPECT_EQ(CheckID3Header(h), c.result) << c.name;
-        if (c.position >= 0) { EXPECT_EQ(MEx_ftell(h), c.position) << c.name; }
+        if (c.position >= 0) {
+            EXPECT_EQ(MEx_ftell(h), c.position) << c.name;
+        }
         MEx_fclose(h);
     }
     Mp3Shape other;
     other.samplingIndex = 1;
     Data noise(5000);
     for (size_t i = 0; i < noise.size(); ++i) noise[i] = static_cast<uint8_t>(i * 131 + 7);
-    const struct { const char* name; Data file; int32_t result; uint32_t offset; } streams[] = {
+    const struct {
+        const char* name;
+        Data file;
+        int32_t result;
+        uint32_t offset;
+    } streams[] = {
         {"after a tag", Cat({Id3v2Tag(3, Data(100, 0)), Data(7, 0), Mp3Frames(2)}), MM_OK, 117},
         {"undecodable candidate skipped", Cat({{0xFF, 0xFB, 0xF0, 0x00, 0, 0, 0}, Mp3Frames(2)}), MM_OK, 7},
         {"sampling rate changes", Cat({Mp3Frame({}), Mp3Frame(other), Mp3Frames(6)}), MM_E_UNSUPPORTED, 0},
@@ -242,7 +267,8 @@ TEST(Mp3Sync, TagsAreSkippedAndTwoConsecutiveFramesMakeAStream) {
         EXPECT_EQ(MM_MediaExtractor_DetectMediaType(path.c_str(), &type), MM_OK) << c.name;
         EXPECT_EQ(type == MEDIA_TYPE_MP3, c.result == MM_OK) << c.name;
         if (c.result != MM_OK) continue;
-        EXPECT_EQ(std::tie(info.firstFrameOffset, info.frameSize, info.bitRate), std::make_tuple(c.offset, 417u, 128000u));
+        EXPECT_EQ(std::tie(info.firstFrameOffset, info.frameSize, info.bitRate),
+                  std::make_tuple(c.offset, 417u, 128000u));
     }
     EXPECT_EQ(Probe(streams[2].file).clipResult, MM_E_UNSUPPORTED);
 }
@@ -250,7 +276,7 @@ TEST(Mp3Sync, TagsAreSkippedAndTwoConsecutiveFramesMakeAStream) {
 // Stream kind and sizes of one file from the clip and the audio-information requests.
 TEST(Mp3Stream, KindDurationAndRatesOfEachStreamShape) {
     Mp3Shape low, high, mono, lsf, lsfMono, mpeg25, mpeg25Mono;
-    low.bitrateIndex = 1;    // 32 kbit/s
+    low.bitrateIndex = 1;  // 32 kbit/s
     high.bitrateIndex = 14;  // 320 kbit/s
     mono.channelMode = lsfMono.channelMode = mpeg25Mono.channelMode = 3;
     lsf.version = lsfMono.version = 2;
@@ -267,7 +293,12 @@ TEST(Mp3Stream, KindDurationAndRatesOfEachStreamShape) {
     vbri.bytes = 400000;
     vbri.framesPerEntry = 100;
     vbri.scale = 3;
-    const struct { const char* name; Data file; const char* clip; const char* info; } cases[] = {
+    const struct {
+        const char* name;
+        Data file;
+        const char* clip;
+        const char* info;
+    } cases[] = {
         // 1,600,000 audio bytes from the first frame, then an ID3v1 tag that is not audio.
         {"cbr", Cat({Mp3Frames(3836), Data(1600000 - 3836 * 417, 0), Id3v1Titled("")}),
          "mp3 size=1600128 dur=100 bps=128000 audio=1 abps=128000 hz=44100 ch=2 bits=16 spf=2304",
@@ -284,15 +315,12 @@ TEST(Mp3Stream, KindDurationAndRatesOfEachStreamShape) {
         {"xing bytes only", Then20Frames(XingFrame(bytesOnly)),
          "mp3 size=8757 dur=97391 audio=1 hz=44100 ch=2 bits=16 spf=2304",
          "kind=2 tag=0 avg=0 dur=0 spf=1152 xing=36/2 frames=0 bytes=0 q=-1 toc=-1 vbri=0/0"},
-        {"xing of 0 frames", Then20Frames(XingFrame(zero)),
-         "mp3 size=8757 audio=1 hz=44100 ch=2 bits=16 spf=2304",
+        {"xing of 0 frames", Then20Frames(XingFrame(zero)), "mp3 size=8757 audio=1 hz=44100 ch=2 bits=16 spf=2304",
          "kind=2 tag=0 avg=0 dur=0 spf=1152 xing=36/1 frames=0 bytes=0 q=-1 toc=-1 vbri=0/0"},
         // Xing stands at 21 for MPEG-1 mono and MPEG-2 stereo, at 13 for MPEG-2 mono; "Info" is not read.
-        {"xing mono", Then20Frames(XingFrame({}, mono), mono),
-         "mp3 size=8757 audio=1 hz=44100 ch=1 bits=16 spf=1152",
+        {"xing mono", Then20Frames(XingFrame({}, mono), mono), "mp3 size=8757 audio=1 hz=44100 ch=1 bits=16 spf=1152",
          "kind=2 tag=0 avg=128000 dur=0 spf=1152 xing=21/f frames=0 bytes=0 q=57 toc=128 vbri=0/0"},
-        {"xing lsf", Then20Frames(XingFrame({}, lsf), lsf),
-         "mp3 size=4368 audio=1 hz=22050 ch=2 bits=16 spf=2304",
+        {"xing lsf", Then20Frames(XingFrame({}, lsf), lsf), "mp3 size=4368 audio=1 hz=22050 ch=2 bits=16 spf=2304",
          "kind=2 tag=0 avg=64000 dur=0 spf=576 xing=21/f frames=0 bytes=0 q=57 toc=128 vbri=0/0"},
         {"xing lsf mono", Then20Frames(XingFrame({}, lsfMono), lsfMono),
          "mp3 size=4368 audio=1 hz=22050 ch=1 bits=16 spf=1152",
@@ -305,8 +333,7 @@ TEST(Mp3Stream, KindDurationAndRatesOfEachStreamShape) {
          "mp3 size=8757 dur=26 bps=2694 audio=1 abps=2694 hz=44100 ch=2 bits=16 spf=2304",
          "kind=3 tag=0 avg=128000 dur=26 spf=1152 xing=0/0 frames=1000 bytes=400000 q=3 toc=-1 vbri=102/100"},
         // MPEG-2.5 halves the samples per frame for stereo only.
-        {"mpeg-2.5", Mp3Frames(12, mpeg25),
-         "mp3 size=5004 bps=64000 audio=1 abps=64000 hz=11025 ch=2 bits=16 spf=288",
+        {"mpeg-2.5", Mp3Frames(12, mpeg25), "mp3 size=5004 bps=64000 audio=1 abps=64000 hz=11025 ch=2 bits=16 spf=288",
          "kind=1 tag=0 avg=64000 dur=0 spf=576 xing=0/0 frames=0 bytes=0 q=0 toc=-1 vbri=0/0"},
         {"mpeg-2.5 mono", Mp3Frames(12, mpeg25Mono),
          "mp3 size=5004 bps=64000 audio=1 abps=64000 hz=11025 ch=1 bits=16 spf=576",
@@ -355,11 +382,15 @@ TEST(Id3Tags, FrameTableFillsItemsFirstFrameWinsAndTextIsCutTo128Bytes) {
     const struct {
         const char* id;
         int item;
-    } table[] = {{"TPE1", META_ARTIST},   {"TALB", META_ALBUM},    {"TYER", META_YEAR},         {"TCOP", META_COPYRIGHT},
-                 {"TCOM", META_COMPOSER}, {"TRCK", META_TRACKNUMBER}, {"TLAN", META_LANGUAGE}, {"TFLT", META_FILETYPE},
-                 {"TPE3", META_CONDUCTOR}, {"TPUB", META_PUBLISHER}, {"TDAT", META_DATE},      {"TIME", META_TIME}};
-    Frames frames = {Text3("TIT2", std::string(300, 'x')), Text3("TIT2", "Second"), Text3("TXXX", "skipped"),
-                     Text3("TPE2", "Band"), Id3Frame(3, "PCNT", {0, 0, 1, 2}),
+    } table[] = {{"TPE1", META_ARTIST},    {"TALB", META_ALBUM},    {"TYER", META_YEAR},
+                 {"TCOP", META_COPYRIGHT}, {"TCOM", META_COMPOSER}, {"TRCK", META_TRACKNUMBER},
+                 {"TLAN", META_LANGUAGE},  {"TFLT", META_FILETYPE}, {"TPE3", META_CONDUCTOR},
+                 {"TPUB", META_PUBLISHER}, {"TDAT", META_DATE},     {"TIME", META_TIME}};
+    Frames frames = {Text3("TIT2", std::string(300, 'x')),
+                     Text3("TIT2", "Second"),
+                     Text3("TXXX", "skipped"),
+                     Text3("TPE2", "Band"),
+                     Id3Frame(3, "PCNT", {0, 0, 1, 2}),
                      Id3Frame(3, "POPM", {'a', '@', 'b', 0, 196, 0})};
     for (const auto& row : table) frames.push_back(Text3(row.id, row.id));
     const Meta m(Tagged(3, frames));
@@ -393,12 +424,17 @@ TEST(Id3Tags, FailedV2KeepsItsItemsUnlessV1ReplacesThemWholeAndV2WinsOverV1) {
 // v2.4's encoding byte decides the code, v2.3 keeps Latin-1 for any but
 // UTF-16, whose little-endian text is delivered big-endian; a UTF-8 mark gives UTF-8.
 TEST(Id3Tags, EncodingsAndTheirCodes) {
-    const struct { int version; Data body, text; uint32_t code; } cases[] = {
-        {4, TextBody(3, "T\xC3\xA9"), {'T', 0xC3, 0xA9}, 5}, {4, TextBytes(2, {0, 'A'}), {0, 'A'}, 4},
-        {4, TextBody(7, "x"), {'x'}, 3},                     {3, TextBody(3, "T\xC3\xA9"), {'T', 0xC3, 0xA9}, 3},
-        {3, TextBytes(1, {0xFF, 0xFE, 'H', 0, 'i', 0}), {0xFE, 0xFF, 0, 'H', 0, 'i'}, 4},
-        {3, TextBytes(1, {0xFF, 0xFE, 'H', 0, 'i'}), {}, 0},  // odd length: left empty
-        {3, TextBytes(1, {0xEF, 0xBB, 0xBF, 'U'}), {0xEF, 0xBB, 0xBF, 'U'}, 5}};
+    const struct {
+        int version;
+        Data body, text;
+        uint32_t code;
+    } cases[] = {{4, TextBody(3, "T\xC3\xA9"), {'T', 0xC3, 0xA9}, 5},
+                 {4, TextBytes(2, {0, 'A'}), {0, 'A'}, 4},
+                 {4, TextBody(7, "x"), {'x'}, 3},
+                 {3, TextBody(3, "T\xC3\xA9"), {'T', 0xC3, 0xA9}, 3},
+                 {3, TextBytes(1, {0xFF, 0xFE, 'H', 0, 'i', 0}), {0xFE, 0xFF, 0, 'H', 0, 'i'}, 4},
+                 {3, TextBytes(1, {0xFF, 0xFE, 'H', 0, 'i'}), {}, 0},  // odd length: left empty
+                 {3, TextBytes(1, {0xEF, 0xBB, 0xBF, 'U'}), {0xEF, 0xBB, 0xBF, 'U'}, 5}};
     for (const auto& c : cases) {
         const Meta m(Tagged(c.version, {Id3Frame(c.version, "TIT2", c.body)}));
         EXPECT_EQ(m.Raw(META_TITLE), c.text) << &c - cases;
@@ -408,8 +444,12 @@ TEST(Id3Tags, EncodingsAndTheirCodes) {
 
 TEST(Id3Tags, GenreNumbersBelow148BecomeNames) {
     const std::pair<Data, std::string> cases[] = {
-        {TextBody(0, "(17)Rock"), "Rock"}, {TextBody(0, "(17)"), "Rock"},   {TextBody(0, "Rock"), "Rock"},
-        {TextBody(0, "(255)"), "(255)"},   {TextBody(0, "(-1)"), "(-1)"},   {TextBody(0, "(147)"), "Synthpop"},
+        {TextBody(0, "(17)Rock"), "Rock"},
+        {TextBody(0, "(17)"), "Rock"},
+        {TextBody(0, "Rock"), "Rock"},
+        {TextBody(0, "(255)"), "(255)"},
+        {TextBody(0, "(-1)"), "(-1)"},
+        {TextBody(0, "(147)"), "Synthpop"},
         {TextBody(0, "(67)"), "Psychadelic"},
         {TextBytes(1, {0xFF, 0xFE, '(', 0, '1', 0, '7', 0, ')', 0}), "Rock"},  // UTF-16 is compacted first
         {TextBytes(1, {0xFE, 0xFF, 0, '(', 0, '8', 0, ')'}), "Jazz"},
@@ -424,14 +464,24 @@ TEST(Id3Tags, GenreNumbersBelow148BecomeNames) {
 // TDRC is split by body size counting the encoding byte; a size outside the
 // list fills nothing, and a year already read keeps TDRC out.
 TEST(Id3Tags, RecordingTimeIsSplitByBodySize) {
-    const struct { int version; Frames frames; std::string year, date, time; } cases[] = {
-        {4, {Id3Frame(4, "TDRC", TextBody(0, "2004-05-0"))}, std::string("\0" "200", 4), "-05-0", ""},
-        {4, {Id3Frame(4, "TDRC", Bytes().str("2004-05-06T12").data())}, "2004", "05-06", "12"},
-        {4, {Id3Frame(4, "TDRC", TextBody(0, "2004"))}, "", "", ""},
-        {3, {Text3("TYER", "1999"), Id3Frame(3, "TDRC", {'2', '0', '0', '4'})}, "1999", "", ""}};
+    const struct {
+        int version;
+        Frames frames;
+        std::string year, date, time;
+    } cases[] = {{4,
+                  {Id3Frame(4, "TDRC", TextBody(0, "2004-05-0"))},
+                  std::string("\0"
+                              "200",
+                              4),
+                  "-05-0",
+                  ""},
+                 {4, {Id3Frame(4, "TDRC", Bytes().str("2004-05-06T12").data())}, "2004", "05-06", "12"},
+                 {4, {Id3Frame(4, "TDRC", TextBody(0, "2004"))}, "", "", ""},
+                 {3, {Text3("TYER", "1999"), Id3Frame(3, "TDRC", {'2', '0', '0', '4'})}, "1999", "", ""}};
     for (const auto& c : cases) {
         const Meta m(Tagged(c.version, c.frames));
-        EXPECT_EQ(std::make_tuple(m.Text(META_YEAR), m.Text(META_DATE), m.Text(META_TIME)), std::tie(c.year, c.date, c.time));
+        EXPECT_EQ(std::make_tuple(m.Text(META_YEAR), m.Text(META_DATE), m.Text(META_TIME)),
+                  std::tie(c.year, c.date, c.time));
     }
     EXPECT_EQ(Meta(Tagged(4, cases[1].frames)).Code(META_TIME), 3u);
 }
@@ -465,7 +515,8 @@ TEST(Id3Tags, PictureIsReadOnlyWithinTheLimit) {
     const Meta none(file, 0);  // limit 0: pictures are never read
     EXPECT_EQ(none.meta.pPicture, nullptr);
     EXPECT_EQ(none.meta.aItems[META_PICTURE_FORMAT].nLength, 0u);
-    const auto large = Tagged(3, {Id3Frame(3, "APIC", ApicBody("image/png", Data(600000 - 13)))});  // a 600,000-byte frame
+    const auto large =
+        Tagged(3, {Id3Frame(3, "APIC", ApicBody("image/png", Data(600000 - 13)))});  // a 600,000-byte frame
     EXPECT_EQ(Meta(large, 1).meta.pPicture, nullptr);
     EXPECT_EQ(Meta(large, 600000).meta.nPictureSize, 600000u - 13);
 }
@@ -482,8 +533,10 @@ TEST(Id3Tags, V22FramesHaveThreeLetterIdsAndPictureFormat) {
 TEST(Id3Tags, UnsynchronisedTagIsRestoredAndItsPictureFormatCountsTheZero) {
     const Data picture = {0xFF, 0xD8, 0xFF, 0x00, 0xFF};
     // Frame sizes count the bytes as stored, after unsynchronisation.
-    const Meta m(Tagged(3, {Id3Frame(3, "TIT2", Unsynchronise(TextBytes(0, {'a', 0xFF, 'b'}))),
-                            Id3Frame(3, "APIC", Unsynchronise(ApicBody("image/jpeg", picture)))}, 16, 0x80));
+    const Meta m(Tagged(3,
+                        {Id3Frame(3, "TIT2", Unsynchronise(TextBytes(0, {'a', 0xFF, 'b'}))),
+                         Id3Frame(3, "APIC", Unsynchronise(ApicBody("image/jpeg", picture)))},
+                        16, 0x80));
     ASSERT_EQ(m.result, MM_OK);
     EXPECT_EQ(m.Raw(META_TITLE), (Data{'a', 0xFF, 'b'}));
     EXPECT_EQ(m.meta.aItems[META_PICTURE_FORMAT].nLength, 11u);
@@ -509,10 +562,12 @@ TEST(Id3Tags, V23ExtendedHeaderIsSkippedWithOrWithoutUnsync) {
 }
 
 TEST(Id3Tags, Version1FieldsAreTrimmedAndTheTrackByteIsSigned) {
-    const Meta m(Bytes().raw(Mp3Frames(6)).raw(Id3v1({"Title  \t", "Artist", "Album", "2001", "Note", 200, 17})).data());
+    const Meta m(
+        Bytes().raw(Mp3Frames(6)).raw(Id3v1({"Title  \t", "Artist", "Album", "2001", "Note", 200, 17})).data());
     ASSERT_EQ(m.result, MM_OK);
     EXPECT_EQ(std::make_tuple(m.Text(META_TITLE), m.Text(META_ARTIST), m.Text(META_ALBUM), m.Text(META_YEAR),
-                              m.Text(META_COMMENT)), std::make_tuple("Title", "Artist", "Album", "2001", "Note"));
+                              m.Text(META_COMMENT)),
+              std::make_tuple("Title", "Artist", "Album", "2001", "Note"));
     EXPECT_EQ(m.Text(META_TRACKNUMBER), "-56");
     EXPECT_EQ(m.Text(META_GENRE), "Rock");
     EXPECT_EQ(m.Code(META_TITLE), 3u);
@@ -526,13 +581,14 @@ TEST(Id3Tags, HostileSizesFailTheTagCleanly) {
     truncated.resize(100);  // the tag claims more than the file holds
     Frames files = {truncated, Bytes().str("ID3").u8(3).zeros(2).syncsafe32(0x0FFFFFFF).raw(Mp3Frames(6)).data()};
     for (uint32_t size : {0x7FFFFFF0u, 0x80000001u}) {  // beyond the tag, and negative
-        files.push_back(Bytes().raw(Id3v2Tag(3, Bytes().str("TIT2").be32(size).zeros(42).data())).raw(Mp3Frames(6)).data());
+        files.push_back(
+            Bytes().raw(Id3v2Tag(3, Bytes().str("TIT2").be32(size).zeros(42).data())).raw(Mp3Frames(6)).data());
     }
     for (const auto& file : files) EXPECT_EQ(Meta(file).result, 1);
 
     // Zero-size frames cost only their header; a picture without a MIME terminator is dropped.
-    const Meta m(Tagged(3, {Id3Frame(3, "TIT2", {}), Id3Frame(3, "APIC", {}), Id3Frame(3, "APIC", TextBody(0, "image/png")),
-                            Text3("TIT2", "ok")}));
+    const Meta m(Tagged(3, {Id3Frame(3, "TIT2", {}), Id3Frame(3, "APIC", {}),
+                            Id3Frame(3, "APIC", TextBody(0, "image/png")), Text3("TIT2", "ok")}));
     EXPECT_EQ(m.result, MM_OK);
     EXPECT_EQ(m.meta.pPicture, nullptr);
     EXPECT_EQ(m.Text(META_TITLE), "ok");
@@ -552,8 +608,8 @@ TEST(Id3Tags, ShortFrameBodyEndsAVersion24TagOnly) {
     // A bound beyond what the file still holds: a v2.4 frame cut short fails
     // the tag, a v2.3 one keeps what was read.
     for (int version : {3, 4}) {
-        Data file = Id3Tag(version, {Id3Frame(version, "TIT2", TextBody(0, "From v2")),
-                                                     Id3Frame(version, "PRIV", Data(400, 1))});
+        Data file = Id3Tag(
+            version, {Id3Frame(version, "TIT2", TextBody(0, "From v2")), Id3Frame(version, "PRIV", Data(400, 1))});
         file.resize(file.size() - 300);
         Meta m;
         EXPECT_EQ(ParseAt(file, 0, 100000, &m), version == 4 ? 1 : 0) << version;
@@ -589,22 +645,30 @@ TEST(Mp3Extract, PositionsMoveToTheNextSyncAndTheEndIsCutAtTheDuration) {
     EXPECT_EQ(size, b.size);
     MM_MediaExtractor_FreeBuffer(pub);
 
-    const struct { int start, end; int32_t result; int size; } ranges[] = {
-        {20, 1000, MM_OK, static_cast<int>(kFrames * kFrame - 320256)},
-        {30, 40, MM_E_FAIL, 0},  // starting at the very end leaves no frame
-        {31, 40, MM_E_INVALIDARG, 0}, {-1, 5, MM_E_INVALIDARG, 0}, {5, 5, MM_E_INVALIDARG, 0}};
+    const struct {
+        int start, end;
+        int32_t result;
+        int size;
+    } ranges[] = {{20, 1000, MM_OK, static_cast<int>(kFrames * kFrame - 320256)},
+                  {30, 40, MM_E_FAIL, 0},  // starting at the very end leaves no frame
+                  {31, 40, MM_E_INVALIDARG, 0},
+                  {-1, 5, MM_E_INVALIDARG, 0},
+                  {5, 5, MM_E_INVALIDARG, 0}};
     for (const auto& r : ranges) {
         const Buffer cut(path, r.start, r.end);
         EXPECT_EQ(cut.result, r.result) << r.start;
         EXPECT_EQ(cut.data != nullptr, r.result == MM_OK) << r.start;
-        if (r.result == MM_OK) { EXPECT_EQ(cut.size, r.size); }
+        if (r.result == MM_OK) {
+            EXPECT_EQ(cut.size, r.size);
+        }
     }
     EXPECT_EQ(MP3_GetAudioData2Buf(path.c_str(), 0, 5, nullptr, &size), MM_E_INVALIDARG);
     EXPECT_EQ(MP3_GetAudioData2File(path.c_str(), 0, 5, nullptr), MM_E_INVALIDARG);
     VbriFields vbri;  // VBRI streams cannot be cut
     vbri.frames = kFrames;
-    EXPECT_EQ(Buffer(dir.Write("vbri.mp3", Bytes().raw(VbriFrame(vbri)).raw(Mp3Frames(kFrames - 1)).data()), 1, 2).result,
-              MM_E_FAIL);
+    EXPECT_EQ(
+        Buffer(dir.Write("vbri.mp3", Bytes().raw(VbriFrame(vbri)).raw(Mp3Frames(kFrames - 1)).data()), 1, 2).result,
+        MM_E_FAIL);
 }
 
 TEST(Mp3Extract, FileCarriesTagsAndAXingFrameForTheRange) {
@@ -613,7 +677,8 @@ TEST(Mp3Extract, FileCarriesTagsAndAXingFrameForTheRange) {
     XingFields xing;
     xing.frames = kFrames;
     xing.bytes = kFrames * kFrame;
-    const auto file = Bytes().raw(tag).raw(XingFrame(xing)).raw(Mp3Frames(kFrames - 1)).raw(Id3v1Titled("Trailing")).data();
+    const auto file =
+        Bytes().raw(tag).raw(XingFrame(xing)).raw(Mp3Frames(kFrames - 1)).raw(Id3v1Titled("Trailing")).data();
     const std::string out = dir.PathOf("out.mp3");
     ASSERT_EQ(MP3_GetAudioData2File(dir.Write("xing.mp3", file).c_str(), 10, 20, out.c_str()), MM_OK);
     const std::vector<uint8_t> cut = ReadFileBytes(out);
@@ -629,7 +694,7 @@ TEST(Mp3Extract, FileCarriesTagsAndAXingFrameForTheRange) {
     EXPECT_EQ(std::memcmp(x + 40, fields.data(), 12), 0);
     EXPECT_EQ(std::memcmp(x + 52, file.data() + 30 + 52, 100), 0);  // the source's table as it stands
     EXPECT_EQ(x[155], 57);  // quality
-    EXPECT_EQ(x[156], 0);   // padding up to the source frame's size
+    EXPECT_EQ(x[156], 0);  // padding up to the source frame's size
     EXPECT_EQ(std::memcmp(cut.data() + 30 + kFrame, file.data() + 157656, span), 0);
     EXPECT_EQ(std::memcmp(cut.data() + cut.size() - 128, "TAGTrailing", 11), 0);
 }
@@ -637,8 +702,9 @@ TEST(Mp3Extract, FileCarriesTagsAndAXingFrameForTheRange) {
 TEST(Mp3Extract, CutFilesDecodeForTheRequestedSpan) {
     if (!HaveFfmpeg()) GTEST_SKIP() << "ffmpeg is not installed";
     TempDir dir;
-    const std::string make = "/usr/bin/ffmpeg -nostdin -v error -y -f lavfi -i sine=frequency=440:duration=30 "
-                             "-c:a libmp3lame ";
+    const std::string make =
+        "/usr/bin/ffmpeg -nostdin -v error -y -f lavfi -i sine=frequency=440:duration=30 "
+        "-c:a libmp3lame ";
     const double frame = 1152.0 / 44100;
     const struct {
         std::string options;
@@ -649,7 +715,8 @@ TEST(Mp3Extract, CutFilesDecodeForTheRequestedSpan) {
     };
     for (const auto& c : cases) {
         const std::string source = dir.PathOf("source.mp3"), out = dir.PathOf("cut.mp3");
-        if (RunCommand(make + c.options + " '" + source + "' 2>&1") != "") GTEST_SKIP() << "ffmpeg cannot encode MP3 here";
+        if (RunCommand(make + c.options + " '" + source + "' 2>&1") != "")
+            GTEST_SKIP() << "ffmpeg cannot encode MP3 here";
         ASSERT_EQ(MP3_GetAudioData2File(source.c_str(), 10, 20, out.c_str()), MM_OK) << c.options;
         EXPECT_NEAR(DecodedSeconds(out), 10.0, c.tolerance) << c.options;
     }
@@ -683,8 +750,9 @@ TEST(Mp3Corpus, EveryFileIsAnsweredWithoutFaultAndKnownFilesAsByHand) {
     _MMMetaInfo meta;
     std::memset(&meta, 0, sizeof meta);
     ASSERT_EQ(ID3_GetMetaInfo(silence.c_str(), &meta, 1), MM_OK);
-    EXPECT_EQ(std::string(reinterpret_cast<const char*>(meta.aItems[META_TITLE].szData), meta.aItems[META_TITLE].nLength),
-              "Silence");
+    EXPECT_EQ(
+        std::string(reinterpret_cast<const char*>(meta.aItems[META_TITLE].szData), meta.aItems[META_TITLE].nLength),
+        "Silence");
     MM_MediaExtractor_FreeMetaInfo(&meta);
     // silence-44-s-mpeg25.mp3: MPEG-2.5 stereo reports 1152 >> 2 samples per frame.
     ASSERT_EQ(MP3_GetClipInfo((corpus + "/mutagen/silence-44-s-mpeg25.mp3").c_str(), &clip), MM_OK);
@@ -705,8 +773,9 @@ TEST(Mp3Robustness, DamagedCopiesOfATaggedXingFileAreAnsweredWithoutFault) {
     xing.bytes = 40 * 417;
     const std::vector<uint8_t> source =
         Bytes()
-            .raw(Id3Tag(3, {Id3Frame(3, "TIT2", TextBody(0, "Title")), Id3Frame(3, "APIC", apic), Id3Frame(3, "COMM", comm),
-                            Id3Frame(3, "TCON", TextBody(0, "(17)")), Id3Frame(3, "TDRC", TextBody(0, "2004-05-0"))}))
+            .raw(Id3Tag(
+                3, {Id3Frame(3, "TIT2", TextBody(0, "Title")), Id3Frame(3, "APIC", apic), Id3Frame(3, "COMM", comm),
+                    Id3Frame(3, "TCON", TextBody(0, "(17)")), Id3Frame(3, "TDRC", TextBody(0, "2004-05-0"))}))
             .raw(XingFrame(xing))
             .raw(Mp3Frames(39))
             .raw(Id3v1Titled("v1"))

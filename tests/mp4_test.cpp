@@ -57,7 +57,9 @@ BitWriter Asc(uint32_t objectType, uint32_t frequencyIndex, uint32_t channels) {
     w.put(objectType, 5).put(frequencyIndex, 4).put(channels, 4);
     return w;
 }
-ByteVec AacWith(const BitWriter& config) { return Audio(AudioEntry("mp4a", 2, 16, 44100, Esds(0x40, 96000, config.bytes()))); }
+ByteVec AacWith(const BitWriter& config) {
+    return Audio(AudioEntry("mp4a", 2, 16, 44100, Esds(0x40, 96000, config.bytes())));
+}
 
 // The clip record, then each track node: kind, codec/detail in hex, bit rate.
 std::string Summary(const Mp4ClipWalk& w) {
@@ -76,13 +78,17 @@ ByteVec Item(const std::string& type, const std::string& s) { return IlstItem(ty
 ByteVec Udta(const ByteVec& children) { return Box("udta", children); }
 
 ByteVec Modl(const std::string& body) { return FullBox("modl", 0, 0, ByteVec(body.begin(), body.end())); }
-ByteVec Thub(const ByteVec& image, uint32_t declared) { return FullBox("thub", 0, 0, Bytes().be32(0xCAFE).be32(declared).raw(image)); }
+ByteVec Thub(const ByteVec& image, uint32_t declared) {
+    return FullBox("thub", 0, 0, Bytes().be32(0xCAFE).be32(declared).raw(image));
+}
 ByteVec Thub(const ByteVec& image) { return Thub(image, static_cast<uint32_t>(image.size())); }
 ByteVec Salb(const std::string& text) { return FullBox("salb", 0, 0, Bytes().be16(0x15C7).str(text)); }
 ByteVec Mkr(const ByteVec& children) { return FullBox("@mkr", 0, 0, children); }
 const ByteVec kImage = {0xFF, 0xD8, 0xFF, 0xE0, 1, 2, 3, 4, 5, 0xFF, 0xD9};
 
-std::string Str(const unsigned char* p, uint32_t n) { return p ? std::string(reinterpret_cast<const char*>(p), n) : ""; }
+std::string Str(const unsigned char* p, uint32_t n) {
+    return p ? std::string(reinterpret_cast<const char*>(p), n) : "";
+}
 
 class Mp4 : public ::testing::Test {
 protected:
@@ -107,10 +113,11 @@ protected:
     int32_t Maker(const ByteVec& mkr, bool topLevel = false) {
         FreeMaker();
         ByteVec udta = Udta(mkr);
-        return MP4_GetMakerInfo(dir.Write("cam.3gp", Movie(Join({Mvhd(0, 1000, 1000), topLevel ? ByteVec{} : udta}),
-                                                           Join({topLevel ? udta : ByteVec{}, Box("mdat", ByteVec(16, 0))})))
-                                    .c_str(),
-                                &maker);
+        return MP4_GetMakerInfo(
+            dir.Write("cam.3gp", Movie(Join({Mvhd(0, 1000, 1000), topLevel ? ByteVec{} : udta}),
+                                       Join({topLevel ? udta : ByteVec{}, Box("mdat", ByteVec(16, 0))})))
+                .c_str(),
+            &maker);
     }
     std::string MakerText() const {
         return "valid=" + std::to_string(maker.nValid) + " model=" + Str(maker.pPhoneModel, maker.nPhoneModelSize) +
@@ -156,24 +163,31 @@ struct Answers {
 
 TEST_F(Mp4, ClipOfEachFileShape) {
     const ByteVec song = Movie(Join({Mvhd(0, 1000, 2000), AudioTrak(2000)}));
-    const struct { const char* name; ByteVec file; const char* path; int32_t result; const char* clip; } cases[] = {
+    const struct {
+        const char* name;
+        ByteVec file;
+        const char* path;
+        int32_t result;
+        const char* clip;
+    } cases[] = {
         // The first box must be ftyp or mdat; a file starting with mdat is walked from offset 0.
         {"free first", Join({Box("free", ByteVec(8, 0)), Box("moov", Mvhd(0, 1000, 5000))}), "clip.mp4", -2, ""},
-        {"mdat first", Join({Box("mdat", ByteVec(8, 0)), Box("moov", Mvhd(0, 1000, 5000)), Box("free")}), "clip.mp4", MM_OK,
-         "mp4 size=140 dur=5 bps=224"},
+        {"mdat first", Join({Box("mdat", ByteVec(8, 0)), Box("moov", Mvhd(0, 1000, 5000)), Box("free")}), "clip.mp4",
+         MM_OK, "mp4 size=140 dur=5 bps=224"},
         // Box sizes stay below the file size: a box as long as the file, or of size 0, is refused;
         // a top-level box claiming more than the file ends the walk quietly.
         {"as long as the file", Box("ftyp", ByteVec(24, 0)), "clip.mp4", MM_E_FAIL, ""},
         {"size 0", Bytes().be32(0).str("ftyp").zeros(24), "clip.mp4", MM_E_FAIL, ""},
-        {"beyond the file", Movie(Mvhd(0, 1000, 7000), Bytes().be32(0x7FFFFFF0).str("mdat").zeros(8)), "clip.mp4", MM_OK,
-         "mp4 size=156 dur=7 bps=178"},
+        {"beyond the file", Movie(Mvhd(0, 1000, 7000), Bytes().be32(0x7FFFFFF0).str("mdat").zeros(8)), "clip.mp4",
+         MM_OK, "mp4 size=156 dur=7 bps=178"},
         // Headers cut short: missing bytes read as 0 (a 64-bit size of 0 is refused); the walk
         // stops at a last header the file does not hold whole, rather than going back to it.
         {"cut 64-bit size", Bytes().be32(1), "clip.mp4", MM_E_FAIL, ""},
         {"cut last header", Join({Ftyp(), Bytes().be32(3).u8(0x80).data()}), "clip.m4a", MM_OK, "m4a size=29"},
         // A 64-bit size's upper word of 1 is ignored: the box ends after its lower word.
-        {"64-bit size", Join({Ftyp(), Bytes().be32(1).str("mdat").be32(1).be32(24).zeros(8).data(),
-                              Box("moov", Join({Mvhd(0, 1000, 6000), AudioTrak(6000)})), Box("free", ByteVec(8, 0))}),
+        {"64-bit size",
+         Join({Ftyp(), Bytes().be32(1).str("mdat").be32(1).be32(24).zeros(8).data(),
+               Box("moov", Join({Mvhd(0, 1000, 6000), AudioTrak(6000)})), Box("free", ByteVec(8, 0))}),
          "clip.mp4", MM_OK, "mp4 size=503 dur=6 bps=670 audio=1 abps=128000 hz=44100 ch=2 bits=16"},
         // Version 1 takes the upper words: below 2^32 units a duration is 0; c1 is the creation time.
         {"version 1", Movie(Mvhd(1, 1, 0xFFFFFFFFull, 0x1234567800000000ull)), "clip.mp4", MM_OK,
@@ -187,8 +201,9 @@ TEST_F(Mp4, ClipOfEachFileShape) {
         {"no extension: the copied fields stay", song, "noextension", MM_E_FAIL,
          "size=503 dur=2 bps=2012 audio=1 abps=128000 hz=44100 ch=2 bits=16"},
         // The first track declaring a size sets it.
-        {"sized tracks", Movie(Join({Mvhd(0, 1000, 1000), Trak("soun", 1000, 1000, {}),
-                                     Trak("hint", 1000, 1000, {}, 176, 144), Trak("hint", 1000, 1000, {}, 640, 480)})),
+        {"sized tracks",
+         Movie(Join({Mvhd(0, 1000, 1000), Trak("soun", 1000, 1000, {}), Trak("hint", 1000, 1000, {}, 176, 144),
+                     Trak("hint", 1000, 1000, {}, 640, 480)})),
          "clip.mp4", MM_OK, "mp4 size=816 dur=1 bps=6528 w=176 h=144"},
     };
     for (const auto& c : cases) {
@@ -206,7 +221,8 @@ TEST_F(Mp4, TrackTypesCodecsAndTheDescriptorForm) {
     std::memset(&codec, 0xFF, sizeof codec);
     ASSERT_EQ(MP4_GetCodecType(path.c_str(), &codec), MM_OK);
     EXPECT_EQ(CodecSummary(codec), "a=4008/0/2102 v=4001/0/0");  // cleared first
-    EXPECT_EQ(MP4_GetCodecType(dir.Write("bare.mp4", Movie(Mvhd(0, 1000, 1000))).c_str(), &codec), MM_E_FAIL) << "no track";
+    EXPECT_EQ(MP4_GetCodecType(dir.Write("bare.mp4", Movie(Mvhd(0, 1000, 1000))).c_str(), &codec), MM_E_FAIL)
+        << "no track";
     // The descriptor form walks and leaves the caller's descriptor open.
     int fd = ::open(path.c_str(), O_RDONLY);
     ASSERT_GT(fd, 0);
@@ -217,8 +233,8 @@ TEST_F(Mp4, TrackTypesCodecsAndTheDescriptorForm) {
     EXPECT_EQ(MP4_GetMediaInfoFd(0, kModeClip, nullptr), -1) << "0 is no descriptor";
     // Refining numbers tracks only with a second entry of a kind.
     for (const auto& n : WalkClip(path, true).nodes) EXPECT_EQ(n.ordinal, 0u);
-    Mp4ClipWalk three = WalkClip(dir.Write("three.mp4", Movie(Join({Mvhd(0, 1000, 10000), AudioTrak(), VideoTrak(),
-                                                                     AudioTrak()}))), true);
+    Mp4ClipWalk three = WalkClip(
+        dir.Write("three.mp4", Movie(Join({Mvhd(0, 1000, 10000), AudioTrak(), VideoTrak(), AudioTrak()}))), true);
     ASSERT_EQ(three.nodes.size(), 3u);
     for (uint32_t i = 0; i < 3; ++i) EXPECT_EQ(three.nodes[i].ordinal, i);
     EXPECT_EQ(three.nodes[1].kind, 16u);
@@ -228,18 +244,41 @@ TEST_F(Mp4, TrackTypesCodecsAndTheDescriptorForm) {
 // Which entry is read, the codec codes of the decoder configurations, and what "stsz" adds.
 TEST_F(Mp4, SampleDescriptions) {
     const ByteVec mp4v = VisualEntry("mp4v", 176, 144, Esds(0x20, 64000));
-    const ByteVec avcC = Box("avcC", Bytes().u8(1).u8(66).u8(0).u8(30).u8(0xFF).u8(0xE1).be16(4).be32(0x6742001E)
-                                         .u8(1).be16(2).be16(0x68CE));
+    const ByteVec avcC =
+        Box("avcC",
+            Bytes().u8(1).u8(66).u8(0).u8(30).u8(0xFF).u8(0xE1).be16(4).be32(0x6742001E).u8(1).be16(2).be16(0x68CE));
     // A QCP format chunk after three bytes: its rate, bit rate and sample size replace the configuration's.
-    const ByteVec qcp = Bytes().u8(0).u8(0).u8(0).str("fmt ").le32(150).u8(1).u8(0).zeros(16).le16(1).zeros(80)
-                            .le16(13300).le16(35).le16(160).le16(8000).le16(16).le32(0).zeros(36).data();
+    const ByteVec qcp = Bytes()
+                            .u8(0)
+                            .u8(0)
+                            .u8(0)
+                            .str("fmt ")
+                            .le32(150)
+                            .u8(1)
+                            .u8(0)
+                            .zeros(16)
+                            .le16(1)
+                            .zeros(80)
+                            .le16(13300)
+                            .le16(35)
+                            .le16(160)
+                            .le16(8000)
+                            .le16(16)
+                            .le32(0)
+                            .zeros(36)
+                            .data();
     const ByteVec stbl = Box("stbl", Stsd({AacEntry()}));
-    const struct { const char* name; ByteVec file; const char* summary; } cases[] = {
+    const struct {
+        const char* name;
+        ByteVec file;
+        const char* summary;
+    } cases[] = {
         // Only the first entry counts and is read (damr: frames per sample as bits).
         {"samr then mp4a",
-         OneTrak(Trak("soun", 1000, 10000,
-                      Stsd({AudioEntry("samr", 1, 16, 8000, Box("damr", Bytes().str("vndr").u8(0).be16(0x81FF).u8(0).u8(3))),
-                            AudioEntry("mp4a", 2, 16, 48000, Esds(0x40, 1, {0x11, 0x90}))}))),
+         OneTrak(Trak(
+             "soun", 1000, 10000,
+             Stsd({AudioEntry("samr", 1, 16, 8000, Box("damr", Bytes().str("vndr").u8(0).be16(0x81FF).u8(0).u8(3))),
+                   AudioEntry("mp4a", 2, 16, 48000, Esds(0x40, 1, {0x11, 0x90}))}))),
          "size=536 dur=10 bps=428 audio=1 hz=8000 ch=1 bits=3 | 1 4005/0 0"},
         // Frame rate is samples per whole second; with a bit rate from the sample entry the
         // sizes are not summed.
@@ -248,11 +287,13 @@ TEST_F(Mp4, SampleDescriptions) {
         {"frame rate 9.9 s", Video(mp4v, Stsz(500, 300), 9900),
          "size=553 dur=9 bps=491 video=1 vbps=64000 w=176 h=144 fps=33 | 16 4001/0 64000"},
         // A zero sample size sums the entries; a count far beyond the table sums what the box holds.
-        {"stsz entries", Audio(AudioEntry("mp4a", 1, 16, 8000, Esds(0x40, 0, {0x15, 0x88})), Stsz(0, 3, {1000, 2000, 2000})),
+        {"stsz entries",
+         Audio(AudioEntry("mp4a", 1, 16, 8000, Esds(0x40, 0, {0x15, 0x88})), Stsz(0, 3, {1000, 2000, 2000})),
          "size=515 dur=10 bps=412 audio=1 abps=4000 hz=8000 ch=1 bits=16 | 1 4008/2102 4000"},
         {"stsz hostile count", Audio(AudioEntry("mp4a", 1, 16, 8000), Stsz(0, 0xFFFFFFF0u, {800})),
          "size=468 dur=10 bps=374 audio=1 abps=640 hz=8000 ch=1 bits=16 | 1 0/0 640"},
-        {"stsz of 40000 entries", Audio(AudioEntry("mp4a", 1, 16, 8000), Stsz(0, 40000, std::vector<uint32_t>(40000, 25))),
+        {"stsz of 40000 entries",
+         Audio(AudioEntry("mp4a", 1, 16, 8000), Stsz(0, 40000, std::vector<uint32_t>(40000, 25))),
          "size=160464 dur=10 bps=128371 audio=1 abps=800000 hz=8000 ch=1 bits=16 | 1 0/0 800000"},
         // Speech entries have fixed values.
         {"secw", Audio(AudioEntry("secw", 2, 8, 44100)),
@@ -268,16 +309,21 @@ TEST_F(Mp4, SampleDescriptions) {
          "size=645 dur=10 bps=516 audio=1 abps=13300 hz=8000 ch=1 bits=16 | 1 7001/0 13300"},
         // avc1 needs avcC for its codec but always gives the size; btrt's average bit rate.
         {"avc1 bare", Video(VisualEntry("avc1", 640, 360)), "size=498 dur=10 bps=398 video=1 w=640 h=360 | 16 0/0 0"},
-        {"avc1 full", Video(VisualEntry("avc1", 1280, 720, Join({Box("pasp", Bytes().be32(1).be32(1)), avcC,
-                                                               Box("btrt", Bytes().be32(0).be32(900000).be32(750000))}))),
+        {"avc1 full",
+         Video(VisualEntry("avc1", 1280, 720,
+                           Join({Box("pasp", Bytes().be32(1).be32(1)), avcC,
+                                 Box("btrt", Bytes().be32(0).be32(900000).be32(750000))}))),
          "size=559 dur=10 bps=447 video=1 vbps=750000 w=1280 h=720 | 16 4004/0 750000"},
-        {"avc1 wild lengths", Video(VisualEntry("avc1", 320, 240, Box("avcC", Bytes().u8(1).u8(66).u8(0).u8(30).u8(0xFF)
-                                                                              .u8(0xFF).be16(0xFFFF).zeros(4)))),
+        {"avc1 wild lengths",
+         Video(VisualEntry("avc1", 320, 240,
+                           Box("avcC", Bytes().u8(1).u8(66).u8(0).u8(30).u8(0xFF).u8(0xFF).be16(0xFFFF).zeros(4)))),
          "size=518 dur=10 bps=414 video=1 w=320 h=240 | 16 4004/0 0"},
         {"avc1 child of size 0", Video(VisualEntry("avc1", 320, 240, Bytes().be32(0).str("pasp").zeros(8))),
          "size=514 dur=10 bps=411 video=1 w=320 h=240 | 16 0/0 0"},
-        {"s263 bitr", Video(VisualEntry("s263", 176, 144, Box("d263", Join({Bytes().str("vndr").u8(0).u8(10).u8(0).data(),
-                                                                          Box("bitr", Bytes().be32(64000).be32(128000))})))),
+        {"s263 bitr",
+         Video(VisualEntry("s263", 176, 144,
+                           Box("d263", Join({Bytes().str("vndr").u8(0).u8(10).u8(0).data(),
+                                             Box("bitr", Bytes().be32(64000).be32(128000))})))),
          "size=529 dur=10 bps=423 video=1 vbps=64000 w=176 h=144 | 16 4003/0 64000"},
         // Malformed configurations leave no codec; unknown entries are neither read nor counted.
         {"wave instead of esds", Audio(AudioEntry("mp4a", 2, 16, 44100, Box("wave", ByteVec(20, 0)))),
@@ -287,7 +333,8 @@ TEST_F(Mp4, SampleDescriptions) {
         {"tx3g", OneTrak(Trak("text", 1000, 1000, Stsd({Box("tx3g", ByteVec(40, 0))}))),
          "size=456 dur=10 bps=364 | 0 0/0 0"},
         // A handler after stbl still decides the kind; without one the sample table is not read.
-        {"late handler", OneTrak(Box("trak", Box("mdia", Join({Box("minf", stbl), Mdhd(0, 1000, 3000), Hdlr("soun")})))),
+        {"late handler",
+         OneTrak(Box("trak", Box("mdia", Join({Box("minf", stbl), Mdhd(0, 1000, 3000), Hdlr("soun")})))),
          "size=375 dur=10 bps=300 audio=1 abps=128000 hz=44100 ch=2 bits=16 | 1 4008/2102 128000"},
         {"no handler", OneTrak(Box("trak", Box("mdia", Join({Mdhd(0, 1000, 3000), Box("minf", stbl)})))),
          "size=335 dur=10 bps=268 | 0 0/0 0"},
@@ -296,7 +343,10 @@ TEST_F(Mp4, SampleDescriptions) {
     // AAC object types give codec and profile; only the sync extension with sbrPresentFlag 1
     // signals SBR (implicit SBR only doubles the rate); bad configurations still name AAC,
     // a program configuration whose long comment runs past the bytes given too.
-    const struct { BitWriter config; const char* node; } configs[] = {
+    const struct {
+        BitWriter config;
+        const char* node;
+    } configs[] = {
         {Asc(2, 3, 2).put(0, 3), "4008/2102"},
         {Asc(1, 3, 2).put(0, 3), "4008/2101"},
         {Asc(3, 3, 2).put(0, 3), "4008/2103"},
@@ -308,8 +358,19 @@ TEST_F(Mp4, SampleDescriptions) {
         {Asc(2, 7, 2).put(0, 3).put(0x2B7, 11).put(5, 5).put(0, 1), "4008/2102"},
         {Asc(2, 13, 2), "4008/2102"},
         {Asc(2, 4, 9), "4008/2102"},
-        {Asc(2, 4, 0).put(0, 3).put(0, 4).put(1, 2).put(4, 4).put(15, 4).put(15, 4).put(15, 4).put(3, 2).put(7, 3)
-             .put(15, 4).put(1, 1).put(3, 4),
+        {Asc(2, 4, 0)
+             .put(0, 3)
+             .put(0, 4)
+             .put(1, 2)
+             .put(4, 4)
+             .put(15, 4)
+             .put(15, 4)
+             .put(15, 4)
+             .put(3, 2)
+             .put(7, 3)
+             .put(15, 4)
+             .put(1, 1)
+             .put(3, 4),
          "4008/2102"},
     };
     for (const auto& c : configs) {
@@ -371,10 +432,15 @@ TEST(Mp4Boxes, HeaderLengthsAndFileTypeBrandsAreBoundedByTheBox) {
     EXPECT_EQ(AnaBox(empty.data(), empty.size(), &box), 1) << "nothing read after a size of 0";
     EXPECT_EQ(AnaBox(uuid.data(), 7, &box), 0) << "too short to hold a header";
     s_mp4FileSize = 1000;
-    const struct { ByteVec box; int32_t result; uint32_t brands; } cases[] = {
-        {Box("ftyp", Bytes().str("M4A ").be32(0).str("M4A ").str("mp42").str("is")), MM_OK, 2},  // a partial brand is not read
-        {Box("ftyp", Bytes().str("isom").be32(0)), MM_E_FAIL, 0},                                // no room for brands
-        {Bytes().be32(900).str("ftyp").str("isom").be32(0).str("mp41").data(), MM_OK, 1},       // a size beyond the bytes
+    const struct {
+        ByteVec box;
+        int32_t result;
+        uint32_t brands;
+    } cases[] = {
+        {Box("ftyp", Bytes().str("M4A ").be32(0).str("M4A ").str("mp42").str("is")), MM_OK,
+         2},  // a partial brand is not read
+        {Box("ftyp", Bytes().str("isom").be32(0)), MM_E_FAIL, 0},  // no room for brands
+        {Bytes().be32(900).str("ftyp").str("isom").be32(0).str("mp41").data(), MM_OK, 1},  // a size beyond the bytes
     };
     for (const auto& c : cases) {
         _FILETYPEBOX ftyp{};
@@ -386,32 +452,64 @@ TEST(Mp4Boxes, HeaderLengthsAndFileTypeBrandsAreBoundedByTheBox) {
 
 // User data: 3GPP text boxes, iTunes items and the order in which they overwrite each other.
 TEST_F(Mp4, UserDataMetadata) {
-    const ByteVec ilst = MetaBox(Ilst(Item("\xA9" "nam", "From ilst")));
+    const ByteVec ilst =
+        MetaBox(Ilst(Item("\xA9"
+                          "nam",
+                          "From ilst")));
     const ByteVec titl = Udta(TextBox("titl", "From titl"));
-    const ByteVec tag = Id3Tag(4, {Id3Frame(4, "TIT2", TextBody(3, "Embedded")), Id3Frame(4, "TPE1", TextBody(0, "Band"))});
-    const struct { const char* name; ByteVec moov, topLevel; std::string meta; } cases[] = {
+    const ByteVec tag =
+        Id3Tag(4, {Id3Frame(4, "TIT2", TextBody(3, "Embedded")), Id3Frame(4, "TPE1", TextBody(0, "Band"))});
+    const struct {
+        const char* name;
+        ByteVec moov, topLevel;
+        std::string meta;
+    } cases[] = {
         // The performer beats the author unless empty.
         {"perf", Udta(Join({TextBox("auth", "Writer"), TextBox("perf", "Singer")})), {}, "artist=5:Singer"},
         {"empty perf", Udta(Join({TextBox("perf", ""), TextBox("auth", "Writer")})), {}, "artist=5:Writer"},
         // albm's last byte is its track number; yrrc is a 16-bit year read little-endian; dscp is dropped.
-        {"text boxes", Udta(Join({TextBox("titl", "Name"), FullBox("albm", 0, 0, Bytes().be16(0x15C7).str("Record").u8(0).u8(4)),
-                                  TextBox("gnre", "Jazz"), FullBox("yrrc", 0, 0, Bytes().be16(2009)),
-                                  TextBox("dscp", "dropped"), FullBox("loci", 0, 0, ByteVec(20, 0))})),
-         {}, "title=5:Name album=5:Record\\x00 genre=5:Jazz year=5:\\xD9\\x07"},
+        {"text boxes",
+         Udta(Join({TextBox("titl", "Name"), FullBox("albm", 0, 0, Bytes().be16(0x15C7).str("Record").u8(0).u8(4)),
+                    TextBox("gnre", "Jazz"), FullBox("yrrc", 0, 0, Bytes().be16(2009)), TextBox("dscp", "dropped"),
+                    FullBox("loci", 0, 0, ByteVec(20, 0))})),
+         {},
+         "title=5:Name album=5:Record\\x00 genre=5:Jazz year=5:\\xD9\\x07"},
         // Byte order marks choose the encoding and stay.
-        {"marks", Udta(Join({FullBox("titl", 0, 0, Bytes().be16(0).u8(0xFE).u8(0xFF).be16('A')),
-                             FullBox("cprt", 0, 0, Bytes().be16(0).u8(0xFF).u8(0xFE).le16('B'))})),
-         {}, "title=4:\\xFE\\xFF\\x00A copyright=6:\\xFF\\xFEB\\x00"},
+        {"marks",
+         Udta(Join({FullBox("titl", 0, 0, Bytes().be16(0).u8(0xFE).u8(0xFF).be16('A')),
+                    FullBox("cprt", 0, 0, Bytes().be16(0).u8(0xFF).u8(0xFE).le16('B'))})),
+         {},
+         "title=4:\\xFE\\xFF\\x00A copyright=6:\\xFF\\xFEB\\x00"},
         // Long texts are cut to 128 bytes.
         {"long titl", Udta(TextBox("titl", std::string(200, 'x'))), {}, "title=5:" + std::string(128, 'x')},
-        {"long nam", MetaBox(Ilst(Item("\xA9" "nam", std::string(300, 'y')))), {}, "title=5:" + std::string(128, 'y')},
+        {"long nam",
+         MetaBox(Ilst(Item("\xA9"
+                           "nam",
+                           std::string(300, 'y')))),
+         {},
+         "title=5:" + std::string(128, 'y')},
         // Artist, year, genre and a 4-byte binary track; cmt and covr are not read; a later
         // item replaces an earlier one whole.
-        {"itunes", Udta(MetaBox(Ilst(Join({Item("\xA9" "ART", "Band"), Item("\xA9" "day", "2001-02-03"),
-                                           IlstItem("gnre", 0, {0, 1}), IlstItem("trkn", 0, {0, 0, 0, 7, 0, 12, 0, 0}),
-                                           Item("\xA9" "cmt", "skipped"), IlstItem("covr", 13, ByteVec(50, 0xFF)),
-                                           Item("\xA9" "nam", "First longer"), Item("\xA9" "nam", "Second")})))),
-         {}, "title=5:Second artist=5:Band genre=5:Blues year=5:2001-02-03 track=0:\\x07\\x00\\x00\\x00"},
+        {"itunes",
+         Udta(MetaBox(Ilst(Join({Item("\xA9"
+                                      "ART",
+                                      "Band"),
+                                 Item("\xA9"
+                                      "day",
+                                      "2001-02-03"),
+                                 IlstItem("gnre", 0, {0, 1}), IlstItem("trkn", 0, {0, 0, 0, 7, 0, 12, 0, 0}),
+                                 Item("\xA9"
+                                      "cmt",
+                                      "skipped"),
+                                 IlstItem("covr", 13, ByteVec(50, 0xFF)),
+                                 Item("\xA9"
+                                      "nam",
+                                      "First longer"),
+                                 Item("\xA9"
+                                      "nam",
+                                      "Second")})))),
+         {},
+         "title=5:Second artist=5:Band genre=5:Blues year=5:2001-02-03 track=0:\\x07\\x00\\x00\\x00"},
         // Genre numbers count from 1: 0 and 148 stay raw, the last name is out of reach.
         {"gnre 0", MetaBox(Ilst(IlstItem("gnre", 0, {0, 0}))), {}, "genre=5:\\x00\\x00"},
         {"gnre 148", MetaBox(Ilst(IlstItem("gnre", 0, {0, 148}))), {}, "genre=5:\\x00\\x94"},
@@ -421,30 +519,60 @@ TEST_F(Mp4, UserDataMetadata) {
         {"udta then ilst", Join({titl, ilst}), {}, "title=5:From ilst"},
         {"top-level udta", ilst, titl, "title=5:From titl"},
         // An embedded ID3 tag fills the items; an empty tag or box fails alone.
-        {"ID32", MetaBox(FullBox("ID32", 0, 0, Join({Bytes().be16(0x15C7).data(), tag}))), {},
+        {"ID32",
+         MetaBox(FullBox("ID32", 0, 0, Join({Bytes().be16(0x15C7).data(), tag}))),
+         {},
          "title=5:Embedded artist=3:Band"},
-        {"empty ID32 tag", MetaBox(Join({FullBox("ID32", 0, 0, Bytes().be16(0x15C7).str("ID3").u8(4).u8(0).u8(0).syncsafe32(0)),
-                                         Ilst(Item("\xA9" "ART", "Kept"))})),
-         {}, "artist=5:Kept"},
-        {"empty ID32 box", MetaBox(Join({FullBox("ID32", 0, 0, {}), Ilst(Item("\xA9" "ART", "Kept"))})), {},
+        {"empty ID32 tag",
+         MetaBox(Join({FullBox("ID32", 0, 0, Bytes().be16(0x15C7).str("ID3").u8(4).u8(0).u8(0).syncsafe32(0)),
+                       Ilst(Item("\xA9"
+                                 "ART",
+                                 "Kept"))})),
+         {},
+         "artist=5:Kept"},
+        {"empty ID32 box",
+         MetaBox(Join({FullBox("ID32", 0, 0, {}), Ilst(Item("\xA9"
+                                                            "ART",
+                                                            "Kept"))})),
+         {},
          "artist=5:Kept"},
         // A child of size 0 ends the udta walk with a failure: nothing is copied.
         {"udta child of size 0", Udta(Join({TextBox("titl", "Lost"), Bytes().be32(0).str("junk").data()})), {}, ""},
         // Boxes too short for their language field are skipped.
-        {"short text boxes", Udta(Join({FullBox("titl", 0, 0, {}), FullBox("albm", 0, 0, {1}), TextBox("perf", "P")})), {},
+        {"short text boxes",
+         Udta(Join({FullBox("titl", 0, 0, {}), FullBox("albm", 0, 0, {1}), TextBox("perf", "P")})),
+         {},
          "artist=5:P"},
         // data shorter than its header, trkn without its bytes, data claiming more than the
         // file, an item of size 0.
-        {"hostile items", MetaBox(Ilst(Join({Box("\xA9" "nam", Box("data", {1, 2})), IlstItem("trkn", 0, {0, 0}),
-                                            Box("\xA9" "alb", Bytes().be32(0x7FFFFF00).str("data").zeros(8)),
-                                            Bytes().be32(0).str("\xA9" "ART").data()}))),
-         {}, ""},
+        {"hostile items",
+         MetaBox(Ilst(Join({Box("\xA9"
+                                "nam",
+                                Box("data", {1, 2})),
+                            IlstItem("trkn", 0, {0, 0}),
+                            Box("\xA9"
+                                "alb",
+                                Bytes().be32(0x7FFFFF00).str("data").zeros(8)),
+                            Bytes()
+                                .be32(0)
+                                .str("\xA9"
+                                     "ART")
+                                .data()}))),
+         {},
+         ""},
         // A meta without its version word (QuickTime style) is misread, harmlessly.
-        {"quicktime meta", Udta(Box("meta", Join({Hdlr("mdir"), Ilst(Item("\xA9" "nam", "x"))}))), {}, ""},
+        {"quicktime meta",
+         Udta(Box("meta", Join({Hdlr("mdir"), Ilst(Item("\xA9"
+                                                        "nam",
+                                                        "x"))}))),
+         {},
+         ""},
     };
     for (const auto& c : cases) {
         EXPECT_EQ(Meta(c.moov, c.topLevel), c.meta) << c.name;
-        if (&c == cases + 6) { EXPECT_EQ(meta.aItems[META_TITLE].szData[6], 0) << "nothing of the earlier title is left"; }
+        if (&c == cases + 6) {
+            EXPECT_EQ(meta.aItems[META_TITLE].szData[6], 0) << "nothing of the earlier title is left";
+        }
     }
 }
 
@@ -457,13 +585,19 @@ TEST_F(Mp4, MakerBox) {
         EXPECT_EQ(MakerText(), "valid=1 model=PX-100 thumb=11 album=Holiday");
         EXPECT_EQ(ByteVec(maker.pThumbnail, maker.pThumbnail + maker.nThumbnailSize), kImage);
     } while (std::next_permutation(order.begin(), order.end()));
-    const struct { const char* name; ByteVec mkr; bool topLevel; const char* maker; } cases[] = {
+    const struct {
+        const char* name;
+        ByteVec mkr;
+        bool topLevel;
+        const char* maker;
+    } cases[] = {
         {"top-level user data", Mkr(Modl("M")), true, "valid=1 model=M thumb=0 album="},
         {"no maker box", {}, false, "valid=0 model= thumb=0 album="},
-        {"thumbnail larger than its box", Join({Mkr(Join({Thub(kImage, 200), Modl("PX")})), Box("free", ByteVec(400, 0))}),
-         false, "valid=1 model=PX thumb=0 album="},
-        {"short children", Mkr(Join({FullBox("salb", 0, 0, {0}), FullBox("thub", 0, 0, {1, 2}), FullBox("modl", 0, 0, {}),
-                                     Salb("ok")})),
+        {"thumbnail larger than its box",
+         Join({Mkr(Join({Thub(kImage, 200), Modl("PX")})), Box("free", ByteVec(400, 0))}), false,
+         "valid=1 model=PX thumb=0 album="},
+        {"short children",
+         Mkr(Join({FullBox("salb", 0, 0, {0}), FullBox("thub", 0, 0, {1, 2}), FullBox("modl", 0, 0, {}), Salb("ok")})),
          false, "valid=1 model= thumb=0 album=ok"},
         // A child of size 0 ends the box with a failure: the record stays as it was.
         {"child of size 0", Mkr(Join({Modl("PX"), Bytes().be32(0).str("salb").data()})), false,
@@ -484,7 +618,8 @@ TEST_F(Mp4, MakerBox) {
     std::memset(&marked, 0x5A, sizeof marked);
     const _MAKERINFO before = marked;
     ByteVec mkr = Mkr(Join({Box("zzzz", ByteVec(4, 0)), Modl("PX"), Thub(kImage)}));
-    EXPECT_EQ(MP4_GetMakerInfo(dir.Write("zzzz.3gp", Movie(Join({Mvhd(0, 1000, 1000), Udta(mkr)}))).c_str(), &marked), MM_OK);
+    EXPECT_EQ(MP4_GetMakerInfo(dir.Write("zzzz.3gp", Movie(Join({Mvhd(0, 1000, 1000), Udta(mkr)}))).c_str(), &marked),
+              MM_OK);
     EXPECT_EQ(std::memcmp(&marked, &before, sizeof marked), 0);
     ByteVec raw = Join({Mkr(Join({Modl("PX"), Box("zzzz", ByteVec(4, 0))})), ByteVec(64, 0)});
     const int h = MEx_fopen(dir.Write("raw.bin", raw).c_str(), "rb");
@@ -501,7 +636,8 @@ TEST(Mp4Corpus, EveryMp4FamilyFileIsAnsweredWithoutAFault) {
         for (const auto& entry : std::filesystem::directory_iterator(root + sub)) {
             std::string ext = entry.path().extension().string();
             for (char& ch : ext) ch = static_cast<char>(std::tolower(static_cast<unsigned char>(ch)));
-            if (ext != ".m4a" && ext != ".mp4" && ext != ".m4b" && ext != ".m4v" && ext != ".3g2" && ext != ".3gp") continue;
+            if (ext != ".m4a" && ext != ".mp4" && ext != ".m4b" && ext != ".m4v" && ext != ".3g2" && ext != ".3gp")
+                continue;
             SCOPED_TRACE(entry.path().string());
             ++files;
             const Answers a(entry.path().string());
@@ -519,7 +655,12 @@ TEST(Mp4Corpus, EveryMp4FamilyFileIsAnsweredWithoutAFault) {
 TEST(Mp4Corpus, TaggedAndUntaggedM4aAsByHand) {
     const std::string root = CorpusDir();
     if (root.empty()) GTEST_SKIP() << testing_support::NoCorpusReason();
-    const struct { const char* name; const char* clip; const char* codec; const char* meta; } cases[] = {
+    const struct {
+        const char* name;
+        const char* clip;
+        const char* codec;
+        const char* meta;
+    } cases[] = {
         {"has-tags.m4a", "m4a size=5108 dur=3000 bps=13621 c1=3237234137 audio=1 abps=2914 hz=44100 ch=2 bits=16",
          "a=4008/0/2102 v=0/0/0", "artist=5:Test Artist"},
         {"no-tags.m4a", "m4a size=2898 dur=3000 bps=7728 c1=3237234137 audio=1 abps=2914 hz=44100 ch=2 bits=16",
@@ -527,7 +668,8 @@ TEST(Mp4Corpus, TaggedAndUntaggedM4aAsByHand) {
         {"ilst-is-last.m4a",
          "m4a size=32768 dur=65000 bps=4032 c1=3239522692 audio=1 abps=159622 hz=44100 ch=2 bits=16",
          "a=4008/0/2102 v=0/0/0",
-         "title=5:Intro artist=5:Pearl Jam album=5:1995-03-22 Brisbane, Australia - Entertainment Centre year=5:1995 track=0:\\x01\\x00\\x00\\x00"},
+         "title=5:Intro artist=5:Pearl Jam album=5:1995-03-22 Brisbane, Australia - Entertainment Centre year=5:1995 "
+         "track=0:\\x01\\x00\\x00\\x00"},
         {"gnre.m4a", "m4a size=5026 dur=3000 bps=13402 c1=3237234137 audio=1 abps=2914 hz=44100 ch=2 bits=16",
          "a=4008/0/2102 v=0/0/0", "genre=5:Ska"},
     };
@@ -544,9 +686,13 @@ TEST(Mp4Ffmpeg, WrittenFilesMatchFfprobe) {
     if (!HaveFfmpeg()) GTEST_SKIP() << "ffmpeg absent";
     TempDir dir;
     const std::string sources = "-f lavfi -i testsrc=d=2:s=176x144:r=15 -f lavfi -i sine=d=2:sample_rate=16000 ";
-    const struct { const char* name; const char* args; uint32_t videoCodec; } cases[] = {
-        {"mpeg4.mp4", "-c:v mpeg4", 0x4001}, {"h264.mp4", "-c:v libx264 -pix_fmt yuv420p", 0x4004},
-        {"h263.3gp", "-c:v h263", 0x4003}};
+    const struct {
+        const char* name;
+        const char* args;
+        uint32_t videoCodec;
+    } cases[] = {{"mpeg4.mp4", "-c:v mpeg4", 0x4001},
+                 {"h264.mp4", "-c:v libx264 -pix_fmt yuv420p", 0x4004},
+                 {"h263.3gp", "-c:v h263", 0x4003}};
     int made = 0;
     for (const auto& c : cases) {
         SCOPED_TRACE(c.name);
@@ -565,9 +711,12 @@ TEST(Mp4Ffmpeg, WrittenFilesMatchFfprobe) {
     EXPECT_GT(made, 0);
     // Tags as iTunes items: text in UTF-8, the track a 4-byte binary number.
     const std::string path = dir.PathOf("tagged.m4a");
-    ASSERT_TRUE(FfmpegWrite("-f lavfi -i sine=d=1 -c:a aac -metadata title='My Title' -metadata artist='Some Artist' "
-                            "-metadata album='An Album' -metadata date=2020 -metadata track=3", path));
+    ASSERT_TRUE(
+        FfmpegWrite("-f lavfi -i sine=d=1 -c:a aac -metadata title='My Title' -metadata artist='Some Artist' "
+                    "-metadata album='An Album' -metadata date=2020 -metadata track=3",
+                    path));
     const Answers a(path);
     ASSERT_EQ(a.metaResult, MM_OK);
-    EXPECT_EQ(MetaSummary(a.meta), "title=5:My Title artist=5:Some Artist album=5:An Album year=5:2020 track=0:\\x03\\x00\\x00\\x00");
+    EXPECT_EQ(MetaSummary(a.meta),
+              "title=5:My Title artist=5:Some Artist album=5:An Album year=5:2020 track=0:\\x03\\x00\\x00\\x00");
 }

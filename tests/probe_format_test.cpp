@@ -30,7 +30,9 @@ TEST(DecodeItemText, TurnsEveryEncodingIntoUtf8) {
 }
 
 TEST(DecodeItemText, InvalidInputBecomesReplacementCharacters) {
-    EXPECT_EQ(probe::DecodeItemText(Item(ENCODING_UTF8, {'a', 0xC3, 'b'})), "a\xEF\xBF\xBD" "b");
+    EXPECT_EQ(probe::DecodeItemText(Item(ENCODING_UTF8, {'a', 0xC3, 'b'})),
+              "a\xEF\xBF\xBD"
+              "b");
     EXPECT_EQ(probe::DecodeItemText(Item(ENCODING_UTF16BE, {0xD8, 0x00, 0x00, 'x'})), "\xEF\xBF\xBDx");
     EXPECT_EQ(probe::DecodeItemText(Item(ENCODING_UTF16LE, {'a', 0x00, 'b'})), "a") << "an odd byte is dropped";
     _MMMetaItem overlong = Item(ENCODING_LATIN1, {'a'});

@@ -84,10 +84,15 @@ TEST(Rm, AnswersOfEachFileShape) {
     badCont.data()[10 + 2 + 5 + 1] = 0x40;  // the author's length runs past the chunk
     // An ID3v1 tag: "TAG", title, artist, album, year, comment, then genre 8 (Jazz).
     const Bytes tag = Bytes().str("TAG").str("Tagged").zeros(24 + 30 + 30 + 4 + 30).u8(8);
-    const struct { const char* name; std::vector<uint8_t> file; std::string answers; } cases[] = {
+    const struct {
+        const char* name;
+        std::vector<uint8_t> file;
+        std::string answers;
+    } cases[] = {
         // Audio and video fields come from their first streams; the audio bit rate is the
         // stream's maximum.
-        {"audio and video", RmFile(Props(2), {RmCont("t", "a", "c", "x"), RmMdpr(AudioStream()), RmMdpr(VideoStream())}),
+        {"audio and video",
+         RmFile(Props(2), {RmCont("t", "a", "c", "x"), RmMdpr(AudioStream()), RmMdpr(VideoStream())}),
          "rm size=430 dur=5 bps=48000 audio=1 video=1 abps=32000 hz=44100 ch=2 bits=16 vbps=200000 w=320 h=240 fps=15 "
          "| a=3002/0/0 v=3040/0/0 | track 0/17 | meta 0 title=3:t artist=3:a copyright=3:c comment=3:x"},
         // Two audio streams are counted but the first describes the audio.
@@ -97,12 +102,14 @@ TEST(Rm, AnswersOfEachFileShape) {
         // Logical streams and lower-case names are neither audio nor video; a stream naming
         // both counts as audio, but its data is video data, which read as audio says nothing.
         {"logical, lower-case, both",
-         RmFile(Props(3), {RmMdpr(With(AudioStream(), 5000, "", "logical-fileinfo")),
-                           RmMdpr(With(AudioStream(), 5000, "audio stream")), RmMdpr(With(VideoStream(), 4000, "Audio+Video"))}),
+         RmFile(Props(3),
+                {RmMdpr(With(AudioStream(), 5000, "", "logical-fileinfo")),
+                 RmMdpr(With(AudioStream(), 5000, "audio stream")), RmMdpr(With(VideoStream(), 4000, "Audio+Video"))}),
          "rm size=547 dur=5 bps=48000 audio=1 video=1 abps=200000 vbps=200000 w=320 h=240 fps=15 | "
          "a=0/0/0 v=3040/0/0 | track 0/17 | meta 1 "},
-        {"logical and lower-case", RmFile(Props(2), {RmMdpr(With(AudioStream(), 5000, "", "logical-fileinfo")),
-                                                     RmMdpr(With(AudioStream(), 5000, "audio stream"))}),
+        {"logical and lower-case",
+         RmFile(Props(2), {RmMdpr(With(AudioStream(), 5000, "", "logical-fileinfo")),
+                           RmMdpr(With(AudioStream(), 5000, "audio stream"))}),
          "rm size=434 dur=5 bps=48000 | a=0/0/0 v=0/0/0 | track 0/0 | meta 1 "},
         // A short PROP duration falls back to the longer stream.
         {"short prop", RmFile(Props(2, 999), {RmMdpr(With(AudioStream(), 7999)), RmMdpr(VideoStream())}),
@@ -156,7 +163,8 @@ TEST(Rm, AnswersOfEachFileShape) {
         {"tag", Bytes().raw(RmFile(Props(1), {RmMdpr(AudioStream())})).raw(tag).data(),
          "rm size=422 dur=5 bps=48000 audio=1 abps=32000 hz=44100 ch=2 bits=16 | a=3002/0/0 v=0/0/0 | track 0/1 | "
          "meta 0 title=3:Tagged genre=3:Jazz"},
-        {"content and tag", Bytes().raw(RmFile(Props(1), {RmCont("Content", "", "", ""), RmMdpr(AudioStream())})).raw(tag).data(),
+        {"content and tag",
+         Bytes().raw(RmFile(Props(1), {RmCont("Content", "", "", ""), RmMdpr(AudioStream())})).raw(tag).data(),
          "rm size=447 dur=5 bps=48000 audio=1 abps=32000 hz=44100 ch=2 bits=16 | a=3002/0/0 v=0/0/0 | track 0/1 | "
          "meta 0 title=3:Content"},
     };
@@ -170,8 +178,10 @@ TEST(Rm, AnswersOfEachFileShape) {
     ASSERT_EQ(MM_MediaExtractor_GetClipInfo(path.c_str(), MEDIA_TYPE_REALMEDIA, &clip), MM_OK);
     EXPECT_EQ(clip.nDuration, 1000u);
     _MMMetaInfo meta;
-    EXPECT_NE(MM_MediaExtractor_GetMetaInfo(dir.Write("none.rm", cases[19].file).c_str(), MEDIA_TYPE_REALMEDIA, &meta), MM_OK);
-    ASSERT_EQ(MM_MediaExtractor_GetMetaInfo(dir.Write("tag.rm", cases[20].file).c_str(), MEDIA_TYPE_REALMEDIA, &meta), MM_OK);
+    EXPECT_NE(MM_MediaExtractor_GetMetaInfo(dir.Write("none.rm", cases[19].file).c_str(), MEDIA_TYPE_REALMEDIA, &meta),
+              MM_OK);
+    ASSERT_EQ(MM_MediaExtractor_GetMetaInfo(dir.Write("tag.rm", cases[20].file).c_str(), MEDIA_TYPE_REALMEDIA, &meta),
+              MM_OK);
     EXPECT_EQ(MetaSummary(meta), "title=3:Tagged genre=3:Jazz");
     MM_MediaExtractor_FreeMetaInfo(&meta);
     // The reader releases an earlier string in the record before handing out new ones
@@ -199,7 +209,13 @@ TEST(Rm, FileHeaderPropertiesAndCountedPartsAreChecked) {
     const size_t mdprAt = 18 + 50 + 8 + 2 + 8 + 300;
     ASSERT_EQ(std::memcmp(late.data() + mdprAt, "MDPR", 4), 0);
     late.resize(mdprAt + 60);
-    struct Case { const char* what; size_t at; uint32_t value; bool word; int32_t expected; } cases[] = {
+    struct Case {
+        const char* what;
+        size_t at;
+        uint32_t value;
+        bool word;
+        int32_t expected;
+    } cases[] = {
         {"as written", 0, 0, false, 0},
         {"not .RMF", 1, 'X', false, -1},
         {"header size as long as the file", 4, static_cast<uint32_t>(good.size()), true, -1},
@@ -228,9 +244,11 @@ TEST(Rm, FileHeaderPropertiesAndCountedPartsAreChecked) {
     _MMMetaInfo meta{};
     EXPECT_EQ(RM_GetMediaInfo(dir.Write("cont.rm", RmFile(Props(1), {badCont})).c_str(), 1, &meta), -3);
     // Every truncation of a full file, for every request.
-    std::vector<uint8_t> full = RmFile(Props(2), {RmCont("T", "A", "C", "X"), RmMdpr(AudioStream()), RmMdpr(VideoStream())});
+    std::vector<uint8_t> full =
+        RmFile(Props(2), {RmCont("T", "A", "C", "X"), RmMdpr(AudioStream()), RmMdpr(VideoStream())});
     for (size_t n = 0; n < full.size(); ++n) {
-        const std::string p = dir.Write("cut.rm", std::vector<uint8_t>(full.begin(), full.begin() + static_cast<long>(n)));
+        const std::string p =
+            dir.Write("cut.rm", std::vector<uint8_t>(full.begin(), full.begin() + static_cast<long>(n)));
         Describe(p);
         _MM_MIMETYPE mime{};
         RM_GetMIMEType(p.c_str(), &mime);
@@ -243,10 +261,15 @@ TEST(Rm, FileHeaderPropertiesAndCountedPartsAreChecked) {
 // seconds, never less than one through the public interface.
 TEST(RmFfmpeg, HeadersAgreeWithFfprobe) {
     if (!HaveFfmpeg()) GTEST_SKIP() << "ffmpeg not installed";
-    const struct { const char* name; const char* args; uint32_t videoCodec; } variants[] = {
-        {"rv10_real144", "-f lavfi -i testsrc=d=2:s=176x144:r=25 -f lavfi -i sine=d=2:sample_rate=8000 -c:v rv10 "
-                         "-c:a real_144 -ac 1", 0x3010},
-        {"real144_only", "-f lavfi -i sine=d=2:sample_rate=8000 -c:a real_144 -ac 1", 0}};
+    const struct {
+        const char* name;
+        const char* args;
+        uint32_t videoCodec;
+    } variants[] = {{"rv10_real144",
+                     "-f lavfi -i testsrc=d=2:s=176x144:r=25 -f lavfi -i sine=d=2:sample_rate=8000 -c:v rv10 "
+                     "-c:a real_144 -ac 1",
+                     0x3010},
+                    {"real144_only", "-f lavfi -i sine=d=2:sample_rate=8000 -c:a real_144 -ac 1", 0}};
     TempDir dir;
     for (const auto& v : variants) {
         SCOPED_TRACE(v.name);

@@ -42,9 +42,14 @@ std::vector<uint8_t> Mp4Head() {
 // recordings leave them.
 std::vector<uint8_t> WaveHead() {
     return Bytes()
-        .str("RIFF").le32(0xFFFFFFFF).str("WAVE")
-        .str("fmt ").le32(16).raw(WaveFmtBody(1, 2, 48000, 16))
-        .str("data").le32(0xFFFFFFFF)
+        .str("RIFF")
+        .le32(0xFFFFFFFF)
+        .str("WAVE")
+        .str("fmt ")
+        .le32(16)
+        .raw(WaveFmtBody(1, 2, 48000, 16))
+        .str("data")
+        .le32(0xFFFFFFFF)
         .data();
 }
 
@@ -128,12 +133,15 @@ TEST(SparseFiles, AnswersDoNotDependOnTheWidthOfPositions) {
         uint64_t gib;
         const char* answers;
     } cases[] = {
-        {"cbr.mp3", 3, "detect 0 type 1 clip 0 size 3221225472 ms 1000 bps 128000 meta 0 title Far End cut 0 bytes 16000"},
-        {"cbr.mp3", 5, "detect 0 type 1 clip 0 size 4294967295 ms 1000 bps 128000 meta 0 title Far End cut 0 bytes 16000"},
+        {"cbr.mp3", 3,
+         "detect 0 type 1 clip 0 size 3221225472 ms 1000 bps 128000 meta 0 title Far End cut 0 bytes 16000"},
+        {"cbr.mp3", 5,
+         "detect 0 type 1 clip 0 size 4294967295 ms 1000 bps 128000 meta 0 title Far End cut 0 bytes 16000"},
         {"co64.mp4", 3, "detect 0 type 3 clip 80004005 meta 80004005 cut 800700E7"},
         {"co64.mp4", 5, "detect 0 type 3 clip 80004005 meta 80004005 cut 800700E7"},
         {"long.wav", 3, "detect 0 type 7 clip 0 size 3221225472 ms 16777000 bps 1536000 meta 800700E7 cut 80070057"},
-        {"long.wav", 5, "detect 0 type 7 clip 0 size 4294967295 ms 27962000 bps 1536000 meta 800700E7 cut 0 bytes 192000"},
+        {"long.wav", 5,
+         "detect 0 type 7 clip 0 size 4294967295 ms 27962000 bps 1536000 meta 800700E7 cut 0 bytes 192000"},
         {"hour.avi", 3, "detect 0 type 11 clip 0 size 3221225472 ms 3600000 bps 0 meta 800700E7 cut 800700E7"},
         {"hour.avi", 5, "detect 0 type 11 clip 0 size 4294967295 ms 3600000 bps 1193046 meta 800700E7 cut 800700E7"},
     };

@@ -29,7 +29,8 @@ TEST(AmrClip, EachFileKindAnswersItsRatesMimeAndCodec) {
     } cases[] = {
         // 3000 frames of 32 bytes: (96006 - 6) / 32 / 50 = 60 s.
         {false, 7, 3000, 0, 0, "amr size=96006 dur=60000 bps=12200 audio=1 abps=12200 hz=8000 ch=1 bits=16 spf=160"},
-        {true, 8, 500, 0, 0x1021, "awb size=30509 dur=10000 bps=23850 audio=1 abps=23850 hz=16000 ch=1 bits=16 spf=320"},
+        {true, 8, 500, 0, 0x1021,
+         "awb size=30509 dur=10000 bps=23850 audio=1 abps=23850 hz=16000 ch=1 bits=16 spf=320"},
         // Wide-band 9 is a SID frame, 15 carries no data (and runs off the code table).
         {true, 9, 250, 0, 0x1022, "awb size=1509 dur=5000 bps=1750 audio=1 abps=1750 hz=16000 ch=1 bits=16 spf=320"},
         {true, 15, 200, 0, 0, "awb size=209 dur=4000 bps=40 audio=1 abps=40 hz=16000 ch=1 bits=16 spf=320"},
@@ -66,14 +67,14 @@ TEST(AmrClip, BadMagicHeaderByteOrShortFileFailsEveryQuery) {
         size_t bytes;
         int32_t result;
     } cases[] = {
-        {"#!AMR\n", 7 << 3, 40, MM_E_FAIL},             // quality bit 0
-        {"#!AMR\n", 7 << 3 | 5, 40, MM_E_FAIL},         // low bits set
+        {"#!AMR\n", 7 << 3, 40, MM_E_FAIL},  // quality bit 0
+        {"#!AMR\n", 7 << 3 | 5, 40, MM_E_FAIL},  // low bits set
         {"#!AMR\n", 0x80 | 7 << 3 | 4, 40, MM_E_FAIL},  // bit 7 set
-        {"#!AMR\n", 9 << 3 | 4, 40, MM_E_FAIL},         // narrow-band 9..14 reserved
+        {"#!AMR\n", 9 << 3 | 4, 40, MM_E_FAIL},  // narrow-band 9..14 reserved
         {"#!AMR\n", 14 << 3 | 4, 40, MM_E_FAIL},
-        {"#!AMR-WB\n", 10 << 3 | 4, 40, MM_E_FAIL},     // wide-band 10..14 reserved
-        {"#!AMR\n", 7 << 3 | 4, 8, MM_E_FAIL},          // 15 bytes in all
-        {"#!AMR-WB_MC1.0\n", -1, 1, MM_E_FAIL},         // first frame past a 16-byte file
+        {"#!AMR-WB\n", 10 << 3 | 4, 40, MM_E_FAIL},  // wide-band 10..14 reserved
+        {"#!AMR\n", 7 << 3 | 4, 8, MM_E_FAIL},  // 15 bytes in all
+        {"#!AMR-WB_MC1.0\n", -1, 1, MM_E_FAIL},  // first frame past a 16-byte file
         {"#!AMR_X\n", -1, 40, MM_E_UNSUPPORTED},
     };
     for (const auto& c : cases) {
@@ -104,7 +105,7 @@ TEST(AmrBlockSize, DropsOneOutlierAtEachEnd) {
     Bytes b;
     b.raw(AmrFrame(false, 7)).raw(AmrFrame(false, 7)).raw(AmrFrame(false, 7)).raw(AmrFrame(false, 0));
     EXPECT_EQ(metainfo::Get_avBlockSize(b.data().data(), 0, b.size(), 1), 32);  // (109 - 32 - 13) / 2
-    EXPECT_EQ(metainfo::Get_avBlockSize(b.data().data() + 64, 0, 45, 1), 22);   // two blocks: 45 / 2
+    EXPECT_EQ(metainfo::Get_avBlockSize(b.data().data() + 64, 0, 45, 1), 22);  // two blocks: 45 / 2
     EXPECT_EQ(metainfo::Get_avBlockSize(nullptr, 0, 100, 1), 0);
 }
 
@@ -217,7 +218,9 @@ TEST(QcpClip, DurationFromVratElseBitrateElseCountedDataPackets) {
     } cases[] = {
         // 1234 / 50; the odd-sized chunk before "fmt " gets no pad byte.
         {{SpeechChunk("labl", Bytes().str("abc")), QcpFmtChunk(kQcelpGuid2, 13000), QcpVratChunk(1234),
-          Data(SpeechPackets(4, 34, 10))}, MM_OK, 24},
+          Data(SpeechPackets(4, 34, 10))},
+         MM_OK,
+         24},
         // Bit rate 0: QCELP rate octets 4 and 1 skip 34 and 3 bytes, 150 packets.
         {{QcpFmtChunk(kQcelpGuid1, 0), Data(SpeechPackets(4, 34, 60).raw(SpeechPackets(1, 3, 90)))}, MM_OK, 3},
         // EVRC inside QCP also takes the quarter rate (2, 5 bytes): 99 packets.
@@ -236,8 +239,8 @@ TEST(QcpClip, DataBeforeFmtIsWalkedWithThePreviousFilesCodec) {
     // The walk of "data" runs to the end of the file, so it also reads the
     // "fmt " chunk behind it: a last half-rate packet (10 bytes) covers that
     // chunk's header, and its zeroed body counts as 148 blank packets.
-    std::string early = SpeechFile("early.qcp", Qcp({Data(SpeechPackets(4, 22, 100).u8(3)),
-                                                    SpeechChunk("fmt ", Bytes().zeros(150))}));
+    std::string early =
+        SpeechFile("early.qcp", Qcp({Data(SpeechPackets(4, 22, 100).u8(3)), SpeechChunk("fmt ", Bytes().zeros(150))}));
     std::string evrc = SpeechFile("evrc.qcp", Qcp({QcpFmtChunk(kEvrcGuid, 0), Data(Bytes().u8(4))}));
     std::string qcelp = SpeechFile("qcelp.qcp", Qcp({QcpFmtChunk(kQcelpGuid1, 13000)}));
     std::string smv = SpeechFile("smv.qcp", Qcp({QcpFmtChunk(kSmvGuid, 0), Data(Bytes().u8(4))}));
@@ -259,12 +262,15 @@ TEST(QcpClip, DataBeforeFmtIsWalkedWithThePreviousFilesCodec) {
         // (a full-rate octet takes 34 bytes): 743 packets.
         ASSERT_EQ(metainfo::QCP_GetCodecType(qcelp.c_str(), &codec), MM_OK);
         EXPECT_EQ(duration(early, MM_OK), 14u);
-    }).join();
+    })
+        .join();
 }
 
 TEST(QcpClip, CodecCodesByGuid) {
-    const std::pair<std::vector<uint8_t>, uint32_t> cases[] = {{kQcelpGuid1, 0x7001}, {kQcelpGuid2, 0x7001},
-                                                               {kEvrcGuid, 0x8001},   {kSmvGuid, 0x9001},
+    const std::pair<std::vector<uint8_t>, uint32_t> cases[] = {{kQcelpGuid1, 0x7001},
+                                                               {kQcelpGuid2, 0x7001},
+                                                               {kEvrcGuid, 0x8001},
+                                                               {kSmvGuid, 0x9001},
                                                                {std::vector<uint8_t>(16, 0x11), 0xFFFF}};
     for (const auto& c : cases) {
         // The data chunk is not walked for a codec query.
@@ -356,8 +362,10 @@ TEST(WaveFormat, ClipInfoFromTheFormatAndTheDataOffset) {
     // (64044 - 36) / 32000 s, truncated; 40 ms of samples a frame.
     _MMClipInfo clip;
     ASSERT_EQ(MM_MediaExtractor_GetClipInfo(SpeechFile("tone.wav", CanonicalWave(1, 1, 16000, 16, 64000)).c_str(),
-                                            MEDIA_TYPE_WAVE, &clip), MM_OK);
-    EXPECT_EQ(ClipSummary(clip), "wav size=64044 dur=2000 bps=256000 audio=1 abps=256000 hz=16000 ch=1 bits=16 spf=640");
+                                            MEDIA_TYPE_WAVE, &clip),
+              MM_OK);
+    EXPECT_EQ(ClipSummary(clip),
+              "wav size=64044 dur=2000 bps=256000 audio=1 abps=256000 hz=16000 ch=1 bits=16 spf=640");
 }
 
 TEST(WaveFormat, ZeroByteRateHasNoDurationAndAnEmptyRange) {
@@ -378,8 +386,8 @@ TEST(WaveFormat, MimeAndCodecByTagWithTheL16Quirk) {
         const char* text;
         uint32_t length, codec;
     } cases[] = {
-        {1, 8, "audio/L8", 8, 0x1030},     {1, 16, "audio/L16", 9, 0x1030},  {6, 8, "audio/pcma", 10, 0x1032},
-        {7, 8, "audio/pcmu", 10, 0x1033},  {1, 24, "audio/L16", 9, 0x1030},  {2, 4, "audio/L16", 9, 0x1031},
+        {1, 8, "audio/L8", 8, 0x1030},    {1, 16, "audio/L16", 9, 0x1030}, {6, 8, "audio/pcma", 10, 0x1032},
+        {7, 8, "audio/pcmu", 10, 0x1033}, {1, 24, "audio/L16", 9, 0x1030}, {2, 4, "audio/L16", 9, 0x1031},
         {6, 16, "audio/L16", 9, 0x1032},
     };
     _MM_MIMETYPE mime{};  // kept across files: each answer releases the one before
@@ -428,9 +436,10 @@ TEST_F(AmrExtract, BufferHoldsWholeSecondsCutToTheDuration) {
         int32_t result;
         int size;
     } cases[] = {
-        {10, 20, MM_OK, 16000}, {50, 100, MM_OK, 16000},
+        {10, 20, MM_OK, 16000},       {50, 100, MM_OK, 16000},
         {60, 61, MM_OK, 0},  // start at the duration: an empty buffer, still allocated
-        {61, 62, MM_E_INVALIDARG, 0}, {5, 5, MM_E_INVALIDARG, 0}, {-1, 5, MM_E_INVALIDARG, 0},
+        {61, 62, MM_E_INVALIDARG, 0}, {5, 5, MM_E_INVALIDARG, 0},
+        {-1, 5, MM_E_INVALIDARG, 0},
     };
     for (const auto& c : cases) {
         SCOPED_TRACE(c.start);

@@ -76,8 +76,7 @@ std::atomic<int> g_logLines{0};
 void CountLine(int, const char*, const char*) { ++g_logLines; }
 void CountLineToo(int, const char*, const char*) { g_logLines += 2; }
 
-const char* const kQueries[] = {"detect", "check", "track type", "codec", "codec ex",
-                                "clip",   "meta", "MIME",  "maker"};
+const char* const kQueries[] = {"detect", "check", "track type", "codec", "codec ex", "clip", "meta", "MIME", "maker"};
 
 // A record's bytes with the result code before them; the caller has nulled
 // its pointers and appends what they pointed to.

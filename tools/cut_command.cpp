@@ -18,10 +18,8 @@ struct FileCutter {
 
 // One row per format whose audio can be cut into a file.
 const FileCutter kCutters[] = {
-    {MEDIA_TYPE_AAC, AAC_GetAuidoData_File},
-    {MEDIA_TYPE_MP3, MP3_GetAudioData2File},
-    {MEDIA_TYPE_WAVE, WAVE_GetAudioData2File},
-    {MEDIA_TYPE_AMR_NB, AMR_GetAudioData2File},
+    {MEDIA_TYPE_AAC, AAC_GetAuidoData_File},    {MEDIA_TYPE_MP3, MP3_GetAudioData2File},
+    {MEDIA_TYPE_WAVE, WAVE_GetAudioData2File},  {MEDIA_TYPE_AMR_NB, AMR_GetAudioData2File},
     {MEDIA_TYPE_AMR_WB, AMR_GetAudioData2File},
 };
 

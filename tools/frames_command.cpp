@@ -30,9 +30,9 @@ void PrintStreams(CAVIParser* parser) {
     for (uint32_t i = 0; i < parser->getStreamNum(); ++i) {
         const _AVIStreamHeader* h = parser->getStreamHeader(i);
         if (h == nullptr) continue;
-        std::printf("  stream %u: %s codec 0x%08X, scale %u, rate %u, length %u\n", i,
-                    FourccText(h->fccType).c_str(), static_cast<unsigned>(parser->getStreamType(static_cast<int>(i))),
-                    h->dwScale, h->dwRate, h->dwLength);
+        std::printf("  stream %u: %s codec 0x%08X, scale %u, rate %u, length %u\n", i, FourccText(h->fccType).c_str(),
+                    static_cast<unsigned>(parser->getStreamType(static_cast<int>(i))), h->dwScale, h->dwRate,
+                    h->dwLength);
     }
 }
 

@@ -99,7 +99,8 @@ int main(int argc, char** argv) {
     std::string framesFile;
     uint32_t stream = 0;
     uint32_t seekMs = 0;
-    CLI::App* framesCmd = app.add_subcommand("frames", "The index of an AVI file, and its frames read through the parser.");
+    CLI::App* framesCmd =
+        app.add_subcommand("frames", "The index of an AVI file, and its frames read through the parser.");
     framesCmd->add_option("file", framesFile, "the AVI file")->required();
     framesCmd->add_option("--stream", stream, "stream number")->check(CLI::Range(0, 0xFFFF));
     auto* seekOpt = framesCmd->add_option("--seek", seekMs, "start at this time (milliseconds)");

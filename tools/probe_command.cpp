@@ -95,7 +95,8 @@ void Probe(const std::string& path, Report* r) {
     const char* p = path.c_str();
     r->detectResult = MM_MediaExtractor_DetectMediaType(p, &r->type);
     if (r->detectResult != MM_OK || r->type == MEDIA_TYPE_UNKNOWN) {
-        r->problem = "not a media file (" + (r->detectResult != MM_OK ? ResultText(r->detectResult) : "no known type") + ")";
+        r->problem =
+            "not a media file (" + (r->detectResult != MM_OK ? ResultText(r->detectResult) : "no known type") + ")";
         return;
     }
     r->probed = true;
@@ -111,7 +112,8 @@ void Probe(const std::string& path, Report* r) {
     if (r->type == MEDIA_TYPE_MP4) ProbeMaker(path, r);
     // A failure (rather than "unsupported") of the clip information of a file
     // whose type was recognised means its structure breaks off or is broken.
-    if (r->clipResult == MM_E_FAIL) r->problem = "damaged or truncated (clip information " + ResultText(r->clipResult) + ")";
+    if (r->clipResult == MM_E_FAIL)
+        r->problem = "damaged or truncated (clip information " + ResultText(r->clipResult) + ")";
 }
 
 void PrintText(const Report& r) {
@@ -153,9 +155,7 @@ bool ProbePrinter::Print(const std::string& path) {
         case Output::kJson:
             std::printf("%s\n", ReportJson(r).dump(-1, ' ', false, Json::error_handler_t::replace).c_str());
             break;
-        case Output::kCsv:
-            PrintCsvRow(CsvRow(ReportJson(r)));
-            break;
+        case Output::kCsv: PrintCsvRow(CsvRow(ReportJson(r))); break;
         case Output::kText:
             if (r.probed) PrintText(r);
             break;

@@ -6,13 +6,13 @@ namespace probe {
 namespace {
 
 const char* const kMediaTypeNames[MM_MEDIA_SLOTS] = {
-    "none", "mp3", "realmedia", "mp4", "asf", "midi", "aac", "wav",
-    "amr", "amr-wb", "imelody", "avi", "qcp", "evrc", "unused", "snd",
+    "none", "mp3",    "realmedia", "mp4", "asf", "midi", "aac",    "wav",
+    "amr",  "amr-wb", "imelody",   "avi", "qcp", "evrc", "unused", "snd",
 };
 
 const char* const kMetaItemNames[MM_META_ITEMS] = {
-    "title", "artist", "album", "genre", "year", "copyright", "reserved", "composer", "track",
-    "language", "comment", "file_type", "conductor", "publisher", "date", "time", "picture_mime",
+    "title",    "artist",  "album",     "genre",     "year",      "copyright", "reserved", "composer",     "track",
+    "language", "comment", "file_type", "conductor", "publisher", "date",      "time",     "picture_mime",
 };
 
 const uint32_t kReplacement = 0xFFFD;
@@ -46,8 +46,13 @@ std::string DecodeUtf16(const uint8_t* p, size_t n, bool bigEndian) {
     size_t i = 0;
     if (n >= 2) {
         // A byte-order mark states the order of what follows.
-        if (p[0] == 0xFE && p[1] == 0xFF) { bigEndian = true; i = 2; }
-        else if (p[0] == 0xFF && p[1] == 0xFE) { bigEndian = false; i = 2; }
+        if (p[0] == 0xFE && p[1] == 0xFF) {
+            bigEndian = true;
+            i = 2;
+        } else if (p[0] == 0xFF && p[1] == 0xFE) {
+            bigEndian = false;
+            i = 2;
+        }
     }
     auto unit = [&](size_t at) -> uint32_t {
         return bigEndian ? (uint32_t(p[at]) << 8 | p[at + 1]) : (uint32_t(p[at + 1]) << 8 | p[at]);
@@ -74,11 +79,24 @@ size_t Utf8SequenceLength(const uint8_t* p, size_t n, uint32_t* cp) {
     uint8_t b = p[0];
     size_t len;
     uint32_t min;
-    if (b < 0x80) { *cp = b; return 1; }
-    if ((b & 0xE0) == 0xC0) { len = 2; *cp = b & 0x1F; min = 0x80; }
-    else if ((b & 0xF0) == 0xE0) { len = 3; *cp = b & 0x0F; min = 0x800; }
-    else if ((b & 0xF8) == 0xF0) { len = 4; *cp = b & 0x07; min = 0x10000; }
-    else return 0;
+    if (b < 0x80) {
+        *cp = b;
+        return 1;
+    }
+    if ((b & 0xE0) == 0xC0) {
+        len = 2;
+        *cp = b & 0x1F;
+        min = 0x80;
+    } else if ((b & 0xF0) == 0xE0) {
+        len = 3;
+        *cp = b & 0x0F;
+        min = 0x800;
+    } else if ((b & 0xF8) == 0xF0) {
+        len = 4;
+        *cp = b & 0x07;
+        min = 0x10000;
+    } else
+        return 0;
     if (len > n) return 0;
     for (size_t k = 1; k < len; ++k) {
         if ((p[k] & 0xC0) != 0x80) return 0;

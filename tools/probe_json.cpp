@@ -73,13 +73,15 @@ std::string Clean(const std::string& s) {
     return out.substr(first, out.find_last_not_of(' ') - first + 1);
 }
 
-std::string ItemText(const _MMMetaItem& item) { return item.nLength != 0 ? Clean(DecodeItemText(item)) : std::string(); }
+std::string ItemText(const _MMMetaItem& item) {
+    return item.nLength != 0 ? Clean(DecodeItemText(item)) : std::string();
+}
 
 // "3", "3/11": the number before the slash, and the one after.
 Json NumberPart(const std::string& s, bool total) {
     const size_t slash = s.find('/');
-    const std::string part = total ? (slash == std::string::npos ? std::string() : s.substr(slash + 1))
-                                   : s.substr(0, slash);
+    const std::string part =
+        total ? (slash == std::string::npos ? std::string() : s.substr(slash + 1)) : s.substr(0, slash);
     if (part.empty() || part.size() > 9 || part.find_first_not_of("0123456789") != std::string::npos) return nullptr;
     return std::stoi(part);
 }
@@ -216,11 +218,21 @@ Json ExactJson(const Report& r) {
         const _MMClipInfo& c = r.clip;
         clip["format"] = std::string(c.szFormat, strnlen(c.szFormat, sizeof c.szFormat));
         const std::pair<const char*, uint32_t> fields[] = {
-            {"size", c.nFileSize},          {"duration_ms", c.nDuration},      {"bit_rate", c.nBitrate},
-            {"has_audio", c.bHasAudio},     {"has_video", c.bHasVideo},        {"audio_bit_rate", c.nAudioBitrate},
-            {"sample_rate", c.nSampleRate}, {"channels", c.nChannels},         {"bits_per_sample", c.nBitsPerSample},
-            {"samples_per_frame", c.nSamplesPerFrame}, {"video_bit_rate", c.nVideoBitrate}, {"width", c.nWidth},
-            {"height", c.nHeight},          {"frame_rate", c.nFrameRate},      {"creation_time", c.nReserved1},
+            {"size", c.nFileSize},
+            {"duration_ms", c.nDuration},
+            {"bit_rate", c.nBitrate},
+            {"has_audio", c.bHasAudio},
+            {"has_video", c.bHasVideo},
+            {"audio_bit_rate", c.nAudioBitrate},
+            {"sample_rate", c.nSampleRate},
+            {"channels", c.nChannels},
+            {"bits_per_sample", c.nBitsPerSample},
+            {"samples_per_frame", c.nSamplesPerFrame},
+            {"video_bit_rate", c.nVideoBitrate},
+            {"width", c.nWidth},
+            {"height", c.nHeight},
+            {"frame_rate", c.nFrameRate},
+            {"creation_time", c.nReserved1},
         };
         for (const auto& f : fields) clip[f.first] = f.second;
     }
@@ -230,7 +242,8 @@ Json ExactJson(const Report& r) {
         Json items = Json::object();
         for (int k = 0; k < MM_META_ITEMS; ++k) {
             const _MMMetaItem& item = r.meta.aItems[k];
-            if (item.nLength != 0) items[MetaItemName(k)] = {{"encoding", item.nEncoding}, {"text", DecodeItemText(item)}};
+            if (item.nLength != 0)
+                items[MetaItemName(k)] = {{"encoding", item.nEncoding}, {"text", DecodeItemText(item)}};
         }
         meta["items"] = items;
         meta["rating"] = r.meta.nRating;
@@ -270,12 +283,41 @@ Json ReportJson(const Report& r) {
 }
 
 std::vector<std::string> CsvColumns() {
-    return {"path", "path_bytes", "size", "format", "mime", "duration", "bit_rate", "creation_time",
-            "audio.codec", "audio.profile", "audio.sample_rate", "audio.channels", "audio.bits_per_sample",
-            "audio.bit_rate", "video.codec", "video.profile", "video.level", "video.width", "video.height",
-            "video.frame_rate", "video.bit_rate", "tags.title", "tags.artist", "tags.album", "tags.album_artist",
-            "tags.genre", "tags.date", "tags.year", "tags.track", "tags.track_total", "tags.disc", "tags.comment",
-            "tags.composer", "pictures", "error"};
+    return {"path",
+            "path_bytes",
+            "size",
+            "format",
+            "mime",
+            "duration",
+            "bit_rate",
+            "creation_time",
+            "audio.codec",
+            "audio.profile",
+            "audio.sample_rate",
+            "audio.channels",
+            "audio.bits_per_sample",
+            "audio.bit_rate",
+            "video.codec",
+            "video.profile",
+            "video.level",
+            "video.width",
+            "video.height",
+            "video.frame_rate",
+            "video.bit_rate",
+            "tags.title",
+            "tags.artist",
+            "tags.album",
+            "tags.album_artist",
+            "tags.genre",
+            "tags.date",
+            "tags.year",
+            "tags.track",
+            "tags.track_total",
+            "tags.disc",
+            "tags.comment",
+            "tags.composer",
+            "pictures",
+            "error"};
 }
 
 std::vector<std::string> CsvRow(const Json& report) {

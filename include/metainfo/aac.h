@@ -30,8 +30,7 @@ MM_EXPORT int32_t AAC_GetAuidoData_File(const char* path, int startSec, int endS
  * success; 1 when the file is not read as AAC, the range is rejected (also a
  * range that holds no frame start), the file cannot be opened or the range
  * cannot be read whole; 0x80004005 on a failed allocation or seek. */
-MM_EXPORT int32_t AAC_GetAuidoData_Buf(const char* path, int startSec, int endSec, unsigned char** data,
-                                       int* length);
+MM_EXPORT int32_t AAC_GetAuidoData_Buf(const char* path, int startSec, int endSec, unsigned char** data, int* length);
 
 #ifdef __cplusplus
 }

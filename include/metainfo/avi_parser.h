@@ -42,7 +42,7 @@ struct _AVIMainHeader {
     uint32_t cb;
     uint32_t dwMicroSecPerFrame;
     uint32_t dwMaxBytesPerSec;
-    uint32_t dwFlags;  /* read big-endian */
+    uint32_t dwFlags; /* read big-endian */
     uint32_t dwTotalFrames;
     uint32_t dwInitialFrames;
     uint32_t dwStreams;
@@ -51,16 +51,16 @@ struct _AVIMainHeader {
     uint32_t dwHeight;
     uint32_t dwReserved[4];
     /* Bits of the big-endian dwFlags word. */
-    uint32_t bHasIndex;      /* bit 4 */
-    uint32_t bCopyrighted;   /* bit 17 */
-    uint32_t bInterleaved;   /* bit 8 */
-    uint32_t bMustUseIndex;  /* bit 5 */
+    uint32_t bHasIndex; /* bit 4 */
+    uint32_t bCopyrighted; /* bit 17 */
+    uint32_t bInterleaved; /* bit 8 */
+    uint32_t bMustUseIndex; /* bit 5 */
 };
 
 struct _AVIStreamHeader {
-    uint32_t fccType;     /* big-endian: "vids" = 0x76696473 */
-    uint32_t fccHandler;  /* big-endian */
-    uint32_t dwFlags;     /* big-endian */
+    uint32_t fccType; /* big-endian: "vids" = 0x76696473 */
+    uint32_t fccHandler; /* big-endian */
+    uint32_t dwFlags; /* big-endian */
     uint32_t dwPriorityLanguage;
     uint32_t dwInitialFrames;
     uint32_t dwScale;
@@ -101,12 +101,12 @@ struct _AVIAudioFormat {
 
 /* One 16-byte "idx1" entry with its presentation time. */
 struct _AVIIndexEntry {
-    uint32_t ckid;           /* big-endian, e.g. "00dc" */
-    uint32_t dwFlags;        /* big-endian: a plain key frame holds 0x10000000 */
-    uint32_t dwChunkOffset;  /* relative to the "movi" type word */
+    uint32_t ckid; /* big-endian, e.g. "00dc" */
+    uint32_t dwFlags; /* big-endian: a plain key frame holds 0x10000000 */
+    uint32_t dwChunkOffset; /* relative to the "movi" type word */
     uint32_t dwChunkLength;
-    uint16_t wStream;        /* from the first two characters of ckid */
-    uint16_t wType;          /* the last two characters of ckid */
+    uint16_t wStream; /* from the first two characters of ckid */
+    uint16_t wType; /* the last two characters of ckid */
     uint32_t dwTimeMs;
 };
 
@@ -184,8 +184,7 @@ private:
     int32_t parseHdrl();
     int32_t ParseStrl(const unsigned char* body, uint32_t size);
     int32_t getAVIMainHeader(const unsigned char* body, uint32_t size);
-    int32_t getAVIStreamHeader(const unsigned char* body, uint32_t size, _AVIStreamHeader* header,
-                               uint32_t* chunkSize);
+    int32_t getAVIStreamHeader(const unsigned char* body, uint32_t size, _AVIStreamHeader* header, uint32_t* chunkSize);
     int32_t getAVIStreamFormat(const unsigned char* chunk, uint32_t avail, uint32_t fccType);
     int32_t getChunkHeader(int handle, _CHUNKHEADER* header);
     int32_t getChunkHeader(const unsigned char* buf, _CHUNKHEADER* header);

@@ -24,11 +24,9 @@ typedef int32_t (*MM_TrackTypeFn)(const char* path, int* mask);
 typedef int32_t (*MM_MetaInfoFn)(const char* path, _MMMetaInfo* meta, int pictureLimit);
 typedef int32_t (*MM_ClipInfoFn)(const char* path, _MMClipInfo* clip);
 typedef int32_t (*MM_MIMETypeFn)(const char* path, _MM_MIMETYPE* mime);
-typedef int32_t (*MM_AudioDataFn)(const char* path, int startSec, int endSec,
-                                  unsigned char** data, int* size);
+typedef int32_t (*MM_AudioDataFn)(const char* path, int startSec, int endSec, unsigned char** data, int* size);
 typedef int32_t (*MM_CodecTypeFn)(const char* path, _MM_CODECTYPE* codec);
-typedef int32_t (*MM_VideoDataFn)(const char* path, int startSec, int endSec,
-                                  unsigned char** data, int* size);
+typedef int32_t (*MM_VideoDataFn)(const char* path, int startSec, int endSec, unsigned char** data, int* size);
 
 /* Dispatch tables, indexed by media type; a null slot means "not offered". */
 MM_EXPORT extern const MM_TrackTypeFn MM_GetTrackType[MM_MEDIA_SLOTS];
@@ -49,10 +47,10 @@ MM_EXPORT int32_t MM_MediaExtractor_FreeClipInfo(_MMClipInfo* clip);
 MM_EXPORT int32_t MM_MediaExtractor_GetMetaInfo(const char* path, int type, _MMMetaInfo* meta);
 MM_EXPORT int32_t MM_MediaExtractor_FreeMetaInfo(_MMMetaInfo* meta);
 MM_EXPORT int32_t MM_MediaExtractor_GetMIMEType(const char* path, _MM_MIMETYPE* mime);
-MM_EXPORT int32_t MM_MediaExtractor_GetAudioData(const char* path, int startSec, int endSec,
-                                                 unsigned char** data, int* size);
-MM_EXPORT int32_t MM_MediaExtractor_GetVideoData(const char* path, int startSec, int endSec,
-                                                 unsigned char** data, int* size);
+MM_EXPORT int32_t MM_MediaExtractor_GetAudioData(const char* path, int startSec, int endSec, unsigned char** data,
+                                                 int* size);
+MM_EXPORT int32_t MM_MediaExtractor_GetVideoData(const char* path, int startSec, int endSec, unsigned char** data,
+                                                 int* size);
 MM_EXPORT int32_t MM_MediaExtractor_GetMakerInfo(const char* path, _MAKERINFO* maker);
 
 /* Releases any buffer the library handed out (MIME strings, audio data,
@@ -71,8 +69,7 @@ typedef struct MM_DrmProvider {
     /* Calls emit(emit_ctx, key, value) for each metadata pair of path;
        returns 0 when the service has metadata for the path, non-zero when it has none. */
     int (*getMetadata)(void* context, const char* path,
-                       void (*emit)(void* emit_ctx, const char* key, const char* value),
-                       void* emit_ctx);
+                       void (*emit)(void* emit_ctx, const char* key, const char* value), void* emit_ctx);
     /* Opens a decrypt session; null when it cannot. *decryptApiType receives the
        session's decrypt API type (2 = container-based decryption). */
     void* (*openDecryptSession)(void* context, const char* path, int* decryptApiType);

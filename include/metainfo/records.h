@@ -18,14 +18,14 @@ extern "C" {
 #endif
 
 /* Result codes (COM style; any non-zero value is a failure). */
-#define MM_OK                 ((int32_t)0)
-#define MM_E_INVALIDARG       ((int32_t)0x80070057u)
-#define MM_E_FAIL             ((int32_t)0x80004005u)
-#define MM_E_UNSUPPORTED      ((int32_t)0x800700E7u)
-#define MM_E_NOEXTENSION      ((int32_t)0x80004003u)
-#define MM_E_NOTPROVIDED      ((int32_t)0x80004002u)
-#define MM_E_NOTIMPL          ((int32_t)0x80004001u)
-#define MM_E_OUTOFMEMORY      ((int32_t)0x8007000Eu)
+#define MM_OK ((int32_t)0)
+#define MM_E_INVALIDARG ((int32_t)0x80070057u)
+#define MM_E_FAIL ((int32_t)0x80004005u)
+#define MM_E_UNSUPPORTED ((int32_t)0x800700E7u)
+#define MM_E_NOEXTENSION ((int32_t)0x80004003u)
+#define MM_E_NOTPROVIDED ((int32_t)0x80004002u)
+#define MM_E_NOTIMPL ((int32_t)0x80004001u)
+#define MM_E_OUTOFMEMORY ((int32_t)0x8007000Eu)
 
 /* Media type codes: also the slot index into the dispatch tables. */
 typedef enum MediaType {
@@ -69,10 +69,10 @@ typedef enum InfoRequest {
 
 /* Encodings of a metadata item's payload (the nEncoding values). */
 typedef enum TextEncoding {
-    ENCODING_BINARY = 0,   /* little-endian integer of nLength bytes */
-    ENCODING_RAW = 2,      /* raw 8-bit bytes / ASCII */
-    ENCODING_LATIN1 = 3,   /* ISO-8859-1 */
-    ENCODING_UTF16BE = 4,  /* UTF-16 big-endian, FE FF mark kept when present */
+    ENCODING_BINARY = 0, /* little-endian integer of nLength bytes */
+    ENCODING_RAW = 2, /* raw 8-bit bytes / ASCII */
+    ENCODING_LATIN1 = 3, /* ISO-8859-1 */
+    ENCODING_UTF16BE = 4, /* UTF-16 big-endian, FE FF mark kept when present */
     ENCODING_UTF8 = 5,
     ENCODING_UTF16LE = 6
 } TextEncoding;
@@ -110,9 +110,9 @@ typedef enum MetaItemKind {
 typedef struct _MMClipInfo {
     char szFormat[128];
     uint32_t nFileSize;
-    uint32_t nDuration;      /* milliseconds through the public interface */
+    uint32_t nDuration; /* milliseconds through the public interface */
     uint32_t nBitrate;
-    uint32_t nReserved1;     /* MP4 creation time */
+    uint32_t nReserved1; /* MP4 creation time */
     uint32_t nReserved2;
     uint32_t bHasAudio;
     uint32_t bHasVideo;
@@ -130,12 +130,12 @@ typedef struct _MMClipInfo {
 typedef struct _MMMetaItem {
     uint32_t nEncoding;
     unsigned char szData[MM_META_DATA_SIZE]; /* not necessarily NUL-terminated */
-    uint32_t nLength;                        /* valid bytes of szData, 0 = empty */
+    uint32_t nLength; /* valid bytes of szData, 0 = empty */
 } _MMMetaItem;
 
 typedef struct _MMMetaInfo {
     _MMMetaItem aItems[MM_META_ITEMS];
-    unsigned char* pPicture;   /* release with MM_MediaExtractor_FreeMetaInfo */
+    unsigned char* pPicture; /* release with MM_MediaExtractor_FreeMetaInfo */
     uint32_t nPictureSize;
     uint32_t nRating;
     uint32_t nPlayCount;
@@ -153,9 +153,9 @@ typedef struct _MM_CODECTYPE {
 } _MM_CODECTYPE;
 
 typedef struct _MM_MIMETYPE {
-    char* pszMimeType;         /* release with MM_MediaExtractor_FreeBuffer */
+    char* pszMimeType; /* release with MM_MediaExtractor_FreeBuffer */
     uint32_t nMimeLength;
-    char* pszVideoMimeType;    /* RealMedia only */
+    char* pszVideoMimeType; /* RealMedia only */
     uint32_t nVideoMimeLength;
 } _MM_MIMETYPE;
 

@@ -42,7 +42,9 @@ AacBitReader MakeAacBitReader(const uint8_t* buf, int size, int bytePos, int bit
 inline int BytePosition(const AacBitReader& r) { return static_cast<int>(r.bitPos >> 3); }
 inline bool AtByteStart(const AacBitReader& r) { return (r.bitPos & 7) == 0; }
 // Moves to the start of byte bytePos (not below 0).
-inline void SetBytePosition(AacBitReader* r, int bytePos) { r->bitPos = static_cast<int64_t>(bytePos < 0 ? 0 : bytePos) * 8; }
+inline void SetBytePosition(AacBitReader* r, int bytePos) {
+    r->bitPos = static_cast<int64_t>(bytePos < 0 ? 0 : bytePos) * 8;
+}
 
 // Bits left before the end of the data; negative once a skip has passed it.
 inline int64_t RemainingBits(const AacBitReader* r) { return static_cast<int64_t>(r->size) * 8 - r->bitPos; }

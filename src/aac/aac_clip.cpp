@@ -15,8 +15,7 @@
 namespace metainfo {
 
 const uint32_t g_uSamplingFrequencyTable[16] = {
-    96000, 88200, 64000, 48000, 44100, 32000, 24000, 22050,
-    16000, 12000, 11025, 8000, 0, 0, 0, 0,
+    96000, 88200, 64000, 48000, 44100, 32000, 24000, 22050, 16000, 12000, 11025, 8000, 0, 0, 0, 0,
 };
 
 const uint32_t channelMapTab[8] = {0xFFFFFFFFu, 1, 2, 3, 4, 5, 6, 8};
@@ -176,8 +175,8 @@ int AdtsFrame(const uint8_t* frame, int available, uint32_t* walkerState, uint32
     return 0;
 }
 
-int32_t UnpackADTSHeader(const uint8_t* buf, int bytesRead, int offset, _MMClipInfo* clip,
-                         uint32_t skippedTagBytes, AacWalk* walk) {
+int32_t UnpackADTSHeader(const uint8_t* buf, int bytesRead, int offset, _MMClipInfo* clip, uint32_t skippedTagBytes,
+                         AacWalk* walk) {
     const uint8_t* first = buf + offset;
     const uint32_t sampleRate = g_uSamplingFrequencyTable[(first[2] >> 2) & 0x0F];
     clip->nSampleRate = sampleRate;
@@ -223,10 +222,10 @@ int32_t UnpackADTSHeader(const uint8_t* buf, int bytesRead, int offset, _MMClipI
     // The first frame (often the encoder's header frame) and the two largest
     // take no part in the average once there are enough frames. Unsigned,
     // as the average has always been computed.
-    const uint32_t average =
-        count > 3 ? (sum - static_cast<uint32_t>(firstSize) - sizes[count - 1] - sizes[count - 2]) /
-                        static_cast<uint32_t>(count - 3)
-                  : sum / static_cast<uint32_t>(count);
+    const uint32_t average = count > 3
+                                 ? (sum - static_cast<uint32_t>(firstSize) - sizes[count - 1] - sizes[count - 2]) /
+                                       static_cast<uint32_t>(count - 3)
+                                 : sum / static_cast<uint32_t>(count);
     // 1024 samples a frame, 8 bits a byte. The product wraps at 32 bits and is
     // divided as a signed value, as callers have always seen it.
     const int32_t bitrate = static_cast<int32_t>(sampleRate * average) / 128;
@@ -235,8 +234,8 @@ int32_t UnpackADTSHeader(const uint8_t* buf, int bytesRead, int offset, _MMClipI
     return MM_OK;
 }
 
-int32_t UnpackADIFHeader(const uint8_t* buf, int bytesRead, int offset, _MMClipInfo* clip,
-                         uint32_t skippedTagBytes, AacWalk* walk) {
+int32_t UnpackADIFHeader(const uint8_t* buf, int bytesRead, int offset, _MMClipInfo* clip, uint32_t skippedTagBytes,
+                         AacWalk* walk) {
     // The fixed header fields, with bytes beyond the data read taken as zero.
     uint8_t h[kAdifHeaderBytes] = {};
     const int available = bytesRead - offset;
@@ -251,8 +250,8 @@ int32_t UnpackADIFHeader(const uint8_t* buf, int bytesRead, int offset, _MMClipI
 
     SetBitrate(clip, static_cast<int32_t>(bitrate));
     clip->nSampleRate = g_uSamplingFrequencyTable[samplingIndex];
-    clip->nDuration = DurationSeconds(clip->nFileSize, skippedTagBytes, static_cast<uint32_t>(offset),
-                                      static_cast<int32_t>(bitrate));
+    clip->nDuration =
+        DurationSeconds(clip->nFileSize, skippedTagBytes, static_cast<uint32_t>(offset), static_cast<int32_t>(bitrate));
 
     AacBitReader r = MakeAacBitReader(buf + offset, std::max(0, available), 7 + shift, 1);
     if (!variableRate) {

@@ -36,10 +36,10 @@ struct AacWalk {
 // Fill the clip info from the first ADTS frame / the ADIF header found at
 // `offset` in buf, of which bytesRead bytes hold file data. clip->nFileSize
 // must be set; skippedTagBytes is what the duration leaves out.
-int32_t UnpackADTSHeader(const uint8_t* buf, int bytesRead, int offset, _MMClipInfo* clip,
-                         uint32_t skippedTagBytes, AacWalk* walk);
-int32_t UnpackADIFHeader(const uint8_t* buf, int bytesRead, int offset, _MMClipInfo* clip,
-                         uint32_t skippedTagBytes, AacWalk* walk);
+int32_t UnpackADTSHeader(const uint8_t* buf, int bytesRead, int offset, _MMClipInfo* clip, uint32_t skippedTagBytes,
+                         AacWalk* walk);
+int32_t UnpackADIFHeader(const uint8_t* buf, int bytesRead, int offset, _MMClipInfo* clip, uint32_t skippedTagBytes,
+                         AacWalk* walk);
 
 // Reads the stream from the handle's position (just after any ID3v2 tag).
 // *codec holds the walker state (1) on entry and the codec code on return.

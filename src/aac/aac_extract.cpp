@@ -130,8 +130,7 @@ extern "C" int32_t AAC_GetAuidoData_File(const char* path, int startSec, int end
     return WriteRange(in.get(), out.get(), startOffset, endOffset, buf.get());
 }
 
-extern "C" int32_t AAC_GetAuidoData_Buf(const char* path, int startSec, int endSec, unsigned char** data,
-                                        int* length) {
+extern "C" int32_t AAC_GetAuidoData_Buf(const char* path, int startSec, int endSec, unsigned char** data, int* length) {
     if (data == nullptr || length == nullptr) return MM_E_INVALIDARG;
     int32_t startOffset = 0;
     int32_t endOffset = 0;

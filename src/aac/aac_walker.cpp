@@ -112,8 +112,7 @@ int ics_info(AacBitReader* r, int samplingIndex, IcsInfo* info) {
         info->predictor_data_present = static_cast<int>(ReadBits(r, 1));
         if (info->predictor_data_present) {
             if (ReadBits(r, 1)) ReadBits(r, 5);  // predictor_reset, predictor_reset_group_number
-            const int limit = info->max_sfb < pred_sfb_max[samplingIndex] ? info->max_sfb
-                                                                         : pred_sfb_max[samplingIndex];
+            const int limit = info->max_sfb < pred_sfb_max[samplingIndex] ? info->max_sfb : pred_sfb_max[samplingIndex];
             for (int sfb = 0; sfb < limit; ++sfb) ReadBits(r, 1);  // prediction_used
         }
     }
@@ -238,9 +237,7 @@ int gain_control_data(AacBitReader* r, const ChannelStream* cs) {
     const int max_band = static_cast<int>(ReadBits(r, 2));
     for (int bd = 1; bd <= max_band; ++bd) {
         switch (cs->info.window_sequence) {
-            case ONLY_LONG_SEQUENCE:
-                GainWindow(r, 5);
-                break;
+            case ONLY_LONG_SEQUENCE: GainWindow(r, 5); break;
             case LONG_START_SEQUENCE:
                 GainWindow(r, 4);
                 GainWindow(r, 2);
@@ -339,8 +336,7 @@ int spectral_data(AacBitReader* r, const ChannelStream* cs) {
             if (cb == ZERO_HCB || cb == NOISE_HCB || cb == INTENSITY_HCB || cb == INTENSITY_HCB2) continue;
             // Book 12 is reserved: there is no table to read it with.
             if (cb < 1 || cb > ESC_HCB) return kWalkBadCodebook;
-            const int lines =
-                (info.swb_offset[sfb + 1] - info.swb_offset[sfb]) * info.window_group_length[g];
+            const int lines = (info.swb_offset[sfb + 1] - info.swb_offset[sfb]) * info.window_group_length[g];
             const int step = hcb_table[cb].dimension;
             const int result = SpectralBand(r, HuffTableFor(cb), (lines + step - 1) / step);
             if (result != 0) return result;
@@ -446,7 +442,7 @@ int program_config_element(AacBitReader* r, uint32_t* channels, uint32_t* object
     if (ReadBits(r, 1)) ReadBits(r, 3);  // matrix_mixdown_idx, pseudo_surround_enable
     for (uint32_t i = 0; i < num_front + num_side + num_back; ++i) {
         *channels += ReadBits(r, 1);  // is_cpe: a channel pair counts two
-        ReadBits(r, 4);               // tag_select
+        ReadBits(r, 4);  // tag_select
     }
     for (uint32_t i = 0; i < num_lfe + num_assoc_data; ++i) ReadBits(r, 4);
     for (uint32_t i = 0; i < num_valid_cc; ++i) ReadBits(r, 5);
@@ -461,15 +457,9 @@ int RawDataStream(AacBitReader* r, uint32_t* walkerState, int samplingIndex) {
         if (r->exhausted) break;
         switch (id) {
             case ID_SCE:
-            case ID_LFE:
-                single_lfe_channel_element(r, samplingIndex);
-                break;
-            case ID_CPE:
-                channel_pair_element(r, samplingIndex);
-                break;
-            case ID_CCE:
-                coupling_channel_element(r, samplingIndex);
-                break;
+            case ID_LFE: single_lfe_channel_element(r, samplingIndex); break;
+            case ID_CPE: channel_pair_element(r, samplingIndex); break;
+            case ID_CCE: coupling_channel_element(r, samplingIndex); break;
             case ID_DSE: {
                 ReadBits(r, 4);  // element_instance_tag
                 const bool data_byte_align_flag = ReadBits(r, 1) != 0;

@@ -13,7 +13,6 @@ using namespace asf;
 
 namespace {
 
-
 constexpr uint16_t kTagWma2 = 0x0161;
 constexpr uint16_t kTagWma3 = 0x0162;
 
@@ -81,9 +80,7 @@ void Wmv3Stream(uint8_t b0, uint8_t b1, int32_t w, int32_t h, _MM_CODECTYPE* cod
             codec->nVideoProfile = CODEC_WMV9_PEOFILE_ADVANCED;
             level = ASF_AdvancedProfileLevel(fps, interlaced, w, h);
             break;
-        default:
-            LogPrint(kVerbose, kLogTag, "the profile is forbidden \n");
-            return;
+        default: LogPrint(kVerbose, kLogTag, "the profile is forbidden \n"); return;
     }
     if (level != 0) codec->nVideoLevel = level;
 }
@@ -103,8 +100,8 @@ void VideoStream(int h, uint32_t size, _MM_CODECTYPE* codec) {
     uint32_t compression = ReadLE32(bmi + 16);
     LogPrint(kVerbose, kLogTag, "video width = %d, height = %d\n", static_cast<int>(encodedWidth),
              static_cast<int>(encodedHeight));
-    LogPrint(kVerbose, kLogTag, "video codecSpecDataLen = 0x%x, %d\n",
-             static_cast<unsigned>(codecDataLength), static_cast<int>(codecDataLength));
+    LogPrint(kVerbose, kLogTag, "video codecSpecDataLen = 0x%x, %d\n", static_cast<unsigned>(codecDataLength),
+             static_cast<int>(codecDataLength));
     LogPrint(kVerbose, kLogTag, "video bitmapinfo.iCompression 0x%x\n", compression);
 
     if (codecDataLength < 2) {
@@ -180,7 +177,8 @@ int32_t ASF_GetCodecInfo(int h, _MM_CODECTYPE* codec) {
     uint32_t size = ReadLE32(p);
     const uint8_t* type = p + 8;
     uint32_t typeSpecificLength = ReadLE32(p + 48);
-    LogPrint(kVerbose, kLogTag, "the specDataLen = 0x%x, %d\n", typeSpecificLength, static_cast<int>(typeSpecificLength));
+    LogPrint(kVerbose, kLogTag, "the specDataLen = 0x%x, %d\n", typeSpecificLength,
+             static_cast<int>(typeSpecificLength));
 
     if (SameGuid(type, ASF_Audio_Media)) {
         AudioStream(h, size, codec);

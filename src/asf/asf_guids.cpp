@@ -2,10 +2,12 @@
 
 // A GUID written as text (d1-d2-d3-d4) is stored with its first three groups
 // little-endian and the last eight bytes as they stand.
-#define ASF_GUID(d1, d2, d3, b0, b1, b2, b3, b4, b5, b6, b7)                                  \
-    {uint8_t((d1)&0xFF), uint8_t(((d1) >> 8) & 0xFF), uint8_t(((d1) >> 16) & 0xFF),         \
-     uint8_t(((d1) >> 24) & 0xFF), uint8_t((d2)&0xFF), uint8_t(((d2) >> 8) & 0xFF),           \
-     uint8_t((d3)&0xFF), uint8_t(((d3) >> 8) & 0xFF), b0, b1, b2, b3, b4, b5, b6, b7}
+#define ASF_GUID(d1, d2, d3, b0, b1, b2, b3, b4, b5, b6, b7)                                                          \
+    {                                                                                                                 \
+        uint8_t((d1)&0xFF), uint8_t(((d1) >> 8) & 0xFF), uint8_t(((d1) >> 16) & 0xFF), uint8_t(((d1) >> 24) & 0xFF),  \
+            uint8_t((d2)&0xFF), uint8_t(((d2) >> 8) & 0xFF), uint8_t((d3)&0xFF), uint8_t(((d3) >> 8) & 0xFF), b0, b1, \
+            b2, b3, b4, b5, b6, b7                                                                                    \
+    }
 
 namespace metainfo {
 

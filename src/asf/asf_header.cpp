@@ -1,6 +1,5 @@
 #include "asf/asf_header.h"
 
-
 #include <cstring>
 
 #include "asf/asf_codec.h"
@@ -23,8 +22,8 @@ constexpr uint32_t kMaxHeaderObjects = 256;
 constexpr int32_t kWalkFailed = -1;
 
 // Stream Properties layout, counted from the object's start.
-constexpr uint32_t kStreamTypeEnd = 40;       // GUID, size, Stream Type
-constexpr uint32_t kStreamFlagsOffset = 72;   // after the error correction fields
+constexpr uint32_t kStreamTypeEnd = 40;  // GUID, size, Stream Type
+constexpr uint32_t kStreamFlagsOffset = 72;  // after the error correction fields
 
 struct TrackBit {
     const uint8_t* type;
@@ -60,8 +59,7 @@ int64_t Here(int h) { return MEx_ftell(h); }
 
 bool PrepareOutput(uint16_t mode, void* out) {
     switch (mode) {
-        case kAsfModeMeta:
-            return ASF_InitMetaInfo(static_cast<_MMMetaInfo*>(out)) == 0;
+        case kAsfModeMeta: return ASF_InitMetaInfo(static_cast<_MMMetaInfo*>(out)) == 0;
         case kAsfModeClip:
             if (out == nullptr) return false;
             std::memset(out, 0, sizeof(_MMClipInfo));
@@ -74,8 +72,7 @@ bool PrepareOutput(uint16_t mode, void* out) {
             if (out == nullptr) return false;
             std::memset(out, 0, sizeof(_MM_CODECTYPE));
             return true;
-        default:
-            return true;
+        default: return true;
     }
 }
 
@@ -87,8 +84,8 @@ struct Deferred {
     int64_t bitrate = -1;
 };
 
-int32_t WalkObject(int h, const uint8_t* guid, uint16_t mode, void* out, uint32_t allowance,
-                   uint32_t* videoStream, Deferred* deferred) {
+int32_t WalkObject(int h, const uint8_t* guid, uint16_t mode, void* out, uint32_t allowance, uint32_t* videoStream,
+                   Deferred* deferred) {
     if (SameGuid(guid, ASF_File_Properties_Object) && mode == kAsfModeClip) {
         return ASF_ParseFilePropertyObj(h, static_cast<_MMClipInfo*>(out));
     }
@@ -113,8 +110,7 @@ int32_t WalkObject(int h, const uint8_t* guid, uint16_t mode, void* out, uint32_
             ASF_GetCodecInfo(h, static_cast<_MM_CODECTYPE*>(out));
             return 0;
         }
-    } else if (SameGuid(guid, ASF_Header_Extension_Object) &&
-               (mode == kAsfModeMeta || mode == kAsfModeClip)) {
+    } else if (SameGuid(guid, ASF_Header_Extension_Object) && (mode == kAsfModeMeta || mode == kAsfModeClip)) {
         deferred->headerExtension = Here(h);
     } else if (SameGuid(guid, ASF_Content_Description_Object) && mode == kAsfModeMeta) {
         return ASF_ParseContentDescriptionObj(h, static_cast<_MMMetaInfo*>(out));

@@ -63,13 +63,9 @@ uint64_t Get64(int h) {
     return ReadLE64(b);
 }
 
-bool SeekBy(int h, int64_t delta) {
-    return delta == 0 || MEx_fseek(h, delta, SEEK_CUR) == 0;
-}
+bool SeekBy(int h, int64_t delta) { return delta == 0 || MEx_fseek(h, delta, SEEK_CUR) == 0; }
 
-bool SeekTo(int h, int64_t position) {
-    return position >= 0 && MEx_fseek(h, position, SEEK_SET) == 0;
-}
+bool SeekTo(int h, int64_t position) { return position >= 0 && MEx_fseek(h, position, SEEK_SET) == 0; }
 
 uint64_t BytesLeft(int h) {
     const int64_t pos = MEx_ftell(h);

@@ -62,10 +62,14 @@ _MMMetaItem* ItemForName(_MMMetaInfo* meta, const uint8_t* name, uint32_t length
         int item;  // -1: the album artist
     };
     static const Target kTargets[] = {
-        {"WM/OriginalArtist", META_ARTIST}, {"WM/AlbumArtist", -1},
-        {"WM/Composer", META_COMPOSER},     {"WM/AlbumTitle", META_ALBUM},
-        {"WM/Year", META_YEAR},             {"WM/Genre", META_GENRE},
-        {"WM/Language", META_LANGUAGE},     {"WM/TrackNumber", META_TRACKNUMBER},
+        {"WM/OriginalArtist", META_ARTIST},
+        {"WM/AlbumArtist", -1},
+        {"WM/Composer", META_COMPOSER},
+        {"WM/AlbumTitle", META_ALBUM},
+        {"WM/Year", META_YEAR},
+        {"WM/Genre", META_GENRE},
+        {"WM/Language", META_LANGUAGE},
+        {"WM/TrackNumber", META_TRACKNUMBER},
     };
     for (const Target& t : kTargets) {
         if (ASF_IsEqualName(name, t.name, length, static_cast<uint32_t>(std::strlen(t.name)))) {
@@ -96,8 +100,8 @@ int32_t TakePictureValue(int h, _MMMetaInfo* meta, uint32_t length, uint32_t all
 }
 
 // One descriptor's value, with its name already narrowed.
-int32_t TakeValue(int h, _MMMetaInfo* meta, const uint8_t* name, uint32_t nameLength, uint16_t type,
-                  uint32_t length, uint32_t allowance) {
+int32_t TakeValue(int h, _MMMetaInfo* meta, const uint8_t* name, uint32_t nameLength, uint16_t type, uint32_t length,
+                  uint32_t allowance) {
     _MMMetaItem* item = ItemForName(meta, name, nameLength);
     if (item != nullptr && item->nLength == 0) {
         return FillItem(h, item, length, TTable[type]) ? 0 : kBroken;
@@ -266,8 +270,7 @@ int32_t ASF_ParseHdrExtensionObj(int h, _MMMetaInfo* meta, uint32_t allowance) {
     return 0;
 }
 
-int32_t ASF_ParseWMPicturObj(const uint8_t* value, _MMMetaInfo* meta, uint32_t length,
-                             uint32_t allowance) {
+int32_t ASF_ParseWMPicturObj(const uint8_t* value, _MMMetaInfo* meta, uint32_t length, uint32_t allowance) {
     // Picture type, data length, MIME type and description, picture data.
     if (allowance == 0 || value == nullptr || length < 5) return 0;
     uint32_t dataLength = ReadLE32(value + 1);

@@ -25,8 +25,7 @@ int32_t ASF_ParseHdrExtensionObj(int h, _MMMetaInfo* meta, uint32_t allowance);
 int32_t ASF_ParseMetaDataObj(int h, _MMMetaInfo* meta, uint32_t allowance);
 
 // A whole WM/Picture value held in memory: 0, or MM_E_OUTOFMEMORY.
-int32_t ASF_ParseWMPicturObj(const uint8_t* value, _MMMetaInfo* meta, uint32_t length,
-                             uint32_t allowance);
+int32_t ASF_ParseWMPicturObj(const uint8_t* value, _MMMetaInfo* meta, uint32_t length, uint32_t allowance);
 
 // Rating word from the Content Description's Rating text (rewritten in place).
 void ASF_ConvertRating(uint16_t length, uint8_t* text, _MMMetaInfo* meta);

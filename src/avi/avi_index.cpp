@@ -247,8 +247,8 @@ int32_t CAVIParser::setMediaTime(uint32_t stream, uint32_t timeMs, uint32_t* act
 
 int32_t CAVIParser::getNextFrame(uint32_t stream, _FrameInfo* info) {
     if (info == nullptr) return MM_E_INVALIDARG;
-    if (nMoviSize == 0 || pIndex == nullptr || nIndexCount == 0 || stream >= nStreamNum ||
-        stream >= AVI_STREAM_SLOTS || hFile == 0) {
+    if (nMoviSize == 0 || pIndex == nullptr || nIndexCount == 0 || stream >= nStreamNum || stream >= AVI_STREAM_SLOTS ||
+        hFile == 0) {
         return MM_E_FAIL;
     }
     uint32_t cur = nCurIndex[stream];

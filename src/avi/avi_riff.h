@@ -12,7 +12,6 @@ constexpr uint32_t Fourcc(const char (&s)[5]) {
            uint32_t(uint8_t(s[3]));
 }
 
-
 // "avih" chunk header and body as the header list holds them.
 constexpr uint32_t kMainHeaderBytes = 64;
 // "strh" fields from fccType to dwSampleSize.

@@ -27,9 +27,7 @@ inline uint32_t ReadSyncsafe32(const uint8_t* p) {
     return uint32_t(p[0]) << 21 | uint32_t(p[1]) << 14 | uint32_t(p[2]) << 7 | p[3];
 }
 
-inline bool BytesEqual(const uint8_t* p, const char* tag, size_t n) {
-    return std::memcmp(p, tag, n) == 0;
-}
+inline bool BytesEqual(const uint8_t* p, const char* tag, size_t n) { return std::memcmp(p, tag, n) == 0; }
 
 class ByteReader {
 public:
@@ -64,7 +62,9 @@ public:
         return p != nullptr && BytesEqual(p, tag, n);
     }
 
-    bool U8(uint8_t* v) { return Read(v, 1, [](const uint8_t* p) { return p[0]; }); }
+    bool U8(uint8_t* v) {
+        return Read(v, 1, [](const uint8_t* p) { return p[0]; });
+    }
     bool BE16(uint16_t* v) { return Read(v, 2, ReadBE16); }
     bool BE32(uint32_t* v) { return Read(v, 4, ReadBE32); }
     bool BE64(uint64_t* v) { return Read(v, 8, ReadBE64); }

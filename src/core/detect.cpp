@@ -88,10 +88,9 @@ const char* const kAMRExt[] = {".amr", nullptr};
 const char* const kAWBExt[] = {".awb", nullptr};
 
 const ExtensionGroup kGroups[] = {
-    {kMP3Ext, Check::kMP3},   {kAACExt, Check::kAAC},   {kASFExt, Check::kASF},
-    {kRMExt, Check::kRealMedia}, {kMP4Ext, Check::kMP4}, {kMidiExt, Check::kMidi},
-    {kWaveExt, Check::kWave}, {kAVIExt, Check::kAVI},   {kQCPExt, Check::kQCP},
-    {kEVRCExt, Check::kEVRC}, {kAMRExt, Check::kAMRNB}, {kAWBExt, Check::kAMRWB},
+    {kMP3Ext, Check::kMP3}, {kAACExt, Check::kAAC},   {kASFExt, Check::kASF},   {kRMExt, Check::kRealMedia},
+    {kMP4Ext, Check::kMP4}, {kMidiExt, Check::kMidi}, {kWaveExt, Check::kWave}, {kAVIExt, Check::kAVI},
+    {kQCPExt, Check::kQCP}, {kEVRCExt, Check::kEVRC}, {kAMRExt, Check::kAMRNB}, {kAWBExt, Check::kAMRWB},
 };
 
 const ExtensionGroup* FindGroup(const char* ext) {

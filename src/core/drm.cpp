@@ -29,9 +29,7 @@ void CopyText(char* dst, size_t capacity, const std::string& value) {
 
 // A hexadecimal number (blanks, sign and "0x" allowed, as a "%x" conversion
 // takes them); its low 32 bits, the same on every target; 0 without digits.
-uint32_t ParseHex(const std::string& value) {
-    return static_cast<uint32_t>(std::strtoull(value.c_str(), nullptr, 16));
-}
+uint32_t ParseHex(const std::string& value) { return static_cast<uint32_t>(std::strtoull(value.c_str(), nullptr, 16)); }
 
 void StoreMetadata(const MetadataPairs& pairs, _DRM_METADATA* meta) {
     for (const auto& kv : pairs) {

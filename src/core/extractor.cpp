@@ -93,8 +93,7 @@ int32_t MM_MediaExtractor_GetMIMEType(const char* path, _MM_MIMETYPE* mime) {
     return fn != nullptr ? fn(path, mime) : MM_E_UNSUPPORTED;
 }
 
-int32_t MM_MediaExtractor_GetAudioData(const char* path, int startSec, int endSec, unsigned char** data,
-                                       int* size) {
+int32_t MM_MediaExtractor_GetAudioData(const char* path, int startSec, int endSec, unsigned char** data, int* size) {
     if (path == nullptr || data == nullptr || size == nullptr) return MM_E_INVALIDARG;
     int type = MEDIA_TYPE_UNKNOWN;
     int32_t result = DetectMediaType(path, &type);

@@ -83,8 +83,7 @@ void Unregister(int h) {
 }
 
 void CloseProtected(MexHandle* handle) {
-    if (handle->session != nullptr && handle->hasClient &&
-        handle->client.provider.closeDecryptSession != nullptr) {
+    if (handle->session != nullptr && handle->hasClient && handle->client.provider.closeDecryptSession != nullptr) {
         handle->client.provider.closeDecryptSession(handle->client.provider.context, handle->session);
     }
     handle->session = nullptr;
@@ -142,7 +141,9 @@ int SeekProtected(MexHandle* handle, int64_t offset, int whence) {
     uint64_t delta = static_cast<uint64_t>(offset);
     switch (whence) {
         case SEEK_SET: handle->position = static_cast<int64_t>(delta); return 0;
-        case SEEK_CUR: handle->position = static_cast<int64_t>(static_cast<uint64_t>(handle->position) + delta); return 0;
+        case SEEK_CUR:
+            handle->position = static_cast<int64_t>(static_cast<uint64_t>(handle->position) + delta);
+            return 0;
         case SEEK_END: handle->position = static_cast<int64_t>(static_cast<uint64_t>(handle->size) + delta); return 0;
         default: return -1;
     }

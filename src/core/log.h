@@ -6,7 +6,6 @@ namespace metainfo {
 enum LogPriority { kLogVerbose = 2, kLogDebug = 3, kLogInfo = 4, kLogWarn = 5, kLogError = 6 };
 
 // tag may be null (the binding's untagged messages).
-void LogPrint(int priority, const char* tag, const char* fmt, ...)
-    __attribute__((format(printf, 3, 4)));
+void LogPrint(int priority, const char* tag, const char* fmt, ...) __attribute__((format(printf, 3, 4)));
 
 }  // namespace metainfo

@@ -33,14 +33,14 @@ struct CachedFile {
     FileIdentity id;
     bool used = false;
     uint64_t lastUse = 0;
-    std::map<uint64_t, std::vector<uint8_t>> extents;   // start -> bytes, never overlapping
+    std::map<uint64_t, std::vector<uint8_t>> extents;  // start -> bytes, never overlapping
     size_t bytes = 0;
     uint64_t missEnd = UINT64_MAX;
     size_t chunk = kMinChunk;
-    uint64_t end = UINT64_MAX;   // where a read came up short: nothing past it
-    int64_t startedNs = 0;       // when the bytes held were first read
-    std::string path;            // what the file was last opened by
-    bool tailRead = false;       // the end was read with the first read
+    uint64_t end = UINT64_MAX;  // where a read came up short: nothing past it
+    int64_t startedNs = 0;  // when the bytes held were first read
+    std::string path;  // what the file was last opened by
+    bool tailRead = false;  // the end was read with the first read
     // The extent the last read was served from, tried before the map: most
     // reads of a walk fall in the bytes the previous one came from.
     uint64_t hotStart = 0;

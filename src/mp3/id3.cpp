@@ -71,9 +71,12 @@ int32_t SkipUnsyncExtendedHeader(int h, uint32_t tagSize, uint32_t* extendedSize
 
 // Encoding code of a v2.4 text item from its frame's encoding byte.
 void SetV24Encoding(_MMMetaItem* item, uint8_t encodingByte) {
-    if (encodingByte == 2) item->nEncoding = ENCODING_UTF16BE;
-    else if (encodingByte == 3) item->nEncoding = ENCODING_UTF8;
-    else if (encodingByte > 3) item->nEncoding = ENCODING_LATIN1;
+    if (encodingByte == 2)
+        item->nEncoding = ENCODING_UTF16BE;
+    else if (encodingByte == 3)
+        item->nEncoding = ENCODING_UTF8;
+    else if (encodingByte > 3)
+        item->nEncoding = ENCODING_LATIN1;
 }
 
 // Passes over a frame body that fills nothing. Where a short body fails the
@@ -102,8 +105,7 @@ uint8_t* ReadBody(int h, uint32_t size, bool* complete) {
 // A picture frame held in buf: encoding, format or MIME type, picture type and
 // description, then the picture. Fills the format item; returns the offset of
 // the picture bytes, or -1 when the frame ends first.
-long ParsePictureHead(const uint8_t* buf, uint32_t length, uint8_t version, bool mimeCountsZero,
-                      _MMMetaItem* format) {
+long ParsePictureHead(const uint8_t* buf, uint32_t length, uint8_t version, bool mimeCountsZero, _MMMetaItem* format) {
     ByteReader r(buf, length);
     uint8_t encoding = 0;
     if (!r.U8(&encoding)) return -1;
@@ -117,9 +119,9 @@ long ParsePictureHead(const uint8_t* buf, uint32_t length, uint8_t version, bool
     } else {
         const uint8_t* mime = buf + r.position();
         const void* zero = std::memchr(mime, 0, r.remaining());
-        const uint32_t kept = static_cast<uint32_t>(
-            std::min<size_t>(zero != nullptr ? static_cast<size_t>(static_cast<const uint8_t*>(zero) - mime) : r.remaining(),
-                             MM_META_DATA_SIZE));
+        const uint32_t kept = static_cast<uint32_t>(std::min<size_t>(
+            zero != nullptr ? static_cast<size_t>(static_cast<const uint8_t*>(zero) - mime) : r.remaining(),
+            MM_META_DATA_SIZE));
         if (mimeCountsZero) {
             const uint32_t withZero = std::min<uint32_t>(kept + (zero != nullptr ? 1 : 0), MM_META_DATA_SIZE);
             std::memcpy(format->szData, mime, withZero);
@@ -164,8 +166,7 @@ int32_t GetSyncPicData(int h, uint32_t frameSize, ID3_MetaInfo* ctx) {
     bool complete = false;
     uint8_t* buf = ReadBody(h, frameSize, &complete);
     if (buf == nullptr) return MM_E_OUTOFMEMORY;
-    const long offset =
-        ParsePictureHead(buf, frameSize, ctx->version, false, &ctx->meta->aItems[META_PICTURE_FORMAT]);
+    const long offset = ParsePictureHead(buf, frameSize, ctx->version, false, &ctx->meta->aItems[META_PICTURE_FORMAT]);
     if (offset < 0 || !complete) {
         delete[] buf;
         return MM_E_FAIL;
@@ -187,8 +188,7 @@ int32_t GetUnsyncPicData(int h, uint32_t frameSize, ID3_MetaInfo* ctx) {
         delete[] buf;
         return MM_OK;
     }
-    const long offset =
-        ParsePictureHead(buf, length, ctx->version, true, &ctx->meta->aItems[META_PICTURE_FORMAT]);
+    const long offset = ParsePictureHead(buf, length, ctx->version, true, &ctx->meta->aItems[META_PICTURE_FORMAT]);
     if (offset < 0) {
         delete[] buf;
         return MM_E_FAIL;
@@ -357,8 +357,7 @@ int32_t ParseID3V1(int h, _MMMetaInfo* meta) {
         uint32_t offset;
         int item;
     };
-    static const Field kTextFields[] = {
-        {3, META_TITLE}, {33, META_ARTIST}, {63, META_ALBUM}, {97, META_COMMENT}};
+    static const Field kTextFields[] = {{3, META_TITLE}, {33, META_ARTIST}, {63, META_ALBUM}, {97, META_COMMENT}};
     for (const Field& field : kTextFields) {
         _MMMetaItem* item = &meta->aItems[field.item];
         const uint8_t* text = tag + field.offset;

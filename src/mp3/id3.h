@@ -10,12 +10,12 @@ namespace metainfo {
 
 // Parse context of a v2 tag.
 struct ID3_MetaInfo {
-    _MMMetaInfo* meta;      // record being filled
-    uint32_t sizeBound;     // largest acceptable tag size (file size, or an embedding box's payload)
-    uint32_t remaining;     // tag bytes not yet consumed
+    _MMMetaInfo* meta;  // record being filled
+    uint32_t sizeBound;  // largest acceptable tag size (file size, or an embedding box's payload)
+    uint32_t remaining;  // tag bytes not yet consumed
     uint32_t pictureLimit;  // 0: no pictures; else pictures above 0x80000 bytes only up to this size
-    uint8_t version;        // 2, 3 or 4
-    uint8_t unsync;         // tag-wide unsynchronisation
+    uint8_t version;  // 2, 3 or 4
+    uint8_t unsync;  // tag-wide unsynchronisation
 };
 
 constexpr int kGenreCount = 148;

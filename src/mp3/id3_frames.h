@@ -10,8 +10,7 @@ namespace metainfo {
 
 // Identifier of a frame: four characters big-endian, or three for v2.2.
 constexpr uint32_t FrameId(const char (&s)[5]) {
-    return uint32_t(uint8_t(s[0])) << 24 | uint32_t(uint8_t(s[1])) << 16 | uint32_t(uint8_t(s[2])) << 8 |
-           uint8_t(s[3]);
+    return uint32_t(uint8_t(s[0])) << 24 | uint32_t(uint8_t(s[1])) << 16 | uint32_t(uint8_t(s[2])) << 8 | uint8_t(s[3]);
 }
 constexpr uint32_t FrameId(const char (&s)[4]) {
     return uint32_t(uint8_t(s[0])) << 16 | uint32_t(uint8_t(s[1])) << 8 | uint8_t(s[2]);

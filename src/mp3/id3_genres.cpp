@@ -1,5 +1,7 @@
 #include "mp3/id3.h"
 
+// Laid out in columns by hand.
+// clang-format off
 namespace metainfo {
 
 // The spellings (Psychadelic, AlternRock, Bebob, A capella) are the names

@@ -225,6 +225,5 @@ int32_t MP3_GetAudioData2Buf(const char* path, int startSec, int endSec, unsigne
 
 extern "C" int32_t MP3_GetAudioData2File(const char* path, int startSec, int endSec, const char* outPath) {
     int size = 0;
-    return metainfo::GetAudioData_MP3(path, startSec, endSec, const_cast<char*>(outPath), &size,
-                                      metainfo::kMP3ToFile);
+    return metainfo::GetAudioData_MP3(path, startSec, endSec, const_cast<char*>(outPath), &size, metainfo::kMP3ToFile);
 }

@@ -28,8 +28,7 @@ int32_t GetMP3DataPos(int h, const _MP3AudioInfo* info, int startSec, int* endSe
 
 int32_t WriteDataToFile(int h, const char* outPath, const _MP3AudioInfo* info, const _DataRange* range,
                         uint32_t timeSpan);
-void WriteXingHeader(int h, int out, const _MP3AudioInfo* info, uint8_t* scratch, uint32_t timeSpan,
-                     uint32_t byteSpan);
+void WriteXingHeader(int h, int out, const _MP3AudioInfo* info, uint8_t* scratch, uint32_t timeSpan, uint32_t byteSpan);
 void Int2Str(uint8_t* out, uint32_t value);
 
 }  // namespace metainfo

@@ -7,15 +7,15 @@
 namespace metainfo {
 
 struct _FrameHeader_Info {
-    uint8_t headerKind;     // 1 constant bit rate, 2 Xing, 3 VBRI
-    uint8_t versionId;      // raw version bits: 0 MPEG-2.5, 2 MPEG-2, 3 MPEG-1
-    uint8_t layerIndex;     // 0, 1, 2 for Layer I, II, III
-    uint8_t channelMode;    // 3 = single channel
+    uint8_t headerKind;  // 1 constant bit rate, 2 Xing, 3 VBRI
+    uint8_t versionId;  // raw version bits: 0 MPEG-2.5, 2 MPEG-2, 3 MPEG-1
+    uint8_t layerIndex;  // 0, 1, 2 for Layer I, II, III
+    uint8_t channelMode;  // 3 = single channel
     uint8_t protectionBit;  // 1 = no CRC
     uint32_t firstFrameOffset;
-    uint32_t bitRate;       // bit/s
+    uint32_t bitRate;  // bit/s
     uint32_t sampleRate;
-    uint32_t frameSize;     // padding included
+    uint32_t frameSize;  // padding included
     uint32_t samplesPerFrame;
     uint32_t xingOffset;
 };

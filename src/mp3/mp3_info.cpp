@@ -40,9 +40,7 @@ int32_t SignedQuotient(uint32_t numerator, uint32_t divisor) {
     if (d == 0 || (d == -1 && n == INT32_MIN)) return 0;
     return n / d;
 }
-uint32_t UnsignedQuotient(uint32_t numerator, uint32_t divisor) {
-    return divisor == 0 ? 0 : numerator / divisor;
-}
+uint32_t UnsignedQuotient(uint32_t numerator, uint32_t divisor) { return divisor == 0 ? 0 : numerator / divisor; }
 
 // Seconds of a frame count; the product wraps in 32 bits as callers expect.
 uint32_t FramesToSeconds(uint32_t frames, uint32_t samplesPerFrame, uint32_t sampleRate) {

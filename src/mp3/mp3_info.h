@@ -13,18 +13,18 @@ namespace metainfo {
 // The stream description that range extraction works from. The holder owns
 // xingToc (array delete).
 struct _MP3AudioInfo {
-    uint32_t headerKind;       // copy of _FrameHeader_Info::headerKind
-    uint32_t tagBytes;         // trailing ID3v1 tag: 128 or 0
+    uint32_t headerKind;  // copy of _FrameHeader_Info::headerKind
+    uint32_t tagBytes;  // trailing ID3v1 tag: 128 or 0
     uint32_t firstFrameOffset;
-    uint32_t avgBitRate;       // bit/s
+    uint32_t avgBitRate;  // bit/s
     uint32_t fileSize;
-    uint32_t duration;         // whole seconds
+    uint32_t duration;  // whole seconds
     uint32_t sampleRate;
     uint32_t samplesPerFrame;
-    uint8_t* xingToc;          // 100 bytes, or null
+    uint8_t* xingToc;  // 100 bytes, or null
     uint32_t totalFrames;
     uint32_t totalBytes;
-    int32_t quality;           // -1 when the Xing header has none; VBRI scale word
+    int32_t quality;  // -1 when the Xing header has none; VBRI scale word
     uint32_t frameSize;
     uint32_t xingFlags;
     uint32_t xingOffset;

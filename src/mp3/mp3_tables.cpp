@@ -1,5 +1,7 @@
 #include "mp3/mp3_tables.h"
 
+// Laid out in columns by hand.
+// clang-format off
 namespace metainfo {
 
 const uint8_t lsfIndex[4] = {1, 1, 1, 0};

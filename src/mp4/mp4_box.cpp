@@ -22,9 +22,8 @@ void SeekTo(int h, int64_t pos) {
 bool BadBoxSize(uint32_t size) { return size == 0 || size >= s_mp4FileSize; }
 
 uint64_t BytesHeld(int64_t start, uint64_t size) {
-    const uint64_t left = start >= 0 && start < static_cast<int64_t>(s_mp4FileSize)
-                              ? s_mp4FileSize - static_cast<uint64_t>(start)
-                              : 0;
+    const uint64_t left =
+        start >= 0 && start < static_cast<int64_t>(s_mp4FileSize) ? s_mp4FileSize - static_cast<uint64_t>(start) : 0;
     return size < left ? size : left;
 }
 

@@ -137,8 +137,7 @@ int32_t AnaMaker(int h, _MAKERINFO* maker) {
     _SMARTALBUM salb;
     const int64_t end = start + header.size;
     SeekTo(h, start + 12);  // after the version/flags word
-    for (int64_t childStart = Tell(h); childStart >= 0 && childStart < end && !MEx_feof(h);
-         childStart = Tell(h)) {
+    for (int64_t childStart = Tell(h); childStart >= 0 && childStart < end && !MEx_feof(h); childStart = Tell(h)) {
         _BOXHEADER child{};
         if (getBoxHeader(h, &child) == 0 || BadBoxSize(child.size)) return MM_E_FAIL;
         SeekTo(h, childStart);

@@ -13,7 +13,6 @@
 namespace metainfo {
 namespace {
 
-
 constexpr int kAudio = 1;
 constexpr int kVideo = 16;
 
@@ -244,11 +243,15 @@ int32_t AudioSpecificConfig(const uint8_t* bits, mp4AudioSpecificConfig* asc) {
         asc->audioObjectType = static_cast<uint8_t>(b.Get(5));
     }
     switch (asc->audioObjectType) {
-        case 1: case 2: case 3: case 4: case 6: case 7:
+        case 1:
+        case 2:
+        case 3:
+        case 4:
+        case 6:
+        case 7:
             if (GASpecificConfig(&b, asc) != MM_OK) return -3;
             break;
-        default:
-            return -4;
+        default: return -4;
     }
     if (asc->audioObjectType != 5 && b.GetWide(11) == 0x2B7) {
         asc->audioObjectType = static_cast<uint8_t>(b.Get(5));
@@ -307,7 +310,8 @@ int32_t AnaESDBox(const uint8_t* esds, size_t avail, int kind, _ME_ClipInfoEx* i
     node->codec = asc.sbrPresentFlag == 1 ? CODEC_MP4AUDIO_MP4A_AAC_PLUS_V1 : CODEC_MP4AUDIO_MP4A_AAC;
     switch (asc.audioObjectType) {
         case 1: node->codecDetail = PROFILE_AAC_MAIN; break;
-        case 2: case 5: node->codecDetail = PROFILE_AAC_LC; break;
+        case 2:
+        case 5: node->codecDetail = PROFILE_AAC_LC; break;
         case 3: node->codecDetail = PROFILE_AAC_SSR; break;
         default: node->codecDetail = CODEC_NODEFINE; break;
     }

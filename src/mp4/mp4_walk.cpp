@@ -94,8 +94,8 @@ int32_t AnaMinf(int h, uint32_t handlerType, _ME_ClipInfoEx* info) {
     if (!EnterContainer(h, FourCC("minf"), &end)) return kMp4BadContainer;
     return WalkChildren(h, end, [&](uint32_t type, int64_t, uint32_t) {
         // Only "stbl" passes AnaStbl's own type check.
-        if (type == FourCC("stbl") || type == FourCC("dinf") || type == FourCC("hmhd") ||
-            type == FourCC("nmhd") || type == FourCC("smhd") || type == FourCC("vmhd")) {
+        if (type == FourCC("stbl") || type == FourCC("dinf") || type == FourCC("hmhd") || type == FourCC("nmhd") ||
+            type == FourCC("smhd") || type == FourCC("vmhd")) {
             AnaStbl(h, handlerType, info);
         }
     });
@@ -202,9 +202,7 @@ void RefineClipInfo(_ME_ClipInfoEx* info) {
 
 int32_t AnaMvhd(int h, _ME_ClipInfoEx* info) { return AnaTimeHeader(h, FourCC("mvhd"), kMp4BadEntry, info); }
 
-int32_t AnaMdhd(int h, _ME_ClipInfoEx* info) {
-    return AnaTimeHeader(h, FourCC("mdhd"), MM_E_OUTOFMEMORY, info);
-}
+int32_t AnaMdhd(int h, _ME_ClipInfoEx* info) { return AnaTimeHeader(h, FourCC("mdhd"), MM_E_OUTOFMEMORY, info); }
 
 int32_t AnaTkhd(int h, _ME_ClipInfoEx* info) {
     _BOXHEADER header{};

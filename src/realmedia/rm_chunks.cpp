@@ -48,8 +48,9 @@ struct CodecRow {
 };
 
 const CodecRow kRmCodecs[] = {
-    {"sipr", CODEC_RMAUDIO_SIPR}, {"cook", CODEC_RMAUDIO_COOK}, {"atrc", CODEC_RMAUDIO_ATRC}, {"raac", CODEC_RMAUDIO_RAAC},
-    {"RV10", CODEC_RMVIDEO_RV10}, {"RV20", CODEC_RMVIDEO_RV20}, {"RV30", CODEC_RMVIDEO_RV30}, {"RV40", CODEC_RMVIDEO_RV40},
+    {"sipr", CODEC_RMAUDIO_SIPR}, {"cook", CODEC_RMAUDIO_COOK}, {"atrc", CODEC_RMAUDIO_ATRC},
+    {"raac", CODEC_RMAUDIO_RAAC}, {"RV10", CODEC_RMVIDEO_RV10}, {"RV20", CODEC_RMVIDEO_RV20},
+    {"RV30", CODEC_RMVIDEO_RV30}, {"RV40", CODEC_RMVIDEO_RV40},
 };
 
 }  // namespace

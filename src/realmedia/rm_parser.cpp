@@ -1,7 +1,6 @@
 // RealMedia: one walk over the header chunks answers each request.
 #include "realmedia/rm_parser.h"
 
-
 #include <cstdio>
 #include <cstring>
 #include <new>
@@ -13,7 +12,7 @@
 namespace metainfo {
 namespace {
 
-constexpr uint32_t kRmfFieldBytes = 18;   // through the header count
+constexpr uint32_t kRmfFieldBytes = 18;  // through the header count
 constexpr uint32_t kPropFieldBytes = 50;  // through the flags
 constexpr uint32_t kMdprFieldBytes = 41;  // through the stream name length
 
@@ -60,7 +59,7 @@ bool IsLogical(const _MEDIA_PROPERTIES& mp) {
 
 // Copies a stream's MIME type (with its two terminating zeros) into a new buffer.
 int32_t HandOutMime(const _MEDIA_PROPERTIES& mp, char** out, uint32_t* length) {
-    delete[] *out;
+    delete[] * out;
     *out = nullptr;
     *length = 0;
     uint32_t n = mp.mime_type_size;
@@ -206,9 +205,7 @@ int32_t RM_GetMediaInfo(const char* path, uint16_t request, void* out) {
             if (contentResult == 0) return 0;
             // No usable "CONT": an ID3v1 tag at the end may still name the clip.
             return ParseID3V1(h, static_cast<_MMMetaInfo*>(out)) == 0 ? 0 : contentResult;
-        case INFO_CLIPINFO:
-            FillClip(prop, streams, static_cast<_MMClipInfo*>(out));
-            return 0;
+        case INFO_CLIPINFO: FillClip(prop, streams, static_cast<_MMClipInfo*>(out)); return 0;
         case INFO_TRACKTYPE: {
             int* flags = static_cast<int*>(out);
             if (streams.audioCount != 0) *flags |= TRACK_AUDIO;
@@ -233,8 +230,7 @@ int32_t RM_GetMediaInfo(const char* path, uint16_t request, void* out) {
             if (streams.video >= 0) codec->nVideoCodec = RmCodecCode(streams.rv.fourcc);
             return 0;
         }
-        default:
-            return 0;
+        default: return 0;
     }
 }
 

@@ -9,10 +9,10 @@
 namespace metainfo {
 
 // Results of RM_GetMediaInfo besides 0 and the shared codes.
-constexpr int32_t kRmNotRealMedia = -1;   // cannot open, no ".RMF", bad header size
-constexpr int32_t kRmBadHeader = -2;      // version, header count, or no "PROP" next
-constexpr int32_t kRmBadChunk = -3;       // chunk size, past the end, malformed "CONT"
-constexpr int32_t kRmReadFailed = -4;     // out of memory or short read
+constexpr int32_t kRmNotRealMedia = -1;  // cannot open, no ".RMF", bad header size
+constexpr int32_t kRmBadHeader = -2;  // version, header count, or no "PROP" next
+constexpr int32_t kRmBadChunk = -3;  // chunk size, past the end, malformed "CONT"
+constexpr int32_t kRmReadFailed = -4;  // out of memory or short read
 
 struct _PROPERTIES {
     uint32_t object_id;
@@ -42,7 +42,7 @@ struct MediaPropertiesFields {
     uint32_t max_packet_size;
     uint32_t avg_packet_size;
     uint32_t start_time;
-    uint32_t preroll;   // whole seconds
+    uint32_t preroll;  // whole seconds
     uint32_t duration;  // whole seconds
     uint8_t stream_name_size;
     unsigned char* stream_name;  // stream_name_size + 2 bytes, two zeros after the text

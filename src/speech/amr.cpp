@@ -33,14 +33,12 @@ const AmrKind kAmrKinds[] = {
 
 const uint32_t kNbBitrate[16] = {4750, 5150, 5900, 6700, 7400, 7950, 10200, 12200, 1750, 0, 0, 0, 0, 0, 0, 40};
 const uint32_t kNbFrameSize[16] = {13, 14, 16, 18, 20, 21, 27, 32, 6, 0, 0, 0, 0, 0, 0, 1};
-const uint32_t kWbBitrate[16] = {6600, 8850, 12650, 14250, 15850, 18250, 19850, 23050,
-                                 23850, 1750, 0, 0, 0, 0, 0, 40};
+const uint32_t kWbBitrate[16] = {6600, 8850, 12650, 14250, 15850, 18250, 19850, 23050, 23850, 1750, 0, 0, 0, 0, 0, 40};
 const uint32_t kWbFrameSize[16] = {18, 24, 33, 37, 41, 47, 51, 59, 61, 6, 0, 0, 0, 0, 0, 1};
 
 // Frame-type sub-codes 0x1010..0x1023; a wide-band frame type ft answers entry ft + 9.
-const uint32_t kAmrSubCodes[20] = {0x1010, 0x1011, 0x1012, 0x1013, 0x1014, 0x1015, 0x1016,
-                                   0x1017, 0x1018, 0x1019, 0x101A, 0x101B, 0x101C, 0x101D,
-                                   0x101E, 0x101F, 0x1020, 0x1021, 0x1022, 0x1023};
+const uint32_t kAmrSubCodes[20] = {0x1010, 0x1011, 0x1012, 0x1013, 0x1014, 0x1015, 0x1016, 0x1017, 0x1018, 0x1019,
+                                   0x101A, 0x101B, 0x101C, 0x101D, 0x101E, 0x101F, 0x1020, 0x1021, 0x1022, 0x1023};
 
 bool IsWideBand(int kind) { return kind == kAmrWideBand || kind == kAmrWideBandMulti; }
 bool IsMultiChannel(int kind) { return kind == kAmrNarrowBandMulti || kind == kAmrWideBandMulti; }
@@ -151,8 +149,7 @@ int32_t GetMediaInfo_AMR(const char* path, void* out, int request) {
     uint64_t payload = fileSize > frame.nHeaderLen ? fileSize - frame.nHeaderLen : 0;
 
     switch (request) {
-        case INFO_MIMETYPE:
-            return SetMimeType(static_cast<_MM_MIMETYPE*>(out), frame.nFileType);
+        case INFO_MIMETYPE: return SetMimeType(static_cast<_MM_MIMETYPE*>(out), frame.nFileType);
         case INFO_CODECTYPE: {
             // A narrow-band file has no codec answer.
             if (!IsWideBand(frame.nFileType)) return MM_E_UNSUPPORTED;
@@ -198,8 +195,7 @@ int32_t GetMediaInfo_AMR(const char* path, void* out, int request) {
             info->nBlockSize = static_cast<uint32_t>(block);
             return MM_OK;
         }
-        default:
-            return MM_E_FAIL;
+        default: return MM_E_FAIL;
     }
 }
 

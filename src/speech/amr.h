@@ -11,10 +11,10 @@
 namespace metainfo {
 
 // File kinds, by magic.
-constexpr int kAmrNarrowBand = 0;       // "#!AMR\n"
-constexpr int kAmrWideBand = 1;         // "#!AMR-WB\n"
+constexpr int kAmrNarrowBand = 0;  // "#!AMR\n"
+constexpr int kAmrWideBand = 1;  // "#!AMR-WB\n"
 constexpr int kAmrNarrowBandMulti = 2;  // "#!AMR_MC1.0\n"
-constexpr int kAmrWideBandMulti = 3;    // "#!AMR-WB_MC1.0\n"
+constexpr int kAmrWideBandMulti = 3;  // "#!AMR-WB_MC1.0\n"
 
 // One parsed frame header with the file it came from.
 struct _AMR_FrameInfo {

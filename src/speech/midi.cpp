@@ -21,8 +21,6 @@ int32_t MIDI_GetTrackType(const char* /*path*/, int* mask) {
 
 int32_t MIDI_GetClipInfo(const char* /*path*/, _MMClipInfo* /*clip*/) { return MM_E_NOTIMPL; }
 
-int32_t MIDI_GetMetaInfo(const char* /*path*/, _MMMetaInfo* /*meta*/, int /*pictureLimit*/) {
-    return MM_E_NOTIMPL;
-}
+int32_t MIDI_GetMetaInfo(const char* /*path*/, _MMMetaInfo* /*meta*/, int /*pictureLimit*/) { return MM_E_NOTIMPL; }
 
 }  // namespace metainfo

@@ -12,8 +12,7 @@ namespace metainfo {
 namespace {
 
 constexpr uint32_t FourCC(const char (&s)[5]) {
-    return uint32_t(uint8_t(s[0])) << 24 | uint32_t(uint8_t(s[1])) << 16 | uint32_t(uint8_t(s[2])) << 8 |
-           uint8_t(s[3]);
+    return uint32_t(uint8_t(s[0])) << 24 | uint32_t(uint8_t(s[1])) << 16 | uint32_t(uint8_t(s[2])) << 8 | uint8_t(s[3]);
 }
 
 constexpr uint32_t kCodecQcelp = 1;
@@ -109,7 +108,7 @@ int32_t QCP_GetMediaInfo(const char* path, int request, void* out) {
     if (clip != nullptr) clip->nFileSize = SaturateU32(fileSize);
 
     uint32_t riff = GetUINT32(h, false);
-    GetUINT32(h, true);   // RIFF size
+    GetUINT32(h, true);  // RIFF size
     GetUINT32(h, false);  // form type, not checked
     if (riff != FourCC("RIFF")) return MM_E_FAIL;
 

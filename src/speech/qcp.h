@@ -15,5 +15,4 @@ int32_t QCP_GetClipInfo(const char* path, _MMClipInfo* clip);
 int32_t QCP_GetCodecType(const char* path, _MM_CODECTYPE* codec);
 int32_t QCP_GetTrackType(const char* path, int* mask);
 
-
 }  // namespace metainfo

@@ -15,18 +15,18 @@ struct _QCPRateMap {
 
 // A decoded "fmt " chunk; all multi-byte fields are little-endian in the file.
 struct _QCPFMT {
-    uint32_t nChunkId;       // read big-endian: compares with "fmt "
+    uint32_t nChunkId;  // read big-endian: compares with "fmt "
     uint32_t nChunkSize;
     uint8_t nMajor;
     uint8_t nMinor;
     uint8_t codecGuid[16];
     uint16_t nCodecVersion;
     char szCodecName[80];
-    uint16_t nAvgBitrate;    // bit/s
+    uint16_t nAvgBitrate;  // bit/s
     uint16_t nPacketSize;
-    uint16_t nBlockSize;     // samples per packet
+    uint16_t nBlockSize;  // samples per packet
     uint16_t nSamplingRate;
-    uint16_t nSampleSize;    // bits
+    uint16_t nSampleSize;  // bits
     uint32_t nNumRates;
     _QCPRateMap rateMap[8];
 };

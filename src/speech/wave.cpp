@@ -146,11 +146,8 @@ int32_t GetMediaInfo_WAVE(const char* path, void* out, int request) {
             clip->nDuration = DurationSeconds(fileSize, fmt);
             return MM_OK;
         }
-        case INFO_MIMETYPE:
-            return SetMimeType(static_cast<_MM_MIMETYPE*>(out), fmt);
-        case INFO_CODECTYPE:
-            static_cast<_MM_CODECTYPE*>(out)->nAudioCodec = CodecOfTag(fmt.wFormatTag);
-            return MM_OK;
+        case INFO_MIMETYPE: return SetMimeType(static_cast<_MM_MIMETYPE*>(out), fmt);
+        case INFO_CODECTYPE: static_cast<_MM_CODECTYPE*>(out)->nAudioCodec = CodecOfTag(fmt.wFormatTag); return MM_OK;
         case INFO_WAVE_AUDIO: {
             _WaveAudioInfo* info = static_cast<_WaveAudioInfo*>(out);
             info->nDuration = DurationSeconds(fileSize, fmt);
@@ -165,13 +162,11 @@ int32_t GetMediaInfo_WAVE(const char* path, void* out, int request) {
             info->nAvgBytesPerSec = fmt.nAvgBytesPerSec;
             return MM_OK;
         }
-        default:
-            return MM_E_FAIL;
+        default: return MM_E_FAIL;
     }
 }
 
-int32_t GetAudioData_WAVE(const char* path, int startSec, int endSec, unsigned char** data, int* size,
-                          int mode) {
+int32_t GetAudioData_WAVE(const char* path, int startSec, int endSec, unsigned char** data, int* size, int mode) {
     if (startSec < 0 || path == nullptr || data == nullptr || size == nullptr || startSec >= endSec) {
         return MM_E_INVALIDARG;
     }

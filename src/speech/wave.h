@@ -46,8 +46,7 @@ int32_t ParseFormatChunk(const uint8_t* buffer, size_t length, _FormatChunk* for
 int32_t GetMediaInfo_WAVE(const char* path, void* out, int request);
 // Mode 0x791: *data receives a new buffer of *size bytes. Mode 0x792: *data
 // is the output path.
-int32_t GetAudioData_WAVE(const char* path, int startSec, int endSec, unsigned char** data, int* size,
-                          int mode);
+int32_t GetAudioData_WAVE(const char* path, int startSec, int endSec, unsigned char** data, int* size, int mode);
 
 int32_t WAVE_GetClipInfo(const char* path, _MMClipInfo* clip);
 int32_t WAVE_GetMIMEType(const char* path, _MM_MIMETYPE* mime);

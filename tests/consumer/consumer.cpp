@@ -5,7 +5,8 @@
 #include <cstring>
 
 int main(int argc, char** argv) {
-    std::printf("version %s %s\n", MM_Version(), std::strcmp(MM_Version(), MM_VERSION_STRING) == 0 ? "matches" : "differs");
+    std::printf("version %s %s\n", MM_Version(),
+                std::strcmp(MM_Version(), MM_VERSION_STRING) == 0 ? "matches" : "differs");
     for (int i = 1; i < argc; ++i) {
         int type = -1;
         const int32_t result = MM_MediaExtractor_DetectMediaType(argv[i], &type);

@@ -19,9 +19,7 @@ void Capture(int priority, const char* tag, const char* message) {
 
 }  // namespace
 
-extern "C" JNIEXPORT void JNICALL Java_LogCapture_install(JNIEnv*, jclass) {
-    MM_MediaExtractor_SetLogSink(Capture);
-}
+extern "C" JNIEXPORT void JNICALL Java_LogCapture_install(JNIEnv*, jclass) { MM_MediaExtractor_SetLogSink(Capture); }
 
 extern "C" JNIEXPORT jstring JNICALL Java_LogCapture_drain(JNIEnv* env, jclass) {
     std::string lines;

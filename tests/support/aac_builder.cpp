@@ -25,8 +25,8 @@ void PutSilentIcs(BitWriter& w, bool withIcsInfo) {
     w.put(100, 8);  // global_gain
     if (withIcsInfo) {
         w.put(0, 1).put(0, 2).put(0, 1);  // ics_reserved_bit, ONLY_LONG_SEQUENCE, window_shape
-        w.put(0, 6);                      // max_sfb
-        w.put(0, 1);                      // predictor_data_present
+        w.put(0, 6);  // max_sfb
+        w.put(0, 1);  // predictor_data_present
     }
     w.put(0, 1).put(0, 1).put(0, 1);  // pulse, tns, gain control absent
 }
@@ -42,7 +42,7 @@ void PutSilentCpe(BitWriter& w, bool commonWindow) {
     w.put(1, 3).put(0, 4).put(commonWindow ? 1 : 0, 1);
     if (commonWindow) {
         w.put(0, 1).put(0, 2).put(0, 1).put(0, 6).put(0, 1);  // ics_info
-        w.put(0, 2);                                          // ms_mask_present
+        w.put(0, 2);  // ms_mask_present
     }
     PutSilentIcs(w, !commonWindow);
     PutSilentIcs(w, !commonWindow);

@@ -11,7 +11,9 @@ Bytes AsfGuid(const char* text) {
         if (*p != '-') hex.push_back(*p);
     }
     if (hex.size() != 32) throw std::invalid_argument("GUID text");
-    auto byteAt = [&](size_t i) { return static_cast<uint32_t>(std::strtoul(hex.substr(2 * i, 2).c_str(), nullptr, 16)); };
+    auto byteAt = [&](size_t i) {
+        return static_cast<uint32_t>(std::strtoul(hex.substr(2 * i, 2).c_str(), nullptr, 16));
+    };
     Bytes out;
     // First three groups little-endian, the last eight bytes as written.
     for (size_t i : {3u, 2u, 1u, 0u, 5u, 4u, 7u, 6u}) out.u8(byteAt(i));
@@ -34,14 +36,14 @@ Bytes AsfHeader(const std::vector<Bytes>& objects, int64_t count) {
 
 Bytes AsfFileProperties(uint64_t fileSize, uint64_t playDuration, uint64_t preroll, uint32_t maxBitrate) {
     Bytes b;
-    b.fill(16, 0xAB);         // File ID
+    b.fill(16, 0xAB);  // File ID
     b.le64(fileSize);
-    b.le64(0);                // Creation Date
-    b.le64(10);               // Data Packets Count
+    b.le64(0);  // Creation Date
+    b.le64(10);  // Data Packets Count
     b.le64(playDuration);
-    b.le64(playDuration);     // Send Duration
+    b.le64(playDuration);  // Send Duration
     b.le64(preroll);
-    b.le32(2);                // Flags: seekable
+    b.le32(2);  // Flags: seekable
     b.le32(3200).le32(3200);  // Minimum and Maximum Data Packet Size
     b.le32(maxBitrate);
     return AsfObject(asf_guid::kFileProperties, b);
@@ -51,7 +53,7 @@ Bytes AsfStreamProperties(const char* typeGuid, int streamNumber, const Bytes& t
     Bytes b;
     b.raw(AsfGuid(typeGuid));
     b.raw(AsfGuid("20FB5700-5B55-11CF-A8FD-00805F5C442B"));  // No Error Correction
-    b.le64(0);                                                // Time Offset
+    b.le64(0);  // Time Offset
     b.le32(static_cast<uint32_t>(typeSpecific.size()));
     b.le32(0);  // Error Correction Data Length
     b.le16(static_cast<uint32_t>(streamNumber) & 0x7F);
@@ -100,10 +102,10 @@ Bytes AsfHeaderExtension(const std::vector<Bytes>& inner, int64_t dataSize) {
 
 Bytes AsfExtStreamProperties(int streamNumber, uint64_t avgTimePerFrame) {
     Bytes b;
-    b.le64(0).le64(0);                  // Start and End Time
+    b.le64(0).le64(0);  // Start and End Time
     b.le32(200000).le32(4000).le32(0);  // Data Bitrate, Buffer Size, Initial Fullness
-    b.le32(0).le32(0).le32(0);          // Alternate values
-    b.le32(5000).le32(0);               // Maximum Object Size, Flags
+    b.le32(0).le32(0).le32(0);  // Alternate values
+    b.le32(5000).le32(0);  // Maximum Object Size, Flags
     b.le16(static_cast<uint32_t>(streamNumber)).le16(0);
     b.le64(avgTimePerFrame);
     b.le16(0).le16(0);  // Stream Name and Payload Extension System counts
@@ -117,9 +119,8 @@ Bytes Utf16(const std::string& text, bool terminator) {
     return b;
 }
 
-Bytes AsfContentDescription(const std::string& title, const std::string& author,
-                            const std::string& copyright, const std::string& description,
-                            const std::string& rating) {
+Bytes AsfContentDescription(const std::string& title, const std::string& author, const std::string& copyright,
+                            const std::string& description, const std::string& rating) {
     std::vector<Bytes> texts;
     for (const std::string* s : {&title, &author, &copyright, &description, &rating}) {
         texts.push_back(s->empty() ? Bytes() : Utf16(*s));
@@ -161,8 +162,7 @@ Bytes AsfContentBranding(uint32_t imageType, const Bytes& image, const std::stri
     return AsfObject(asf_guid::kContentBranding, b);
 }
 
-Bytes AsfWmPicture(uint8_t pictureType, const std::string& mime, const std::string& description,
-                   const Bytes& data) {
+Bytes AsfWmPicture(uint8_t pictureType, const std::string& mime, const std::string& description, const Bytes& data) {
     Bytes b;
     b.u8(pictureType).le32(static_cast<uint32_t>(data.size()));
     b.raw(Utf16(mime)).raw(Utf16(description)).raw(data);

@@ -57,9 +57,8 @@ Bytes AsfExtStreamProperties(int streamNumber, uint64_t avgTimePerFrame);
 // UTF-16LE of ASCII text, with a terminating zero unit when asked.
 Bytes Utf16(const std::string& text, bool terminator = true);
 
-Bytes AsfContentDescription(const std::string& title, const std::string& author,
-                            const std::string& copyright, const std::string& description,
-                            const std::string& rating);
+Bytes AsfContentDescription(const std::string& title, const std::string& author, const std::string& copyright,
+                            const std::string& description, const std::string& rating);
 
 struct AsfDescriptor {
     std::string name;
@@ -71,7 +70,6 @@ Bytes AsfMetadata(const std::vector<AsfDescriptor>& records, bool library = fals
 Bytes AsfContentBranding(uint32_t imageType, const Bytes& image, const std::string& bannerUrl = "",
                          const std::string& copyrightUrl = "");
 // A WM/Picture value: type, data length, MIME and description (UTF-16, terminated), data.
-Bytes AsfWmPicture(uint8_t pictureType, const std::string& mime, const std::string& description,
-                   const Bytes& data);
+Bytes AsfWmPicture(uint8_t pictureType, const std::string& mime, const std::string& description, const Bytes& data);
 
 }  // namespace testing_support

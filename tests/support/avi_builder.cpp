@@ -20,15 +20,35 @@ Bytes RiffList(const std::string& type, const std::vector<Bytes>& children, cons
 
 static Bytes AviMainHeader(const AviMainFields& s) {
     Bytes body;
-    body.le32(s.microSecPerFrame).le32(0).le32(0).le32(s.flags).le32(s.totalFrames).le32(0).le32(s.streams)
-        .le32(0).le32(s.width).le32(s.height).zeros(16);
+    body.le32(s.microSecPerFrame)
+        .le32(0)
+        .le32(0)
+        .le32(s.flags)
+        .le32(s.totalFrames)
+        .le32(0)
+        .le32(s.streams)
+        .le32(0)
+        .le32(s.width)
+        .le32(s.height)
+        .zeros(16);
     return RiffChunk("avih", body);
 }
 
 static Bytes AviStreamHeader(const AviStreamFields& s) {
     Bytes body;
-    body.str(s.type).str(s.handler).le32(0).le32(0).le32(0).le32(s.scale).le32(s.rate).le32(0).le32(s.length)
-        .le32(0).le32(0xFFFFFFFF).le32(s.sampleSize).zeros(8);
+    body.str(s.type)
+        .str(s.handler)
+        .le32(0)
+        .le32(0)
+        .le32(0)
+        .le32(s.scale)
+        .le32(s.rate)
+        .le32(0)
+        .le32(s.length)
+        .le32(0)
+        .le32(0xFFFFFFFF)
+        .le32(s.sampleSize)
+        .zeros(8);
     return RiffChunk("strh", body);
 }
 
@@ -52,8 +72,18 @@ AviStreamFields AviAudioStream(uint32_t avgBytesPerSec, uint32_t length) {
 
 Bytes AviVideoFormat(uint32_t width, uint32_t height, const std::string& compression, const Bytes& extra) {
     Bytes body;
-    body.le32(40 + static_cast<uint32_t>(extra.size())).le32(width).le32(height).le16(1).le16(24).str(compression)
-        .le32(width * height * 3).le32(0).le32(0).le32(0).le32(0).raw(extra);
+    body.le32(40 + static_cast<uint32_t>(extra.size()))
+        .le32(width)
+        .le32(height)
+        .le16(1)
+        .le16(24)
+        .str(compression)
+        .le32(width * height * 3)
+        .le32(0)
+        .le32(0)
+        .le32(0)
+        .le32(0)
+        .raw(extra);
     return RiffChunk("strf", body);
 }
 

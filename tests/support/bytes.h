@@ -14,7 +14,10 @@ public:
     Bytes(std::initializer_list<uint8_t> init) : data_(init) {}
     explicit Bytes(const std::vector<uint8_t>& data) : data_(data) {}
 
-    Bytes& u8(uint32_t v) { data_.push_back(static_cast<uint8_t>(v)); return *this; }
+    Bytes& u8(uint32_t v) {
+        data_.push_back(static_cast<uint8_t>(v));
+        return *this;
+    }
     Bytes& be16(uint32_t v) { return u8(v >> 8).u8(v); }
     Bytes& be24(uint32_t v) { return u8(v >> 16).u8(v >> 8).u8(v); }
     Bytes& be32(uint32_t v) { return u8(v >> 24).u8(v >> 16).u8(v >> 8).u8(v); }
@@ -24,10 +27,19 @@ public:
     Bytes& le64(uint64_t v) { return le32(static_cast<uint32_t>(v)).le32(static_cast<uint32_t>(v >> 32)); }
     // ID3v2's four 7-bit bytes.
     Bytes& syncsafe32(uint32_t v) { return u8((v >> 21) & 0x7F).u8((v >> 14) & 0x7F).u8((v >> 7) & 0x7F).u8(v & 0x7F); }
-    Bytes& str(const std::string& s) { data_.insert(data_.end(), s.begin(), s.end()); return *this; }
+    Bytes& str(const std::string& s) {
+        data_.insert(data_.end(), s.begin(), s.end());
+        return *this;
+    }
     Bytes& zeros(size_t n) { return fill(n, 0); }
-    Bytes& fill(size_t n, uint8_t v) { data_.insert(data_.end(), n, v); return *this; }
-    Bytes& raw(const std::vector<uint8_t>& v) { data_.insert(data_.end(), v.begin(), v.end()); return *this; }
+    Bytes& fill(size_t n, uint8_t v) {
+        data_.insert(data_.end(), n, v);
+        return *this;
+    }
+    Bytes& raw(const std::vector<uint8_t>& v) {
+        data_.insert(data_.end(), v.begin(), v.end());
+        return *this;
+    }
     Bytes& raw(const Bytes& b) { return raw(b.data_); }
     // Overwrites 4 bytes at offset (sizes known only once the body is built).
     Bytes& patch_be32(size_t offset, uint32_t v);

@@ -30,15 +30,14 @@ Seed Cat(std::initializer_list<Seed> parts) {
 
 Seed Id3Frames(int version) {
     const uint8_t enc = version == 4 ? 3 : 0;
-    return Id3Tag(version, {Id3Frame(version, "TIT2", TextBody(enc, "Title")),
-                            Id3Frame(version, "TPE1", TextBody(enc, "Artist")),
-                            Id3Frame(version, "TALB", TextBody(enc, "Album")),
-                            Id3Frame(version, "TCON", TextBody(enc, "(13)Pop")),
-                            Id3Frame(version, "TRCK", TextBody(enc, "3/12")),
-                            Id3Frame(version, version == 4 ? "TDRC" : "TYER", TextBody(enc, "2009")),
-                            Id3Frame(version, "TCOM", TextBytes(1, {0xFF, 0xFE, 'C', 0, 'o', 0})),
-                            Id3Frame(version, "COMM", Bytes().u8(0).str("eng").u8(0).str("Note").data()),
-                            Id3Frame(version, "APIC", ApicBody("image/jpeg", kJpeg, "cover"))});
+    return Id3Tag(
+        version, {Id3Frame(version, "TIT2", TextBody(enc, "Title")), Id3Frame(version, "TPE1", TextBody(enc, "Artist")),
+                  Id3Frame(version, "TALB", TextBody(enc, "Album")),
+                  Id3Frame(version, "TCON", TextBody(enc, "(13)Pop")), Id3Frame(version, "TRCK", TextBody(enc, "3/12")),
+                  Id3Frame(version, version == 4 ? "TDRC" : "TYER", TextBody(enc, "2009")),
+                  Id3Frame(version, "TCOM", TextBytes(1, {0xFF, 0xFE, 'C', 0, 'o', 0})),
+                  Id3Frame(version, "COMM", Bytes().u8(0).str("eng").u8(0).str("Note").data()),
+                  Id3Frame(version, "APIC", ApicBody("image/jpeg", kJpeg, "cover"))});
 }
 
 void AddMp3Files(Files& out) {
@@ -68,12 +67,11 @@ void AddMp3Files(Files& out) {
     Add(out, MEDIA_TYPE_MP3, "id3v23.mp3", Cat({Id3Frames(3), Mp3Frames(20), Id3v1(v1)}));
     Add(out, MEDIA_TYPE_MP3, "id3v24.mp3", Cat({Id3Frames(4), Mp3Frames(20)}));
     Add(out, MEDIA_TYPE_MP3, "id3v22.mp3",
-               Cat({Id3Tag(2, {Id3Frame22("TT2", TextBody(0, "Title")), Id3Frame22("TP1", TextBody(0, "Artist")),
-                               Id3Frame22("PIC", Bytes().u8(0).str("JPG").u8(3).u8(0).raw(kJpeg).data())}),
-                    Mp3Frames(20)}));
+        Cat({Id3Tag(2, {Id3Frame22("TT2", TextBody(0, "Title")), Id3Frame22("TP1", TextBody(0, "Artist")),
+                        Id3Frame22("PIC", Bytes().u8(0).str("JPG").u8(3).u8(0).raw(kJpeg).data())}),
+             Mp3Frames(20)}));
     Add(out, MEDIA_TYPE_MP3, "unsync.mp3",
-               Cat({Id3Tag(3, {Unsynchronise(Id3Frame(3, "APIC", ApicBody("image/jpeg", kJpeg)))}, 16, 0x80),
-                    Mp3Frames(10)}));
+        Cat({Id3Tag(3, {Unsynchronise(Id3Frame(3, "APIC", ApicBody("image/jpeg", kJpeg)))}, 16, 0x80), Mp3Frames(10)}));
     Add(out, MEDIA_TYPE_MP3, "xing.mp3", Cat({XingFrame(xing), Mp3Frames(40)}));
     Add(out, MEDIA_TYPE_MP3, "vbri.mp3", Cat({VbriFrame(vbri), Mp3Frames(40)}));
     Add(out, MEDIA_TYPE_MP3, "mpeg2-mono.mp3", Mp3Frames(30, mpeg2));
@@ -92,7 +90,7 @@ void AddAacFiles(Files& out) {
     Add(out, MEDIA_TYPE_AAC, "adts-sbr.aac", AdtsFrames(AdtsLayout(6, 2), sizes, 13));
     Add(out, MEDIA_TYPE_AAC, "adts-crc-mono.aac", AdtsFrames(crc, sizes));
     Add(out, MEDIA_TYPE_AAC, "adts-id3.aac",
-               Cat({Id3Frames(3), AdtsFrames(AdtsLayout(4, 2), sizes), Id3v1Titled("Title")}));
+        Cat({Id3Frames(3), AdtsFrames(AdtsLayout(4, 2), sizes), Id3v1Titled("Title")}));
     Add(out, MEDIA_TYPE_AAC, "adif.aac", AdifFile(adif, AacBlock(true)));
 }
 
@@ -100,10 +98,11 @@ ByteVec Meta(const ByteVec& children) { return FullBox("meta", 0, 0, Join({Hdlr(
 ByteVec Item(const std::string& type, const std::string& s) { return IlstItem(type, 1, ByteVec(s.begin(), s.end())); }
 
 ByteVec MakerBox() {
-    return FullBox("@mkr", 0, 0,
-                   Join({FullBox("modl", 0, 0, Bytes().str("PX-100").data()),
-                         FullBox("thub", 0, 0, Bytes().be32(0xCAFE).be32(static_cast<uint32_t>(kJpeg.size())).raw(kJpeg)),
-                         FullBox("salb", 0, 0, Bytes().be16(0x15C7).str("Holiday").data())}));
+    return FullBox(
+        "@mkr", 0, 0,
+        Join({FullBox("modl", 0, 0, Bytes().str("PX-100").data()),
+              FullBox("thub", 0, 0, Bytes().be32(0xCAFE).be32(static_cast<uint32_t>(kJpeg.size())).raw(kJpeg)),
+              FullBox("salb", 0, 0, Bytes().be16(0x15C7).str("Holiday").data())}));
 }
 
 ByteVec AudioTrak() {
@@ -113,8 +112,9 @@ ByteVec AudioTrak() {
 }
 
 ByteVec VideoTrak() {
-    ByteVec avcC = Box("avcC", Bytes().u8(1).u8(66).u8(0).u8(30).u8(0xFF).u8(0xE1).be16(4).be32(0x6742001E)
-                                   .u8(1).be16(2).be16(0x68CE));
+    ByteVec avcC =
+        Box("avcC",
+            Bytes().u8(1).u8(66).u8(0).u8(30).u8(0xFF).u8(0xE1).be16(4).be32(0x6742001E).u8(1).be16(2).be16(0x68CE));
     ByteVec btrt = Box("btrt", Bytes().be32(0).be32(900000).be32(750000));
     return Trak("vide", 1000, 5000,
                 Join({Stsd({VisualEntry("avc1", 320, 240, Join({Box("pasp", Bytes().be32(1).be32(1)), avcC, btrt}))}),
@@ -123,20 +123,27 @@ ByteVec VideoTrak() {
 }
 
 void AddMp4Files(Files& out) {
-    const ByteVec ilst = Meta(Box("ilst", Join({Item("\xA9nam", "Title"), Item("\xA9" "ART", "Artist"),
-                                                 Item("\xA9" "alb", "Album"), Item("\xA9" "day", "2009"),
-                                                 IlstItem("trkn", 0, {0, 0, 0, 3, 0, 12, 0, 0}),
-                                                 IlstItem("gnre", 0, {0, 14}), IlstItem("covr", 13, kJpeg)})));
-    const ByteVec udta3gp = Box("udta", Join({TextBox("titl", "Title"), TextBox("auth", "Author"),
-                                               TextBox("perf", "Performer"), TextBox("gnre", "Genre"),
-                                               TextBox("dscp", "About"), TextBox("cprt", "(c)"), MakerBox()}));
+    const ByteVec ilst = Meta(Box("ilst", Join({Item("\xA9nam", "Title"),
+                                                Item("\xA9"
+                                                     "ART",
+                                                     "Artist"),
+                                                Item("\xA9"
+                                                     "alb",
+                                                     "Album"),
+                                                Item("\xA9"
+                                                     "day",
+                                                     "2009"),
+                                                IlstItem("trkn", 0, {0, 0, 0, 3, 0, 12, 0, 0}),
+                                                IlstItem("gnre", 0, {0, 14}), IlstItem("covr", 13, kJpeg)})));
+    const ByteVec udta3gp =
+        Box("udta", Join({TextBox("titl", "Title"), TextBox("auth", "Author"), TextBox("perf", "Performer"),
+                          TextBox("gnre", "Genre"), TextBox("dscp", "About"), TextBox("cprt", "(c)"), MakerBox()}));
     const ByteVec damr = Box("damr", Bytes().str("vndr").u8(0).be16(0x81FF).u8(0).u8(3));
-    const ByteVec d263 = Box("d263", Join({Bytes().str("vndr").u8(0).u8(10).u8(0).data(),
-                                           Box("bitr", Bytes().be32(64000).be32(128000))}));
+    const ByteVec d263 = Box(
+        "d263", Join({Bytes().str("vndr").u8(0).u8(10).u8(0).data(), Box("bitr", Bytes().be32(64000).be32(128000))}));
     const ByteVec camera = Join({
         Trak("soun", 8000, 40000, Join({Stsd({AudioEntry("samr", 1, 16, 8000, damr)}), Stsz(32, 250)})),
-        Trak("vide", 1000, 5000, Join({Stsd({VisualEntry("s263", 176, 144, d263)}), Stsz(0, 2, {900, 800})}), 176,
-             144),
+        Trak("vide", 1000, 5000, Join({Stsd({VisualEntry("s263", 176, 144, d263)}), Stsz(0, 2, {900, 800})}), 176, 144),
     });
     const ByteVec id32 = Meta(FullBox("ID32", 0, 0, Join({Bytes().be16(0x15C7).data(), Id3Frames(4)})));
 
@@ -144,13 +151,13 @@ void AddMp4Files(Files& out) {
     Add(out, MEDIA_TYPE_MP4, "video.mp4", Movie(Join({Mvhd(1, 1000, 5000, 3000000000u), VideoTrak(), AudioTrak()})));
     Add(out, MEDIA_TYPE_MP4, "camera.3gp", Movie(Join({Mvhd(0, 1000, 5000), camera, udta3gp})));
     Add(out, MEDIA_TYPE_MP4, "maker-top.3gp",
-               Movie(Mvhd(0, 1000, 1000), Join({Box("udta", MakerBox()), Box("mdat", ByteVec(16, 0))})));
+        Movie(Mvhd(0, 1000, 1000), Join({Box("udta", MakerBox()), Box("mdat", ByteVec(16, 0))})));
     Add(out, MEDIA_TYPE_MP4, "id32.m4a", Movie(Join({Mvhd(0, 1000, 5000), AudioTrak(), Box("udta", id32)})));
     Add(out, MEDIA_TYPE_MP4, "qcelp.3g2",
-               Movie(Join({Mvhd(0, 1000, 5000),
-                           Trak("soun", 8000, 40000, Join({Stsd({AudioEntry("sqcp", 1, 16, 8000)}), Stsz(35, 250)}))})));
+        Movie(Join({Mvhd(0, 1000, 5000),
+                    Trak("soun", 8000, 40000, Join({Stsd({AudioEntry("sqcp", 1, 16, 8000)}), Stsz(35, 250)}))})));
     Add(out, MEDIA_TYPE_MP4, "mdat-first.mp4",
-               Join({Ftyp("mp42"), Box("mdat", ByteVec(64, 0)), Box("moov", Join({Mvhd(0, 600, 3000), VideoTrak()}))}));
+        Join({Ftyp("mp42"), Box("mdat", ByteVec(64, 0)), Box("moov", Join({Mvhd(0, 600, 3000), VideoTrak()}))}));
 }
 
 void AddAsfFiles(Files& out) {
@@ -164,22 +171,23 @@ void AddAsfFiles(Files& out) {
         {"IsVBR", 2, Bytes().le32(1).data()},
         {"WM/Picture", 1, AsfWmPicture(3, "image/jpeg", "cover", Bytes(kJpeg)).data()},
     };
-    auto file = [&](const std::vector<Bytes>& objects) { return Bytes().raw(AsfHeader(objects)).raw(dataObject).data(); };
+    auto file = [&](const std::vector<Bytes>& objects) {
+        return Bytes().raw(AsfHeader(objects)).raw(dataObject).data();
+    };
     const Bytes props = AsfFileProperties(4096, 3 * kSecond, 500, 128000);
     const Bytes audio = AsfAudioStream(1, 0x161, 44100, 2, 128000);
     const Bytes description = AsfContentDescription("Title", "Author", "(c)", "About", "PG");
 
     Add(out, MEDIA_TYPE_ASF, "audio.wma",
-               file({props, audio, description, AsfExtContentDescription(descriptors),
-                     AsfStreamBitrates({{1, 128000}})}));
+        file({props, audio, description, AsfExtContentDescription(descriptors), AsfStreamBitrates({{1, 128000}})}));
     Add(out, MEDIA_TYPE_ASF, "video.wmv",
-               file({AsfFileProperties(8192, 5 * kSecond, 3000, 500000), audio,
-                     AsfVideoStream(2, "WMV3", 320, 240, {0x4F, 0xD1, 0x1A, 0x01}),
-                     AsfHeaderExtension({AsfExtStreamProperties(2, 333333), AsfMetadata(descriptors)}),
-                     AsfStreamBitrates({{1, 128000}, {2, 372000}})}));
+        file({AsfFileProperties(8192, 5 * kSecond, 3000, 500000), audio,
+              AsfVideoStream(2, "WMV3", 320, 240, {0x4F, 0xD1, 0x1A, 0x01}),
+              AsfHeaderExtension({AsfExtStreamProperties(2, 333333), AsfMetadata(descriptors)}),
+              AsfStreamBitrates({{1, 128000}, {2, 372000}})}));
     Add(out, MEDIA_TYPE_ASF, "branding.asf",
-               file({props, AsfAudioStream(1, 0x0A, 16000, 1, 20000), AsfContentBranding(3, Bytes(kJpeg), "u", "c"),
-                     AsfHeaderExtension({AsfMetadata(descriptors, true)})}));
+        file({props, AsfAudioStream(1, 0x0A, 16000, 1, 20000), AsfContentBranding(3, Bytes(kJpeg), "u", "c"),
+              AsfHeaderExtension({AsfMetadata(descriptors, true)})}));
 }
 
 void AddRealMediaFiles(Files& out) {
@@ -198,7 +206,8 @@ void AddRealMediaFiles(Files& out) {
     multi.mime = "logical-fileinfo";
     multi.typeData = RmMulti(2, RaHeaderV4(8000, 16, 1, "sipr"));
 
-    Add(out, MEDIA_TYPE_REALMEDIA, "audio.ra", RmFile(RmProps{}, {RmCont("Title", "Author", "(c)", "About"), RmMdpr(audio)}));
+    Add(out, MEDIA_TYPE_REALMEDIA, "audio.ra",
+        RmFile(RmProps{}, {RmCont("Title", "Author", "(c)", "About"), RmMdpr(audio)}));
     Add(out, MEDIA_TYPE_REALMEDIA, "av.rm", RmFile(two, {RmCont("T", "A", "C", "X"), RmMdpr(audio5), RmMdpr(video)}));
     Add(out, MEDIA_TYPE_REALMEDIA, "multi.rm", RmFile(RmProps{}, {RmMdpr(multi)}));
 }
@@ -222,31 +231,33 @@ void AddAviFiles(Files& out) {
 
 void AddSpeechFiles(Files& out) {
     Add(out, MEDIA_TYPE_AMR_NB, "nb.amr", AmrFile(false, 7, 100));
-    Add(out, MEDIA_TYPE_AMR_NB, "nb-mixed.amr", Cat({AmrFile(false, 2, 20), AmrFrame(false, 8).data(),
-                                                     AmrFrame(false, 15).data(), AmrFrame(false, 0).data()}));
+    Add(out, MEDIA_TYPE_AMR_NB, "nb-mixed.amr",
+        Cat({AmrFile(false, 2, 20), AmrFrame(false, 8).data(), AmrFrame(false, 15).data(), AmrFrame(false, 0).data()}));
     Add(out, MEDIA_TYPE_AMR_NB, "nb-mc.amr", AmrFile(false, 4, 30, 2));
     Add(out, MEDIA_TYPE_AMR_WB, "wb.awb", AmrFile(true, 8, 100));
     Add(out, MEDIA_TYPE_WAVE, "pcm.wav", CanonicalWave(1, 2, 8000, 16, 8000 * 4 * 3));
     Add(out, MEDIA_TYPE_WAVE, "adpcm.wav", CanonicalWave(0x11, 1, 8000, 4, 12000));
     Add(out, MEDIA_TYPE_WAVE, "chunks.wav",
-               RiffForm("WAVE", {SpeechChunk("LIST", Bytes().str("INFOINAM").le32(4).str("abc")),
-                                 SpeechChunk("fmt ", WaveFmtBody(1, 1, 11025, 8)), SpeechChunk("fact", Bytes().le32(9)),
-                                 SpeechChunk("data", Bytes().fill(11025 * 2, 0x80))}));
+        RiffForm("WAVE", {SpeechChunk("LIST", Bytes().str("INFOINAM").le32(4).str("abc")),
+                          SpeechChunk("fmt ", WaveFmtBody(1, 1, 11025, 8)), SpeechChunk("fact", Bytes().le32(9)),
+                          SpeechChunk("data", Bytes().fill(11025 * 2, 0x80))}));
     Add(out, MEDIA_TYPE_QCP, "qcelp.qcp",
-               RiffForm("QLCM", {QcpFmtChunk(kQcelpGuid1, 13000), QcpVratChunk(100),
-                                 SpeechChunk("data", SpeechPackets(4, 34, 100))}));
+        RiffForm("QLCM",
+                 {QcpFmtChunk(kQcelpGuid1, 13000), QcpVratChunk(100), SpeechChunk("data", SpeechPackets(4, 34, 100))}));
     // Its packets are counted with the rates of the codec read last on the
     // thread: after "qcelp.qcp", QCELP's.
     Add(out, MEDIA_TYPE_QCP, "smv.qcp",
         RiffForm("QLCM", {QcpFmtChunk(kSmvGuid, 0), SpeechChunk("data", SpeechPackets(4, 34, 200))}));
     Add(out, MEDIA_TYPE_QCP, "evrc.qcp",
-               RiffForm("QLCM", {SpeechChunk("labl", Bytes().str("abc")), QcpFmtChunk(kEvrcGuid, 0),
-                                 SpeechChunk("data", SpeechPackets(4, 22, 50).raw(SpeechPackets(2, 5, 49)))}));
+        RiffForm("QLCM", {SpeechChunk("labl", Bytes().str("abc")), QcpFmtChunk(kEvrcGuid, 0),
+                          SpeechChunk("data", SpeechPackets(4, 22, 50).raw(SpeechPackets(2, 5, 49)))}));
     Add(out, MEDIA_TYPE_EVRC, "speech.evc", EvrcFile(SpeechPackets(4, 22, 100)));
     Add(out, MEDIA_TYPE_MIDI, "song.mid",
-               Bytes().str("MThd").be32(6).be16(0).be16(1).be16(96).str("MTrk").be32(4).u8(0).u8(0xFF).u8(0x2F).u8(0).data());
-    Add(out, MEDIA_TYPE_MIDI, "tune.imy", Bytes().str("BEGIN:IMELODY\r\nVERSION:1.2\r\nMELODY:c2d2\r\nEND:IMELODY\r\n").data());
-    Add(out, MEDIA_TYPE_SND, "tone.snd", Bytes().str(".snd").be32(24).be32(64).be32(2).be32(8000).be32(1).zeros(64).data());
+        Bytes().str("MThd").be32(6).be16(0).be16(1).be16(96).str("MTrk").be32(4).u8(0).u8(0xFF).u8(0x2F).u8(0).data());
+    Add(out, MEDIA_TYPE_MIDI, "tune.imy",
+        Bytes().str("BEGIN:IMELODY\r\nVERSION:1.2\r\nMELODY:c2d2\r\nEND:IMELODY\r\n").data());
+    Add(out, MEDIA_TYPE_SND, "tone.snd",
+        Bytes().str(".snd").be32(24).be32(64).be32(2).be32(8000).be32(1).zeros(64).data());
 }
 
 }  // namespace

@@ -9,8 +9,10 @@ namespace testing_support {
 std::vector<uint8_t> Id3Frame(int version, const std::string& id, const std::vector<uint8_t>& body, uint8_t flags2) {
     Bytes b;
     b.str(id);
-    if (version == 4) b.syncsafe32(static_cast<uint32_t>(body.size()));
-    else b.be32(static_cast<uint32_t>(body.size()));
+    if (version == 4)
+        b.syncsafe32(static_cast<uint32_t>(body.size()));
+    else
+        b.be32(static_cast<uint32_t>(body.size()));
     return b.u8(0).u8(flags2).raw(body).data();
 }
 
@@ -18,7 +20,8 @@ std::vector<uint8_t> Id3Frame22(const std::string& id, const std::vector<uint8_t
     return Bytes().str(id).be24(static_cast<uint32_t>(body.size())).raw(body).data();
 }
 
-std::vector<uint8_t> ApicBody(const std::string& mime, const std::vector<uint8_t>& picture, const std::string& description) {
+std::vector<uint8_t> ApicBody(const std::string& mime, const std::vector<uint8_t>& picture,
+                              const std::string& description) {
     return Bytes().u8(0).str(mime).u8(0).u8(3).str(description).u8(0).raw(picture).data();
 }
 
@@ -26,7 +29,9 @@ std::vector<uint8_t> TextBytes(uint8_t encoding, const std::vector<uint8_t>& tex
     return Bytes().u8(encoding).raw(text).data();
 }
 
-std::vector<uint8_t> TextBody(uint8_t encoding, const std::string& text) { return Bytes().u8(encoding).str(text).data(); }
+std::vector<uint8_t> TextBody(uint8_t encoding, const std::string& text) {
+    return Bytes().u8(encoding).str(text).data();
+}
 
 std::vector<uint8_t> Id3Tag(int version, const std::vector<std::vector<uint8_t>>& frames, size_t padding,
                             uint8_t flags) {

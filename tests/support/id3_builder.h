@@ -10,8 +10,7 @@
 namespace testing_support {
 
 // A v2.3 (plain 32-bit size) or v2.4 (syncsafe size) frame.
-std::vector<uint8_t> Id3Frame(int version, const std::string& id, const std::vector<uint8_t>& body,
-                              uint8_t flags2 = 0);
+std::vector<uint8_t> Id3Frame(int version, const std::string& id, const std::vector<uint8_t>& body, uint8_t flags2 = 0);
 // A v2.2 frame: three-letter id, 24-bit size.
 std::vector<uint8_t> Id3Frame22(const std::string& id, const std::vector<uint8_t>& body);
 // An APIC body: Latin-1 encoding, MIME type, picture type 3, description, then the picture.

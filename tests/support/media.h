@@ -14,7 +14,7 @@ namespace testing_support {
 struct Mp3FrameLayout {
     int version = 3;
     int layer = 3;
-    int bitrateIndex = 9;   // 128 kbit/s for MPEG-1 Layer III
+    int bitrateIndex = 9;  // 128 kbit/s for MPEG-1 Layer III
     int samplingIndex = 0;  // 44100 Hz for MPEG-1
     int padding = 0;
     int channelMode = 0;
@@ -29,12 +29,12 @@ std::vector<uint8_t> Id3v2Tag(int version, const std::vector<uint8_t>& body, uin
 
 // An ADTS frame: 7-byte header (9 with CRC) followed by payload.
 struct AdtsFields {
-    int profile = 1;         // 0 main, 1 LC, 2 SSR
-    int samplingIndex = 4;   // 44100 Hz
+    int profile = 1;  // 0 main, 1 LC, 2 SSR
+    int samplingIndex = 4;  // 44100 Hz
     int channelConfig = 2;
-    int mpegId = 0;          // 0 MPEG-4, 1 MPEG-2
+    int mpegId = 0;  // 0 MPEG-4, 1 MPEG-2
     bool crc = false;
-    int rawBlocks = 0;       // number_of_raw_data_blocks_in_frame
+    int rawBlocks = 0;  // number_of_raw_data_blocks_in_frame
 };
 std::vector<uint8_t> AdtsFrame(const AdtsFields& shape, const std::vector<uint8_t>& payload);
 

@@ -21,13 +21,15 @@ ByteVec FullBox(const std::string& type, uint8_t version, uint32_t flags, const 
 ByteVec Ftyp(const std::string& brand) { return Box("ftyp", Bytes().str(brand).be32(0).str(brand).str("mp41")); }
 
 namespace {
-ByteVec TimeHeader(const std::string& type, uint8_t version, uint32_t timescale, uint64_t duration,
-                   uint64_t creation, size_t tail) {
+ByteVec TimeHeader(const std::string& type, uint8_t version, uint32_t timescale, uint64_t duration, uint64_t creation,
+                   size_t tail) {
     Bytes b;
     if (version == 1) {
         b.be64(creation).be64(creation).be32(timescale).be64(duration);
     } else {
-        b.be32(static_cast<uint32_t>(creation)).be32(static_cast<uint32_t>(creation)).be32(timescale)
+        b.be32(static_cast<uint32_t>(creation))
+            .be32(static_cast<uint32_t>(creation))
+            .be32(timescale)
             .be32(static_cast<uint32_t>(duration));
     }
     b.zeros(tail);
@@ -46,7 +48,7 @@ ByteVec Mdhd(uint8_t version, uint32_t timescale, uint64_t duration, uint64_t cr
 static ByteVec Tkhd(uint8_t version, uint32_t width, uint32_t height) {
     Bytes b;
     b.zeros(version == 1 ? 32 : 20);  // times, track ID, reserved, duration
-    b.zeros(8 + 8 + 36);              // reserved, layer/group/volume, matrix
+    b.zeros(8 + 8 + 36);  // reserved, layer/group/volume, matrix
     b.be32(width << 16).be32(height << 16);
     return FullBox("tkhd", version, 7, b);
 }
@@ -55,8 +57,7 @@ ByteVec Hdlr(const std::string& handler) {
     return FullBox("hdlr", 0, 0, Bytes().be32(0).str(handler).zeros(12).str("handler").u8(0));
 }
 
-ByteVec AudioEntry(const std::string& type, uint16_t channels, uint16_t bits, uint16_t rate,
-                   const ByteVec& children) {
+ByteVec AudioEntry(const std::string& type, uint16_t channels, uint16_t bits, uint16_t rate, const ByteVec& children) {
     Bytes b;
     b.zeros(6).be16(1).zeros(8).be16(channels).be16(bits).zeros(4).be16(rate).be16(0).raw(children);
     return Box(type, b);
@@ -64,8 +65,19 @@ ByteVec AudioEntry(const std::string& type, uint16_t channels, uint16_t bits, ui
 
 ByteVec VisualEntry(const std::string& type, uint16_t width, uint16_t height, const ByteVec& children) {
     Bytes b;
-    b.zeros(6).be16(1).zeros(16).be16(width).be16(height).be32(0x480000).be32(0x480000).be32(0).be16(1)
-        .zeros(32).be16(0x18).be16(0xFFFF).raw(children);
+    b.zeros(6)
+        .be16(1)
+        .zeros(16)
+        .be16(width)
+        .be16(height)
+        .be32(0x480000)
+        .be32(0x480000)
+        .be32(0)
+        .be16(1)
+        .zeros(32)
+        .be16(0x18)
+        .be16(0xFFFF)
+        .raw(children);
     return Box(type, b);
 }
 
@@ -105,8 +117,10 @@ ByteVec Stsz(uint32_t sampleSize, uint32_t sampleCount, const std::vector<uint32
 
 ByteVec Trak(const std::string& handler, uint32_t timescale, uint32_t duration, const ByteVec& stblChildren,
              uint32_t width, uint32_t height) {
-    ByteVec minf = Box("minf", Join({handler == "vide" ? FullBox("vmhd", 0, 1, Bytes().zeros(8)) : FullBox("smhd", 0, 0, Bytes().zeros(4)),
-                                     Box("stbl", stblChildren)}));
+    ByteVec minf =
+        Box("minf",
+            Join({handler == "vide" ? FullBox("vmhd", 0, 1, Bytes().zeros(8)) : FullBox("smhd", 0, 0, Bytes().zeros(4)),
+                  Box("stbl", stblChildren)}));
     ByteVec mdia = Box("mdia", Join({Mdhd(0, timescale, duration), Hdlr(handler), minf}));
     return Box("trak", Join({Tkhd(0, width, height), mdia}));
 }

@@ -8,16 +8,37 @@ Bytes RmChunk(const std::string& id, const Bytes& body) {
 
 static Bytes RmProp(const RmProps& p) {
     Bytes body;
-    body.be16(p.version).be32(p.maxBitRate).be32(p.avgBitRate).be32(1400).be32(700).be32(100).be32(p.durationMs)
-        .be32(2000).be32(0).be32(0).be16(p.numStreams).be16(0);
+    body.be16(p.version)
+        .be32(p.maxBitRate)
+        .be32(p.avgBitRate)
+        .be32(1400)
+        .be32(700)
+        .be32(100)
+        .be32(p.durationMs)
+        .be32(2000)
+        .be32(0)
+        .be32(0)
+        .be16(p.numStreams)
+        .be16(0);
     return RmChunk("PROP", body);
 }
 
 Bytes RmMdpr(const RmStream& s) {
     Bytes body;
-    body.be16(s.version).be16(s.number).be32(s.maxBitRate).be32(s.avgBitRate).be32(1400).be32(700).be32(0)
-        .be32(3000).be32(s.durationMs).u8(static_cast<uint32_t>(s.name.size())).str(s.name)
-        .u8(static_cast<uint32_t>(s.mime.size())).str(s.mime).be32(static_cast<uint32_t>(s.typeData.size()))
+    body.be16(s.version)
+        .be16(s.number)
+        .be32(s.maxBitRate)
+        .be32(s.avgBitRate)
+        .be32(1400)
+        .be32(700)
+        .be32(0)
+        .be32(3000)
+        .be32(s.durationMs)
+        .u8(static_cast<uint32_t>(s.name.size()))
+        .str(s.name)
+        .u8(static_cast<uint32_t>(s.mime.size()))
+        .str(s.mime)
+        .be32(static_cast<uint32_t>(s.typeData.size()))
         .raw(s.typeData);
     return RmChunk("MDPR", body);
 }
@@ -35,28 +56,72 @@ Bytes RmCont(const std::string& title, const std::string& author, const std::str
 Bytes RaHeaderV4(uint16_t sampleRate, uint16_t sampleSize, uint16_t channels, const std::string& fourcc) {
     Bytes b;
     b.u8(0x2E).u8(0x72).u8(0x61).u8(0xFD);
-    b.be16(4).be16(0).str(".ra4").be32(0).be16(4).be32(0x4E).be16(0).be32(0).zeros(12)  // through 35
-        .be16(1).be16(0).be16(0).be16(0)                                               // 36..43
-        .be16(sampleRate).be16(0).be16(sampleSize).be16(channels)                      // 44..51
-        .u8(4).str("Int0").u8(static_cast<uint32_t>(fourcc.size())).str(fourcc);       // 52..
+    b.be16(4)
+        .be16(0)
+        .str(".ra4")
+        .be32(0)
+        .be16(4)
+        .be32(0x4E)
+        .be16(0)
+        .be32(0)
+        .zeros(12)  // through 35
+        .be16(1)
+        .be16(0)
+        .be16(0)
+        .be16(0)  // 36..43
+        .be16(sampleRate)
+        .be16(0)
+        .be16(sampleSize)
+        .be16(channels)  // 44..51
+        .u8(4)
+        .str("Int0")
+        .u8(static_cast<uint32_t>(fourcc.size()))
+        .str(fourcc);  // 52..
     return b;
 }
 
 Bytes RaHeaderV5(uint16_t sampleRate, uint16_t sampleSize, uint16_t channels, const std::string& fourcc) {
     Bytes b;
     b.u8(0x2E).u8(0x72).u8(0x61).u8(0xFD);
-    b.be16(5).be16(0).str(".ra5").be32(0).be16(5).be32(0x4E).be16(0).be32(0).zeros(12)  // through 35
-        .be16(1).be16(0).be16(0).be16(0)                                               // 36..43
-        .be16(0).be16(sampleRate).be16(0).be16(0)                                      // 44..51
-        .be16(0).be16(sampleSize).be16(channels)                                       // 52..57
-        .str("Int0").str(fourcc);                                                      // 58..65
+    b.be16(5)
+        .be16(0)
+        .str(".ra5")
+        .be32(0)
+        .be16(5)
+        .be32(0x4E)
+        .be16(0)
+        .be32(0)
+        .zeros(12)  // through 35
+        .be16(1)
+        .be16(0)
+        .be16(0)
+        .be16(0)  // 36..43
+        .be16(0)
+        .be16(sampleRate)
+        .be16(0)
+        .be16(0)  // 44..51
+        .be16(0)
+        .be16(sampleSize)
+        .be16(channels)  // 52..57
+        .str("Int0")
+        .str(fourcc);  // 58..65
     return b;
 }
 
 Bytes RvHeader(const std::string& fourcc, uint16_t width, uint16_t height, uint16_t fps) {
     Bytes b;
-    b.be32(34).str("VIDO").str(fourcc).be16(width).be16(height).be16(12).be32(0).be16(fps).be16(0).be32(0)
-        .be16(8).zeros(4);
+    b.be32(34)
+        .str("VIDO")
+        .str(fourcc)
+        .be16(width)
+        .be16(height)
+        .be16(12)
+        .be32(0)
+        .be16(fps)
+        .be16(0)
+        .be32(0)
+        .be16(8)
+        .zeros(4);
     return b;
 }
 

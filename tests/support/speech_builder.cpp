@@ -54,8 +54,10 @@ Bytes AmrFrame(bool wideBand, int frameType, bool quality) {
 
 std::vector<uint8_t> AmrFile(bool wideBand, int frameType, uint32_t frames, uint32_t channels) {
     Bytes b;
-    if (channels == 0) b.str(wideBand ? "#!AMR-WB\n" : "#!AMR\n");
-    else b.str(wideBand ? "#!AMR-WB_MC1.0\n" : "#!AMR_MC1.0\n").be32(channels);
+    if (channels == 0)
+        b.str(wideBand ? "#!AMR-WB\n" : "#!AMR\n");
+    else
+        b.str(wideBand ? "#!AMR-WB_MC1.0\n" : "#!AMR_MC1.0\n").be32(channels);
     Bytes frame = AmrFrame(wideBand, frameType);
     for (uint32_t i = 0; i < frames; ++i) b.raw(frame);
     return b.data();

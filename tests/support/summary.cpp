@@ -7,11 +7,14 @@ namespace testing_support {
 
 std::string ClipSummary(const _MMClipInfo& c) {
     std::string out(c.szFormat, strnlen(c.szFormat, sizeof c.szFormat));
-    const struct { const char* name; uint32_t value; } fields[] = {
-        {"size", c.nFileSize},   {"dur", c.nDuration},       {"bps", c.nBitrate},       {"c1", c.nReserved1},
-        {"c2", c.nReserved2},    {"audio", c.bHasAudio},     {"video", c.bHasVideo},    {"abps", c.nAudioBitrate},
-        {"hz", c.nSampleRate},   {"ch", c.nChannels},        {"bits", c.nBitsPerSample}, {"spf", c.nSamplesPerFrame},
-        {"vbps", c.nVideoBitrate}, {"w", c.nWidth},          {"h", c.nHeight},          {"fps", c.nFrameRate}};
+    const struct {
+        const char* name;
+        uint32_t value;
+    } fields[] = {
+        {"size", c.nFileSize},     {"dur", c.nDuration},   {"bps", c.nBitrate},        {"c1", c.nReserved1},
+        {"c2", c.nReserved2},      {"audio", c.bHasAudio}, {"video", c.bHasVideo},     {"abps", c.nAudioBitrate},
+        {"hz", c.nSampleRate},     {"ch", c.nChannels},    {"bits", c.nBitsPerSample}, {"spf", c.nSamplesPerFrame},
+        {"vbps", c.nVideoBitrate}, {"w", c.nWidth},        {"h", c.nHeight},           {"fps", c.nFrameRate}};
     for (const auto& f : fields) {
         if (f.value != 0) out += (out.empty() ? "" : " ") + std::string(f.name) + "=" + std::to_string(f.value);
     }
@@ -50,8 +53,8 @@ std::string Item(const char* name, const _MMMetaItem& item) {
 
 std::string MetaSummary(const _MMMetaInfo& m) {
     static const char* const kNames[MM_META_ITEMS] = {
-        "title", "artist", "album", "genre", "year", "copyright", "reserved6", "composer", "track",
-        "language", "comment", "filetype", "conductor", "publisher", "date", "time", "picformat"};
+        "title",    "artist",  "album",    "genre",     "year",      "copyright", "reserved6", "composer", "track",
+        "language", "comment", "filetype", "conductor", "publisher", "date",      "time",      "picformat"};
     std::string out;
     for (int k = 0; k < MM_META_ITEMS; ++k) {
         if (m.aItems[k].nLength != 0) out += Item(kNames[k], m.aItems[k]);
