@@ -24,9 +24,10 @@ std::string Reason(int error) {
 
 }  // namespace
 
-std::string FileProblem(const std::string& path) {
+std::string FileProblem(const std::string& path, uint64_t* size) {
     struct stat st;
     if (::stat(path.c_str(), &st) != 0) return Reason(errno);
+    if (size != nullptr) *size = static_cast<uint64_t>(st.st_size);
     if (S_ISDIR(st.st_mode)) return Reason(EISDIR);
     if (!S_ISREG(st.st_mode)) return "not a regular file";
     const int fd = ::open(path.c_str(), O_RDONLY | O_CLOEXEC);

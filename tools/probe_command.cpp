@@ -1,7 +1,5 @@
 #include "probe_command.h"
 
-#include <sys/stat.h>
-
 #include <cstdio>
 #include <cstring>
 
@@ -86,12 +84,8 @@ Report::~Report() { MM_MediaExtractor_FreeMetaInfo(&meta); }
 
 void Probe(const std::string& path, Report* r) {
     r->path = path;
-    r->problem = FileProblem(path);
+    r->problem = FileProblem(path, &r->size);
     if (!r->problem.empty()) return;
-    uint64_t size = 0;
-    struct stat st;
-    if (::stat(path.c_str(), &st) == 0) size = static_cast<uint64_t>(st.st_size);
-    r->size = size;
     const char* p = path.c_str();
     r->detectResult = MM_MediaExtractor_DetectMediaType(p, &r->type);
     if (r->detectResult != MM_OK || r->type == MEDIA_TYPE_UNKNOWN) {

@@ -1,5 +1,7 @@
 #include "support/rm_builder.h"
 
+#include <string>
+
 namespace testing_support {
 
 Bytes RmChunk(const std::string& id, const Bytes& body) {
@@ -53,58 +55,33 @@ Bytes RmCont(const std::string& title, const std::string& author, const std::str
     return RmChunk("CONT", body);
 }
 
-Bytes RaHeaderV4(uint16_t sampleRate, uint16_t sampleSize, uint16_t channels, const std::string& fourcc) {
+namespace {
+
+// Bytes 0..43 of a RealAudio header: magic, version, ".raN", the header
+// version again, its size, and the fields the readers step over.
+Bytes RaPreamble(int version) {
     Bytes b;
-    b.u8(0x2E).u8(0x72).u8(0x61).u8(0xFD);
-    b.be16(4)
-        .be16(0)
-        .str(".ra4")
-        .be32(0)
-        .be16(4)
-        .be32(0x4E)
-        .be16(0)
-        .be32(0)
-        .zeros(12)  // through 35
-        .be16(1)
-        .be16(0)
-        .be16(0)
-        .be16(0)  // 36..43
-        .be16(sampleRate)
-        .be16(0)
-        .be16(sampleSize)
-        .be16(channels)  // 44..51
-        .u8(4)
-        .str("Int0")
-        .u8(static_cast<uint32_t>(fourcc.size()))
-        .str(fourcc);  // 52..
+    b.u8(0x2E).u8(0x72).u8(0x61).u8(0xFD).be16(static_cast<uint16_t>(version)).be16(0);
+    b.str(".ra" + std::to_string(version)).be32(0).be16(static_cast<uint16_t>(version)).be32(0x4E);
+    b.be16(0).be32(0).zeros(12);  // through 35
+    b.be16(1).be16(0).be16(0).be16(0);  // 36..43
+    return b;
+}
+
+}  // namespace
+
+Bytes RaHeaderV4(uint16_t sampleRate, uint16_t sampleSize, uint16_t channels, const std::string& fourcc) {
+    Bytes b = RaPreamble(4);
+    b.be16(sampleRate).be16(0).be16(sampleSize).be16(channels);  // 44..51
+    b.u8(4).str("Int0").u8(static_cast<uint32_t>(fourcc.size())).str(fourcc);  // 52..
     return b;
 }
 
 Bytes RaHeaderV5(uint16_t sampleRate, uint16_t sampleSize, uint16_t channels, const std::string& fourcc) {
-    Bytes b;
-    b.u8(0x2E).u8(0x72).u8(0x61).u8(0xFD);
-    b.be16(5)
-        .be16(0)
-        .str(".ra5")
-        .be32(0)
-        .be16(5)
-        .be32(0x4E)
-        .be16(0)
-        .be32(0)
-        .zeros(12)  // through 35
-        .be16(1)
-        .be16(0)
-        .be16(0)
-        .be16(0)  // 36..43
-        .be16(0)
-        .be16(sampleRate)
-        .be16(0)
-        .be16(0)  // 44..51
-        .be16(0)
-        .be16(sampleSize)
-        .be16(channels)  // 52..57
-        .str("Int0")
-        .str(fourcc);  // 58..65
+    Bytes b = RaPreamble(5);
+    b.be16(0).be16(sampleRate).be16(0).be16(0);  // 44..51
+    b.be16(0).be16(sampleSize).be16(channels);  // 52..57
+    b.str("Int0").str(fourcc);  // 58..65
     return b;
 }
 
