@@ -614,14 +614,6 @@ TEST(AacHuffman, EveryCodewordOfEveryBookDecodesAsItsTree) {
     }
 }
 
-TEST(AacWalker, EndElementFirstReadsNothingElse) {
-    uint32_t state;
-    const AacBitReader r = Walk({0xE0, 0xFF, 0xFF}, 4, &state);
-    EXPECT_EQ(1, metainfo::BytePosition(r));
-    EXPECT_TRUE(metainfo::AtByteStart(r));
-    EXPECT_EQ(metainfo::kWalkPlain, state);
-}
-
 // After an SCE, an LFE, or a CPE with or without a common window (then two
 // independent channel streams), and a data stream element (escaped count or
 // not, aligned or not), only fill extensions 13 and 14 set the state.
@@ -646,19 +638,6 @@ TEST(AacWalker, OnlySbrFillExtensionsSetTheState) {
             EXPECT_FALSE(r.exhausted);
         }
     }
-}
-
-TEST(AacWalker, MaxSfbAboveBandCountStopsElementAndWalkGoesOn) {
-    BitWriter w;
-    w.put(0, 3).put(0, 4).put(100, 8);  // SCE, tag, global_gain
-    w.put(0, 1).put(0, 2).put(0, 1).put(63, 6);  // long window, max_sfb 63 > 49 bands at 44.1 kHz
-    PutFill(w, 13, 1);  // read as the next element
-    PutEnd(w);
-    AacBitReader r = MakeAacBitReader(w.bytes().data(), static_cast<int>(w.bytes().size()), 0, 5);
-    EXPECT_EQ(metainfo::kWalkMaxSfb, metainfo::single_lfe_channel_element(&r, 4));
-    uint32_t state;
-    Walk(w.bytes(), 4, &state);
-    EXPECT_EQ(metainfo::kWalkSbrFound, state);
 }
 
 // A corrupt or truncated stream ends the walk at the end of the data: the
@@ -752,20 +731,47 @@ TEST(AacWalker, FfmpegStreamsWalkToEveryFrameEnd) {
 
 // Short-window TNS coefficients are read one bit shorter than long-window ones:
 // a block written that way walks to its end.
-TEST(AacWalker, ShortWindowTnsCoefficientsAreOneBitShorter) {
-    BitWriter w;
-    w.put(0, 3).put(0, 4).put(100, 8);  // SCE, tag, global_gain
-    w.put(0, 1).put(2, 2).put(0, 1).put(0, 4).put(0, 7);  // eight short windows, max_sfb 0
-    w.put(0, 1).put(1, 1);  // no pulse data, TNS present
-    w.put(1, 1).put(1, 1).put(5, 4).put(2, 3).put(0, 1).put(0, 1);  // window 0: one filter of order 2
-    w.put(5, 3).put(2, 3);  // two coefficients of 1 + 3 - 0 - 1 bits
-    for (int win = 1; win < 8; ++win) w.put(0, 1);  // no filters in the other windows
-    w.put(0, 1);  // no gain control
-    PutEnd(w);
-    uint32_t state;
-    const AacBitReader r = Walk(w.bytes(), 4, &state);
-    EXPECT_TRUE(r.shortWindowTns);
-    EXPECT_FALSE(r.exhausted);
-    EXPECT_EQ(static_cast<int>(w.bytes().size()), metainfo::BytePosition(r));
-    EXPECT_TRUE(metainfo::AtByteStart(r));
+// Hand-built blocks, each walked to where it was written to end: an END
+// first reads nothing else; a max_sfb above the band count stops the element
+// and the walk goes on reading element ids where it stopped (here a fill
+// element that announces SBR); short-window TNS coefficients are read one bit
+// shorter than written, and the flag says so.
+TEST(AacWalker, HandBuiltBlocksEndWhereTheWalkSays) {
+    BitWriter maxSfb;
+    maxSfb.put(0, 3).put(0, 4).put(100, 8);  // SCE, tag, global_gain
+    maxSfb.put(0, 1).put(0, 2).put(0, 1).put(63, 6);  // long window, max_sfb 63 > 49 bands at 44.1 kHz
+    PutFill(maxSfb, 13, 1);
+    PutEnd(maxSfb);
+    BitWriter tns;
+    tns.put(0, 3).put(0, 4).put(100, 8);  // SCE, tag, global_gain
+    tns.put(0, 1).put(2, 2).put(0, 1).put(0, 4).put(0, 7);  // eight short windows, max_sfb 0
+    tns.put(0, 1).put(1, 1);  // no pulse data, TNS present
+    tns.put(1, 1).put(1, 1).put(5, 4).put(2, 3).put(0, 1).put(0, 1);  // window 0: one filter of order 2
+    tns.put(5, 3).put(2, 3);  // two coefficients of 1 + 3 - 0 - 1 bits
+    for (int win = 1; win < 8; ++win) tns.put(0, 1);  // no filters in the other windows
+    tns.put(0, 1);  // no gain control
+    PutEnd(tns);
+    const struct {
+        const char* name;
+        Data block;
+        uint32_t state;
+        int end;
+        bool shortTns;
+    } cases[] = {
+        {"END first", {0xE0, 0xFF, 0xFF}, metainfo::kWalkPlain, 1, false},
+        {"max_sfb above the bands", maxSfb.bytes(), metainfo::kWalkSbrFound, static_cast<int>(maxSfb.bytes().size()),
+         false},
+        {"short-window TNS", tns.bytes(), metainfo::kWalkPlain, static_cast<int>(tns.bytes().size()), true},
+    };
+    for (const auto& c : cases) {
+        uint32_t state;
+        const AacBitReader r = Walk(c.block, 4, &state);
+        EXPECT_EQ(state, c.state) << c.name;
+        EXPECT_EQ(metainfo::BytePosition(r), c.end) << c.name;
+        EXPECT_TRUE(metainfo::AtByteStart(r)) << c.name;
+        EXPECT_FALSE(r.exhausted) << c.name;
+        EXPECT_EQ(r.shortWindowTns, c.shortTns) << c.name;
+    }
+    AacBitReader r = MakeAacBitReader(maxSfb.bytes().data(), static_cast<int>(maxSfb.bytes().size()), 0, 5);
+    EXPECT_EQ(metainfo::kWalkMaxSfb, metainfo::single_lfe_channel_element(&r, 4));
 }
