@@ -6,6 +6,7 @@
 #include "metainfo/extract.h"
 #include "metainfo/metainfo.h"
 #include "file_problem.h"
+#include "probe/codec_names.h"
 #include "probe_format.h"
 
 namespace probe {
@@ -47,7 +48,7 @@ int CutCommand(const std::string& file, int startSec, int endSec, const std::str
     }
     MM_AudioToFileFn cut = CutterFor(type);
     if (cut == nullptr) {
-        std::fprintf(stderr, "metainfo: %s: %s audio cannot be cut\n", path, MediaTypeName(type));
+        std::fprintf(stderr, "metainfo: %s: %s audio cannot be cut\n", path, metainfo::MediaTypeName(type));
         return 1;
     }
     result = cut(path, startSec, endSec, out.c_str());

@@ -3,7 +3,7 @@
 #include <cstdio>
 #include <cstring>
 
-#include "codec_names.h"
+#include "probe/codec_names.h"
 #include "file_problem.h"
 #include "probe_format.h"
 #include "probe_json.h"
@@ -37,7 +37,7 @@ void ProbeMaker(const std::string& path, Report* r) {
 std::string Status(int32_t result) { return result == MM_OK ? "ok" : ResultText(result); }
 
 std::string CodecText(uint32_t code) {
-    const char* name = CodecCodeName(code);
+    const char* name = metainfo::CodecCodeName(code);
     return std::string(name != nullptr ? name : "?") + " (" + ResultText(static_cast<int32_t>(code)) + ")";
 }
 
@@ -80,7 +80,10 @@ void PrintCsvRow(const std::vector<std::string>& row) {
 
 }  // namespace
 
-Report::~Report() { MM_MediaExtractor_FreeMetaInfo(&meta); }
+Report::~Report() {
+    MM_MediaExtractor_FreeMetaInfo(&meta);
+    mi_info_free(info);
+}
 
 void Probe(const std::string& path, Report* r) {
     r->path = path;
@@ -104,6 +107,7 @@ void Probe(const std::string& path, Report* r) {
     r->clipResult = MM_MediaExtractor_GetClipInfo(p, r->type, &r->clip);
     r->metaResult = MM_MediaExtractor_GetMetaInfo(p, r->type, &r->meta);
     if (r->type == MEDIA_TYPE_MP4) ProbeMaker(path, r);
+    r->infoResult = mi_probe(p, &r->info);
     // A failure (rather than "unsupported") of the clip information of a file
     // whose type was recognised means its structure breaks off or is broken.
     if (r->clipResult == MM_E_FAIL)
@@ -112,7 +116,7 @@ void Probe(const std::string& path, Report* r) {
 
 void PrintText(const Report& r) {
     std::printf("%s\n", r.path.c_str());
-    std::printf("  media type: %d (%s)\n", r.type, MediaTypeName(r.type));
+    std::printf("  media type: %d (%s)\n", r.type, metainfo::MediaTypeName(r.type));
     std::printf("  extension check: %s\n", Status(r.checkResult).c_str());
     std::printf("  track type: %s", Status(r.trackResult).c_str());
     if (r.trackResult == MM_OK) {

@@ -7,6 +7,7 @@
 #include <vector>
 
 #include "metainfo/metainfo.h"
+#include "metainfo/probe.h"
 
 namespace probe {
 
@@ -34,6 +35,8 @@ struct Report {
     std::string phoneModel;
     std::string smartAlbum;
     uint32_t thumbnailSize = 0;
+    mi_info* info = nullptr;  // the accurate answers
+    int infoResult = MI_E_NOT_MEDIA;
 
     Report() = default;
     Report(const Report&) = delete;

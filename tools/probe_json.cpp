@@ -3,7 +3,8 @@
 #include <cstdio>
 #include <ctime>
 
-#include "codec_names.h"
+#include "core/text.h"
+#include "probe/codec_names.h"
 #include "probe_format.h"
 
 namespace probe {
@@ -61,31 +62,6 @@ std::string Hex(const std::string& s) {
     return out;
 }
 
-// Text without padding: control bytes dropped, blanks trimmed at both ends.
-std::string Clean(const std::string& s) {
-    std::string out;
-    for (char c : s) {
-        const auto u = static_cast<unsigned char>(c);
-        if (u >= 0x20 && u != 0x7F) out.push_back(c);
-    }
-    const size_t first = out.find_first_not_of(' ');
-    if (first == std::string::npos) return std::string();
-    return out.substr(first, out.find_last_not_of(' ') - first + 1);
-}
-
-std::string ItemText(const _MMMetaItem& item) {
-    return item.nLength != 0 ? Clean(DecodeItemText(item)) : std::string();
-}
-
-// "3", "3/11": the number before the slash, and the one after.
-Json NumberPart(const std::string& s, bool total) {
-    const size_t slash = s.find('/');
-    const std::string part =
-        total ? (slash == std::string::npos ? std::string() : s.substr(slash + 1)) : s.substr(0, slash);
-    if (part.empty() || part.size() > 9 || part.find_first_not_of("0123456789") != std::string::npos) return nullptr;
-    return std::stoi(part);
-}
-
 Json Iso8601(int64_t unixSeconds) {
     const std::time_t t = static_cast<std::time_t>(unixSeconds);
     std::tm tm{};
@@ -95,94 +71,85 @@ Json Iso8601(int64_t unixSeconds) {
     return text;
 }
 
-// Whether the file has a stream of a kind: the clip information counts it, or
-// the codec query names its codec.
-bool HasStream(const Report& r, uint32_t count, uint32_t codec) {
-    return (r.clipResult == MM_OK && count != 0) || (r.codecResult == MM_OK && codec != 0);
+const mi_stream* FirstStream(const mi_info& info, int kind) {
+    for (size_t i = 0; i < info.stream_count; ++i) {
+        if (info.streams[i].kind == kind) return &info.streams[i];
+    }
+    return nullptr;
 }
 
-// A number of the clip information; null when that query failed or it is 0.
-Json ClipNumber(const Report& r, uint32_t v) { return r.clipResult == MM_OK ? CountOrNull(v) : Json(nullptr); }
+Json Rate(uint32_t num, uint32_t den) {
+    if (num == 0 || den == 0) return nullptr;
+    return den == 1 ? Json(num) : Json(static_cast<double>(num) / den);
+}
 
-// A name taken from the codec query's answer; null when that query failed.
-Json CodecName(const Report& r, const char* name) { return r.codecResult == MM_OK ? NameOrNull(name) : Json(nullptr); }
-
-Json AudioJson(const Report& r) {
-    const _MMClipInfo& c = r.clip;
-    if (!HasStream(r, c.bHasAudio, r.codec.nAudioCodec)) return nullptr;
-    const uint32_t bits = r.clipResult == MM_OK ? c.nBitsPerSample : 0;
+Json AudioJson(const mi_info& info) {
+    const mi_stream* s = FirstStream(info, MI_STREAM_AUDIO);
+    if (s == nullptr) return nullptr;
     Json a;
-    a["codec"] = CodecName(r, FfprobeCodecName(r.codec.nAudioCodec, bits));
-    a["profile"] = CodecName(r, FfprobeAudioProfile(r.codec.nAudioCodec, r.codec.nAudioSubType));
-    a["sample_rate"] = ClipNumber(r, c.nSampleRate);
-    // A channel configuration of 0 reads as 0xFFFFFFFF: unknown.
-    a["channels"] = ClipNumber(r, c.nChannels != 0xFFFFFFFFu ? c.nChannels : 0);
-    a["bits_per_sample"] = ClipNumber(r, c.nBitsPerSample);
-    a["bit_rate"] = ClipNumber(r, c.nAudioBitrate);
+    a["codec"] = NameOrNull(s->codec);
+    a["profile"] = NameOrNull(s->profile);
+    a["sample_rate"] = CountOrNull(s->sample_rate);
+    a["channels"] = CountOrNull(s->channels);
+    a["bits_per_sample"] = CountOrNull(s->bits_per_sample);
+    a["bit_rate"] = CountOrNull(s->bit_rate);
     return a;
 }
 
-Json VideoJson(const Report& r) {
-    const _MMClipInfo& c = r.clip;
-    if (!HasStream(r, c.bHasVideo, r.codec.nVideoCodec)) return nullptr;
+Json VideoJson(const mi_info& info) {
+    const mi_stream* s = FirstStream(info, MI_STREAM_VIDEO);
+    if (s == nullptr) return nullptr;
     Json v;
-    v["codec"] = CodecName(r, FfprobeCodecName(r.codec.nVideoCodec, 0));
-    v["profile"] = CodecName(r, VideoProfileName(r.codec.nVideoProfile));
-    v["level"] = nullptr;
-    v["width"] = ClipNumber(r, c.nWidth);
-    v["height"] = ClipNumber(r, c.nHeight);
-    v["frame_rate"] = ClipNumber(r, c.nFrameRate);
-    v["bit_rate"] = ClipNumber(r, c.nVideoBitrate);
+    v["codec"] = NameOrNull(s->codec);
+    v["profile"] = NameOrNull(s->profile);
+    v["level"] = s->level >= 0 ? Json(s->level) : Json(nullptr);
+    v["width"] = CountOrNull(s->width);
+    v["height"] = CountOrNull(s->height);
+    v["frame_rate"] = Rate(s->frame_rate_num, s->frame_rate_den);
+    v["bit_rate"] = CountOrNull(s->bit_rate);
     return v;
 }
 
-Json TagsJson(const Report& r) {
+Json TagsJson(const mi_info& info) {
     Json t;
-    const bool ok = r.metaResult == MM_OK;
-    auto item = [&](int kind) { return ok ? ItemText(r.meta.aItems[kind]) : std::string(); };
-    const std::string track = item(META_TRACKNUMBER);
-    const std::string year = item(META_YEAR);
-    t["title"] = TextOrNull(item(META_TITLE));
-    t["artist"] = TextOrNull(item(META_ARTIST));
-    t["album"] = TextOrNull(item(META_ALBUM));
-    t["album_artist"] = ok ? TextOrNull(ItemText(r.meta.stAlbumArtist)) : nullptr;
-    t["genre"] = TextOrNull(item(META_GENRE));
-    t["date"] = TextOrNull(item(META_DATE));
-    t["year"] = year.size() >= 4 ? NumberPart(year.substr(0, 4), false) : Json(nullptr);
-    t["track"] = NumberPart(track, false);
-    t["track_total"] = NumberPart(track, true);
-    t["disc"] = nullptr;
-    t["comment"] = TextOrNull(item(META_COMMENT));
-    t["composer"] = TextOrNull(item(META_COMPOSER));
+    t["title"] = NameOrNull(info.title);
+    t["artist"] = NameOrNull(info.artist);
+    t["album"] = NameOrNull(info.album);
+    t["album_artist"] = NameOrNull(info.album_artist);
+    t["genre"] = NameOrNull(info.genre);
+    t["date"] = NameOrNull(info.date);
+    t["year"] = info.year != 0 ? Json(info.year) : Json(nullptr);
+    t["track"] = CountOrNull(info.track);
+    t["track_total"] = CountOrNull(info.track_total);
+    t["disc"] = CountOrNull(info.disc);
+    t["disc_total"] = CountOrNull(info.disc_total);
+    t["comment"] = NameOrNull(info.comment);
+    t["composer"] = NameOrNull(info.composer);
+    Json other = Json::object();
+    for (size_t i = 0; i < info.tag_count; ++i) other[info.tags[i].key] = info.tags[i].value;
+    t["other"] = other;
     return t;
 }
 
-// A MIME type as stated, or from an ID3v2.2 image format ("PNG", "JPG").
-Json PictureMime(const std::string& stated) {
-    if (stated.empty()) return nullptr;
-    if (stated.find('/') != std::string::npos) return stated;
-    std::string lower;
-    for (char c : stated) lower.push_back(static_cast<char>(c >= 'A' && c <= 'Z' ? c - 'A' + 'a' : c));
-    return "image/" + (lower == "jpg" ? std::string("jpeg") : lower);
-}
-
-Json PicturesJson(const Report& r) {
+Json PicturesJson(const mi_info& info) {
     Json pictures = Json::array();
-    if (r.metaResult != MM_OK || r.meta.pPicture == nullptr) return pictures;
-    Json p;
-    p["mime"] = PictureMime(ItemText(r.meta.aItems[META_PICTURE_FORMAT]));
-    p["type"] = nullptr;
-    p["description"] = nullptr;
-    p["size"] = r.meta.nPictureSize;
-    pictures.push_back(p);
+    for (size_t i = 0; i < info.picture_count; ++i) {
+        const mi_picture& p = info.pictures[i];
+        Json j;
+        j["mime"] = NameOrNull(p.mime);
+        j["type"] = p.type >= 0 ? Json(p.type) : Json(nullptr);
+        j["description"] = NameOrNull(p.description);
+        j["size"] = p.size;
+        pictures.push_back(j);
+    }
     return pictures;
 }
 
 Json MakerJson(const Report& r) {
     if (r.makerResult != MM_OK) return nullptr;
     Json m;
-    m["phone_model"] = TextOrNull(Clean(r.phoneModel));
-    m["smart_album"] = TextOrNull(Clean(r.smartAlbum));
+    m["phone_model"] = TextOrNull(metainfo::TrimText(r.phoneModel));
+    m["smart_album"] = TextOrNull(metainfo::TrimText(r.smartAlbum));
     m["thumbnail_size"] = CountOrNull(r.thumbnailSize);
     return m;
 }
@@ -263,19 +230,22 @@ Json ReportJson(const Report& r) {
     // A name that is not UTF-8 is given losslessly too, as hexadecimal bytes.
     j["path_bytes"] = exactName ? Json(nullptr) : Json(Hex(r.path));
     const bool probed = r.probed;
+    const mi_info* info = r.info;
     j["size"] = r.size != 0 || r.problem == "empty" ? Json(r.size) : Json(nullptr);
-    j["format"] = probed ? NameOrNull(MediaTypeName(r.type)) : nullptr;
-    j["mime"] = probed ? TextOrNull(r.mime) : nullptr;
+    j["format"] = info != nullptr ? NameOrNull(info->format) : nullptr;
+    j["mime"] = info != nullptr ? NameOrNull(info->mime) : nullptr;
+    j["duration"] = info != nullptr && info->duration_ms > 0 ? Json(static_cast<double>(info->duration_ms) / 1000.0)
+                                                             : Json(nullptr);
+    j["duration_exact"] = info != nullptr && info->duration_ms > 0 ? Json(info->duration_exact != 0) : Json(nullptr);
+    j["bit_rate"] = info != nullptr ? CountOrNull(info->bit_rate) : nullptr;
     const bool clip = probed && r.clipResult == MM_OK;
-    j["duration"] = clip && r.clip.nDuration != 0 ? Json(r.clip.nDuration / 1000.0) : Json(nullptr);
-    j["bit_rate"] = clip ? CountOrNull(r.clip.nBitrate) : nullptr;
     j["creation_time"] = clip && r.type == MEDIA_TYPE_MP4 && r.clip.nReserved1 != 0
                              ? Iso8601(static_cast<int64_t>(r.clip.nReserved1) - kMp4EpochOffset)
                              : Json(nullptr);
-    j["audio"] = probed ? AudioJson(r) : nullptr;
-    j["video"] = probed ? VideoJson(r) : nullptr;
-    j["tags"] = probed ? TagsJson(r) : nullptr;
-    j["pictures"] = probed ? PicturesJson(r) : Json::array();
+    j["audio"] = info != nullptr ? AudioJson(*info) : nullptr;
+    j["video"] = info != nullptr ? VideoJson(*info) : nullptr;
+    j["tags"] = info != nullptr ? TagsJson(*info) : nullptr;
+    j["pictures"] = info != nullptr ? PicturesJson(*info) : Json::array();
     j["maker"] = probed ? MakerJson(r) : nullptr;
     j["error"] = TextOrNull(r.problem);
     j["exact"] = ExactJson(r);
@@ -289,6 +259,7 @@ std::vector<std::string> CsvColumns() {
             "format",
             "mime",
             "duration",
+            "duration_exact",
             "bit_rate",
             "creation_time",
             "audio.codec",
@@ -314,6 +285,7 @@ std::vector<std::string> CsvColumns() {
             "tags.track",
             "tags.track_total",
             "tags.disc",
+            "tags.disc_total",
             "tags.comment",
             "tags.composer",
             "pictures",

@@ -1,12 +1,13 @@
-// The key set of `metainfo probe --json` and `--csv`, filled from the C
-// interface's answers:
+// The key set of `metainfo probe --json` and `--csv`, filled from the
+// accurate interface (mi_probe) with the MM_ interface's answers under exact:
 //
 //   path (path_bytes, hex, when the name is not UTF-8), size, format, mime,
-//   duration (s), bit_rate, creation_time (ISO 8601), audio{codec, profile,
-//   sample_rate, channels, bits_per_sample, bit_rate}, video{codec, profile,
-//   level, width, height, frame_rate, bit_rate}, tags{title, artist, album,
-//   album_artist, genre, date, year, track, track_total, disc, comment,
-//   composer}, pictures[{mime, type, description, size}], maker, error,
+//   duration (s), duration_exact, bit_rate, creation_time (ISO 8601),
+//   audio{codec, profile, sample_rate, channels, bits_per_sample, bit_rate},
+//   video{codec, profile, level, width, height, frame_rate, bit_rate},
+//   tags{title, artist, album, album_artist, genre, date, year, track,
+//   track_total, disc, disc_total, comment, composer, other{key: value}},
+//   pictures[{mime, type, description, size}], maker, error,
 //   exact (the C interface's answers unchanged).
 //
 // Unknown values are null; texts are UTF-8 without padding or control bytes.

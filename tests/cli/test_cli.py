@@ -124,10 +124,10 @@ def test_names_from_stdin_and_not_utf8(files):
     assert lines[0]["path_bytes"] is None
 
 
-KEYS = ["path", "path_bytes", "size", "format", "mime", "duration", "bit_rate", "creation_time", "audio",
+KEYS = ["path", "path_bytes", "size", "format", "mime", "duration", "duration_exact", "bit_rate", "creation_time", "audio",
         "video", "tags", "pictures", "maker", "error", "exact"]
 TAGS = ["title", "artist", "album", "album_artist", "genre", "date", "year", "track", "track_total", "disc",
-        "comment", "composer"]
+        "disc_total", "comment", "composer", "other"]
 
 
 def folders():
@@ -149,9 +149,11 @@ def check_types(line):
     for part in ("audio", "video"):
         if line[part] is not None:
             for k, v in line[part].items():
-                assert v is None or isinstance(v, (int, str)), (k, v)
+                assert v is None or isinstance(v, (int, float, str)), (k, v)
                 assert v != 0 and v != "", (part, k)
-    for k, v in (line["tags"] or {}).items():
+    tags = dict(line["tags"] or {})
+    assert all(isinstance(v, str) and v for v in tags.pop("other", {}).values())
+    for k, v in tags.items():
         assert v is None or (isinstance(v, (int, str)) and v != "" and v == (v.strip() if isinstance(v, str) else v))
         if isinstance(v, str):
             assert not any(ord(c) < 0x20 for c in v), (k, v)

@@ -1,11 +1,16 @@
-#include "codec_names.h"
+#include "probe/codec_names.h"
 
 #include <cstring>
 
 #include "metainfo/metainfo.h"
 
-namespace probe {
+namespace metainfo {
 namespace {
+
+const char* const kMediaTypeNames[MM_MEDIA_SLOTS] = {
+    "none", "mp3",    "realmedia", "mp4", "asf", "midi", "aac",    "wav",
+    "amr",  "amr-wb", "imelody",   "avi", "qcp", "evrc", "unused", "snd",
+};
 
 struct Row {
     const char* code;
@@ -82,6 +87,11 @@ bool Is(uint32_t code, const char* name) {
 
 }  // namespace
 
+const char* MediaTypeName(int type) {
+    if (type >= 0 && type < MM_MEDIA_SLOTS) return kMediaTypeNames[type];
+    return "unknown";
+}
+
 const char* CodecCodeName(uint32_t code) {
     if (code == 0) return nullptr;
     for (const MM_CodecName& row : codecinfo) {
@@ -122,4 +132,4 @@ const char* VideoProfileName(uint32_t code) {
     return nullptr;
 }
 
-}  // namespace probe
+}  // namespace metainfo

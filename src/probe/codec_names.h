@@ -1,10 +1,13 @@
 // The library's codec codes in the vocabulary of ffprobe's codec_name and
-// profile, for the command line's key set.
+// profile, for the accurate answers.
 #pragma once
 
 #include <cstdint>
 
-namespace probe {
+namespace metainfo {
+
+// Short name of a media type code ("mp3", "mp4", ... "unknown").
+const char* MediaTypeName(int type);
 
 // The library's own name of a code ("CODEC_MP3_LAYER3"), or nullptr.
 const char* CodecCodeName(uint32_t code);
@@ -21,4 +24,4 @@ const char* FfprobeAudioProfile(uint32_t codec, uint32_t subtype);
 // The profile name of a video profile code ("Simple", "Main", ...), or nullptr.
 const char* VideoProfileName(uint32_t code);
 
-}  // namespace probe
+}  // namespace metainfo

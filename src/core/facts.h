@@ -1,0 +1,65 @@
+// What a file says about itself, unrounded: each format's reader fills one
+// of these, and the accurate interface hands it out as it stands. Texts are
+// UTF-8.
+#pragma once
+
+#include <cstdint>
+#include <string>
+#include <utility>
+#include <vector>
+
+namespace metainfo {
+
+struct StreamFacts {
+    enum Kind : uint8_t { kAudio = 1, kVideo = 2 };
+    Kind kind = kAudio;
+    std::string codec;  // ffprobe codec_name; empty when unknown
+    std::string profile;  // ffprobe profile name; empty when unknown
+    int32_t level = -1;
+    uint32_t sampleRate = 0;
+    uint32_t channels = 0;
+    uint32_t bitsPerSample = 0;
+    uint32_t width = 0;
+    uint32_t height = 0;
+    uint32_t frameRateNum = 0;
+    uint32_t frameRateDen = 0;
+    uint64_t bitRate = 0;
+};
+
+struct PictureFacts {
+    std::string mime;
+    int32_t type = -1;  // ID3 picture type; -1 unknown
+    std::string description;
+    uint64_t size = 0;
+    uint64_t offset = 0;
+    bool unsynchronised = false;  // stored with ID3 unsynchronisation: storedSize bytes at offset
+    uint64_t storedSize = 0;
+    bool viaContract = false;  // no offset known: its bytes come through the MM_ meta query
+};
+
+struct TagFacts {
+    std::string title, artist, album, albumArtist, genre, date, comment, composer;
+    int32_t year = 0;
+    uint32_t track = 0, trackTotal = 0, disc = 0, discTotal = 0;
+    std::vector<std::pair<std::string, std::string>> extra;  // key as the file names it, value
+};
+
+struct MediaFacts {
+    std::string format;
+    std::string mime;
+    int64_t durationUs = -1;  // -1 unknown
+    bool durationExact = false;
+    uint64_t bitRate = 0;
+    std::vector<StreamFacts> streams;
+    TagFacts tags;
+    std::vector<PictureFacts> pictures;
+
+    StreamFacts* FirstStream(StreamFacts::Kind kind) {
+        for (StreamFacts& s : streams) {
+            if (s.kind == kind) return &s;
+        }
+        return nullptr;
+    }
+};
+
+}  // namespace metainfo

@@ -1,0 +1,27 @@
+// Where the device contract's answers and a file's truth part ways, the shared
+// parser asks one of these switches. The MM_ interface passes kContract, the
+// accurate interface kAccurate; docs/accurate.md lists each switch, what
+// either side answers and why.
+#pragma once
+
+namespace metainfo {
+
+struct Quirks {
+    // ID3v2.3 frames are only read when the tag ends in padding (LAME writes
+    // a cover-carrying v2.3 tag without any).
+    bool id3NeedsPadding;
+    // TYER/TDRC keep their text-encoding byte in the year.
+    bool id3YearKeepsEncodingByte;
+    // UTF-16 text without a byte-order mark (encoding 2, UTF-16BE) is empty.
+    bool id3Utf16BeEmpty;
+    // Bytes between ADTS frames that are not a frame (an ID3 tag) end the
+    // stream, so a file that starts with them is of no known type.
+    bool adtsStopsAtForeignBytes;
+    // An AAC-LC stream at 88.2 kHz or more reads as SBR at twice the rate.
+    bool aacHighRateIsSbr;
+};
+
+inline constexpr Quirks kContract{true, true, true, true, true};
+inline constexpr Quirks kAccurate{false, false, false, false, false};
+
+}  // namespace metainfo

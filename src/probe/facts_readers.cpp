@@ -1,0 +1,28 @@
+#include "probe/facts_readers.h"
+
+#include "metainfo/metainfo.h"
+#include "probe/contract_facts.h"
+
+namespace metainfo {
+namespace {
+
+using FactsReader = int32_t (*)(const char* path, int type, MediaFacts* facts);
+
+// A null row reads the MM_ answers.
+const FactsReader kFactsReaders[MM_MEDIA_SLOTS] = {};
+
+}  // namespace
+
+int AccurateMediaType(const char* path) {
+    int type = MEDIA_TYPE_UNKNOWN;
+    if (MM_MediaExtractor_DetectMediaType(path, &type) != MM_OK) return MEDIA_TYPE_UNKNOWN;
+    return type;
+}
+
+int32_t ReadFacts(const char* path, int type, MediaFacts* facts) {
+    if (type <= 0 || type >= MM_MEDIA_SLOTS) return MM_E_UNSUPPORTED;
+    const FactsReader reader = kFactsReaders[type];
+    return reader != nullptr ? reader(path, type, facts) : ContractFacts(path, type, facts);
+}
+
+}  // namespace metainfo
