@@ -90,8 +90,11 @@ void Probe(const std::string& path, Report* r) {
     r->problem = FileProblem(path, &r->size);
     if (!r->problem.empty()) return;
     const char* p = path.c_str();
+    r->infoResult = mi_probe(p, &r->info);
     r->detectResult = MM_MediaExtractor_DetectMediaType(p, &r->type);
     if (r->detectResult != MM_OK || r->type == MEDIA_TYPE_UNKNOWN) {
+        // A type only the accurate interface reads (RF64) is still probed.
+        if (r->infoResult == MI_OK) return;
         r->problem =
             "not a media file (" + (r->detectResult != MM_OK ? ResultText(r->detectResult) : "no known type") + ")";
         return;
@@ -107,7 +110,6 @@ void Probe(const std::string& path, Report* r) {
     r->clipResult = MM_MediaExtractor_GetClipInfo(p, r->type, &r->clip);
     r->metaResult = MM_MediaExtractor_GetMetaInfo(p, r->type, &r->meta);
     if (r->type == MEDIA_TYPE_MP4) ProbeMaker(path, r);
-    r->infoResult = mi_probe(p, &r->info);
     // A failure (rather than "unsupported") of the clip information of a file
     // whose type was recognised means its structure breaks off or is broken.
     if (r->clipResult == MM_E_FAIL)

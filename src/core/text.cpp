@@ -117,6 +117,17 @@ std::string Utf8ToUtf8(const uint8_t* p, size_t n) {
     return out;
 }
 
+std::string Utf8OrLatin1(const uint8_t* p, size_t n) {
+    size_t i = 0;
+    uint32_t cp = 0;
+    while (i < n && p[i] != 0) {
+        const size_t len = Utf8SequenceLength(p + i, n - i, &cp);
+        if (len == 0) return Latin1ToUtf8(p, n);
+        i += len;
+    }
+    return Utf8ToUtf8(p, n);
+}
+
 std::string TrimText(const std::string& s) {
     std::string out;
     for (char c : s) {

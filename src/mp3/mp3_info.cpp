@@ -51,13 +51,6 @@ uint32_t AudioBytes(uint32_t fileSize, uint32_t firstFrameOffset, uint32_t tagBy
     return fileSize - firstFrameOffset - tagBytes;  // 32-bit, as reported
 }
 
-// Distance of the Xing tag from the frame start: after the header and the side information.
-uint32_t XingDistance(const _FrameHeader_Info& header) {
-    const bool mono = header.channelMode == 3;
-    if (header.versionId == 3) return mono ? 21 : 36;
-    return mono ? 13 : 21;
-}
-
 uint32_t TrailingTagBytes(int h) {
     if (MEx_fseek(h, -static_cast<int64_t>(kV1TagSize), SEEK_END) != 0) return 0;
     uint8_t tag[3];
@@ -99,6 +92,12 @@ int32_t FillCodecType(_MM_CODECTYPE* codec, const _FrameHeader_Info& header) {
 }
 
 }  // namespace
+
+uint32_t XingDistance(const _FrameHeader_Info& header) {
+    const bool mono = header.channelMode == 3;
+    if (header.versionId == 3) return mono ? 21 : 36;
+    return mono ? 13 : 21;
+}
 
 int32_t GetAvBitrate(int h, uint32_t start, int /*unused*/) {
     if (MEx_fseek(h, static_cast<int64_t>(start), SEEK_SET) != 0) return 0;

@@ -35,6 +35,10 @@ struct _MP3AudioInfo {
 constexpr int kXingFramesOnly = 2;  // ParseXingHeader mode: frame count, no record
 constexpr int kXingWholeRecord = 1;
 
+// Distance of the Xing tag from the frame start: after the header and the
+// side information.
+uint32_t XingDistance(const _FrameHeader_Info& header);
+
 // Sampled average bit rate (bit/s) of the frames in the 4096 bytes at start;
 // 0 when no frame decodes there.
 int32_t GetAvBitrate(int h, uint32_t start, int unused);

@@ -1,28 +1,71 @@
 #include "probe/facts_readers.h"
 
+#include "core/file_access.h"
 #include "metainfo/metainfo.h"
+#include "mp3/mp3_stream_facts.h"
 #include "probe/contract_facts.h"
+#include "speech/wave_facts.h"
 
 namespace metainfo {
 namespace {
 
 using FactsReader = int32_t (*)(const char* path, int type, MediaFacts* facts);
 
+int32_t ReadWave(const char* path, int /*type*/, MediaFacts* facts) { return WaveFacts(path, facts); }
+int32_t ReadMp3(const char* path, int /*type*/, MediaFacts* facts) { return Mp3StreamFacts(path, facts); }
+
 // A null row reads the MM_ answers.
-const FactsReader kFactsReaders[MM_MEDIA_SLOTS] = {};
+const FactsReader kFactsReaders[MM_MEDIA_SLOTS] = {
+    /* 0 */ nullptr,
+    /* 1 MP3 */ ReadMp3,
+    /* 2 RealMedia */ nullptr,
+    /* 3 MP4 */ nullptr,
+    /* 4 ASF */ nullptr,
+    /* 5 MIDI */ nullptr,
+    /* 6 AAC */ nullptr,
+    /* 7 WAVE */ ReadWave,
+    /* 8 AMR-NB */ nullptr,
+    /* 9 AMR-WB */ nullptr,
+    /* 10 */ nullptr,
+    /* 11 AVI */ nullptr,
+    /* 12 QCP */ nullptr,
+    /* 13 EVRC */ nullptr,
+    /* 14 */ nullptr,
+    /* 15 */ nullptr,
+};
+
+constexpr size_t kHeadBytes = 128;
+
+// The first bytes of a file, for the types the MM_ detection turns away.
+size_t ReadHead(const char* path, uint8_t* head) {
+    const int h = MEx_fopen(path, "rb");
+    if (h == 0) return 0;
+    FileCloser closer(h);
+    const int got = MEx_fread(head, 1, kHeadBytes, h);
+    return got > 0 ? static_cast<size_t>(got) : 0;
+}
 
 }  // namespace
 
 int AccurateMediaType(const char* path) {
     int type = MEDIA_TYPE_UNKNOWN;
-    if (MM_MediaExtractor_DetectMediaType(path, &type) != MM_OK) return MEDIA_TYPE_UNKNOWN;
-    return type;
+    if (MM_MediaExtractor_DetectMediaType(path, &type) == MM_OK && type != MEDIA_TYPE_UNKNOWN) return type;
+    uint8_t head[kHeadBytes];
+    const size_t n = ReadHead(path, head);
+    if (IsRf64Wave(head, n)) return MEDIA_TYPE_WAVE;
+    return MEDIA_TYPE_UNKNOWN;
 }
 
 int32_t ReadFacts(const char* path, int type, MediaFacts* facts) {
     if (type <= 0 || type >= MM_MEDIA_SLOTS) return MM_E_UNSUPPORTED;
     const FactsReader reader = kFactsReaders[type];
-    return reader != nullptr ? reader(path, type, facts) : ContractFacts(path, type, facts);
+    if (reader != nullptr) {
+        const int32_t read = reader(path, type, facts);
+        if (read == MM_OK || read == MM_E_OUTOFMEMORY) return read;
+        // A file its reader turns away gets what the MM_ answers make of it.
+        *facts = MediaFacts();
+    }
+    return ContractFacts(path, type, facts);
 }
 
 }  // namespace metainfo
