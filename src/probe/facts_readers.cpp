@@ -12,7 +12,16 @@ namespace {
 using FactsReader = int32_t (*)(const char* path, int type, MediaFacts* facts);
 
 int32_t ReadWave(const char* path, int /*type*/, MediaFacts* facts) { return WaveFacts(path, facts); }
-int32_t ReadMp3(const char* path, int /*type*/, MediaFacts* facts) { return Mp3StreamFacts(path, facts); }
+int32_t ReadMp3(const char* path, int type, MediaFacts* facts) {
+    const int32_t read = Mp3StreamFacts(path, facts);
+    if (read != MM_OK) return read;
+    MediaFacts contract;
+    if (ContractFacts(path, type, &contract) == MM_OK) {
+        facts->tags = contract.tags;
+        facts->pictures = contract.pictures;
+    }
+    return MM_OK;
+}
 
 // A null row reads the MM_ answers.
 const FactsReader kFactsReaders[MM_MEDIA_SLOTS] = {
