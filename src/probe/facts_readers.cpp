@@ -1,6 +1,8 @@
 #include "probe/facts_readers.h"
 
+#include "aac/aac_facts.h"
 #include "core/file_access.h"
+#include "core/quirks.h"
 #include "metainfo/metainfo.h"
 #include "mp3/mp3_stream_facts.h"
 #include "probe/contract_facts.h"
@@ -12,6 +14,17 @@ namespace {
 using FactsReader = int32_t (*)(const char* path, int type, MediaFacts* facts);
 
 int32_t ReadWave(const char* path, int /*type*/, MediaFacts* facts) { return WaveFacts(path, facts); }
+int32_t ReadAac(const char* path, int type, MediaFacts* facts) {
+    const int32_t read = AacFacts(path, kAccurate, facts);
+    if (read != MM_OK) return read;
+    MediaFacts contract;
+    if (ContractFacts(path, type, &contract) == MM_OK) {
+        facts->tags = contract.tags;
+        facts->pictures = contract.pictures;
+    }
+    return MM_OK;
+}
+
 int32_t ReadMp3(const char* path, int type, MediaFacts* facts) {
     const int32_t read = Mp3StreamFacts(path, facts);
     if (read != MM_OK) return read;
@@ -31,7 +44,7 @@ const FactsReader kFactsReaders[MM_MEDIA_SLOTS] = {
     /* 3 MP4 */ nullptr,
     /* 4 ASF */ nullptr,
     /* 5 MIDI */ nullptr,
-    /* 6 AAC */ nullptr,
+    /* 6 AAC */ ReadAac,
     /* 7 WAVE */ ReadWave,
     /* 8 AMR-NB */ nullptr,
     /* 9 AMR-WB */ nullptr,
@@ -62,6 +75,7 @@ int AccurateMediaType(const char* path) {
     uint8_t head[kHeadBytes];
     const size_t n = ReadHead(path, head);
     if (IsRf64Wave(head, n)) return MEDIA_TYPE_WAVE;
+    if (LooksLikeAdts(path)) return MEDIA_TYPE_AAC;
     return MEDIA_TYPE_UNKNOWN;
 }
 
