@@ -3,6 +3,7 @@
 
 #include <cstdint>
 
+#include "core/facts.h"
 #include "metainfo/records.h"
 
 namespace metainfo {
@@ -13,5 +14,8 @@ int32_t AVI_GetTrackType(const char* path, int* bits);
 // codec table, so the public codec query answers "unsupported".
 int32_t AVI_GetCodecType(const char* path, _MM_CODECTYPE* codec);
 int32_t AVI_GetMIMEType(const char* path, _MM_MIMETYPE* mime);
+
+// The accurate facts: codecs, sizes, rates and the longest stream's duration.
+int32_t AviFacts(const char* path, MediaFacts* facts);
 
 }  // namespace metainfo

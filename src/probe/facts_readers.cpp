@@ -1,11 +1,13 @@
 #include "probe/facts_readers.h"
 
 #include "aac/aac_facts.h"
+#include "avi/avi_queries.h"
 #include "core/file_access.h"
 #include "core/quirks.h"
 #include "metainfo/metainfo.h"
 #include "mp3/mp3_stream_facts.h"
 #include "probe/contract_facts.h"
+#include "speech/amr.h"
 #include "speech/wave_facts.h"
 
 namespace metainfo {
@@ -24,6 +26,10 @@ int32_t ReadAac(const char* path, int type, MediaFacts* facts) {
     }
     return MM_OK;
 }
+
+int32_t ReadAmr(const char* path, int /*type*/, MediaFacts* facts) { return AmrFacts(path, facts); }
+
+int32_t ReadAvi(const char* path, int /*type*/, MediaFacts* facts) { return AviFacts(path, facts); }
 
 int32_t ReadMp3(const char* path, int type, MediaFacts* facts) {
     const int32_t read = Mp3StreamFacts(path, facts);
@@ -46,10 +52,10 @@ const FactsReader kFactsReaders[MM_MEDIA_SLOTS] = {
     /* 5 MIDI */ nullptr,
     /* 6 AAC */ ReadAac,
     /* 7 WAVE */ ReadWave,
-    /* 8 AMR-NB */ nullptr,
-    /* 9 AMR-WB */ nullptr,
+    /* 8 AMR-NB */ ReadAmr,
+    /* 9 AMR-WB */ ReadAmr,
     /* 10 */ nullptr,
-    /* 11 AVI */ nullptr,
+    /* 11 AVI */ ReadAvi,
     /* 12 QCP */ nullptr,
     /* 13 EVRC */ nullptr,
     /* 14 */ nullptr,

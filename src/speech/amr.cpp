@@ -281,3 +281,94 @@ extern "C" int32_t AMR_GetAudioData2File(const char* path, int startSec, int end
     int size = 0;
     return metainfo::GetAudioData_AMR(path, startSec, endSec, &target, &size, metainfo::kAmrToFile);
 }
+
+namespace metainfo {
+namespace {
+
+constexpr uint64_t kAmrCountLimit = 16 * 1024 * 1024;  // frames counted; past it the rest is estimated
+
+// Frames (blocks of every channel's frame) from the first frame to the end,
+// read in chunks; a block cut off by the end of the file does not count.
+struct AmrCount {
+    uint64_t blocks = 0, bytes = 0;
+    bool stopped = false;  // at the count limit
+};
+
+uint64_t BlockSize(const uint8_t* p, size_t n, int kind, uint32_t channels) {
+    if (!IsMultiChannel(kind)) return FrameSizeOf(kind, FrameTypeOf(p[0]));
+    uint64_t block = 0;
+    for (uint32_t ch = 0; ch < channels; ++ch) {
+        if (block + 4 >= n) return 0;
+        const uint32_t frame = FrameSizeOf(kind, FrameTypeOf(p[block + 4]));
+        if (frame == 0) return 0;
+        block += frame;
+    }
+    return block;
+}
+
+AmrCount CountBlocks(int h, uint64_t start, uint64_t fileSize, int kind, uint32_t channels) {
+    AmrCount c;
+    std::unique_ptr<uint8_t[]> chunk(new uint8_t[kAmrProbeBytes]);
+    uint64_t at = start;
+    while (at < fileSize) {
+        if (at - start >= kAmrCountLimit) {
+            c.stopped = true;
+            break;
+        }
+        if (!SeekToOffset(h, at)) break;
+        const int got = MEx_fread(chunk.get(), 1, kAmrProbeBytes, h);
+        if (got <= 0) break;
+        const auto n = static_cast<size_t>(got);
+        size_t i = 0;
+        // Stop a chunk early enough that a block never straddles it unseen.
+        while (i < n) {
+            const uint64_t block = BlockSize(chunk.get() + i, n - i, kind, channels);
+            if (block == 0 || (i + block > n && at + n < fileSize)) break;
+            if (at + i + block > fileSize) break;
+            ++c.blocks;
+            c.bytes += block;
+            i += static_cast<size_t>(block);
+        }
+        if (i == 0) break;
+        at += i;
+    }
+    return c;
+}
+
+}  // namespace
+
+int32_t AmrFacts(const char* path, MediaFacts* f) {
+    const int h = MEx_fopen(path, "rb");
+    if (h == 0) return MM_E_FAIL;
+    FileCloser closer(h);
+    uint8_t head[32];
+    uint64_t fileSize = 0;
+    const int got = MEx_fread(head, 1, sizeof head, h);
+    _AMR_FrameInfo frame;
+    if (got < 16 || ParseAmrHead(head, static_cast<size_t>(got), &frame) != MM_OK ||
+        !OpenedFileSize(h, path, &fileSize))
+        return MM_E_FAIL;
+    const bool wide = IsWideBand(frame.nFileType);
+    const uint64_t start = kAmrKinds[frame.nFileType].firstFrame;
+    const AmrCount count = CountBlocks(h, start, fileSize, frame.nFileType, frame.nChannels);
+    if (count.blocks == 0) return MM_E_FAIL;
+    uint64_t blocks = count.blocks;
+    if (count.stopped) blocks = blocks * (fileSize - start) / count.bytes;
+
+    f->format = wide ? "amr-wb" : "amr";
+    f->mime = wide ? "audio/AMR-WB" : "audio/AMR";
+    f->durationUs = static_cast<int64_t>(blocks * 20000);  // 20 ms a frame
+    f->durationExact = !count.stopped;
+    StreamFacts s;
+    s.codec = wide ? "amr_wb" : "amr_nb";
+    s.sampleRate = wide ? 16000 : 8000;
+    s.channels = frame.nChannels;
+    // Speech bits only, as ffprobe counts them: each frame's header byte left out.
+    const uint64_t headers = count.blocks * frame.nChannels;
+    s.bitRate = count.bytes > headers ? (count.bytes - headers) * 8 * 50 / count.blocks : 0;
+    f->bitRate = s.bitRate;
+    f->streams.push_back(s);
+    return MM_OK;
+}
+
+}  // namespace metainfo

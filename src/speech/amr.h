@@ -6,6 +6,7 @@
 #include <cstddef>
 #include <cstdint>
 
+#include "core/facts.h"
 #include "metainfo/records.h"
 
 namespace metainfo {
@@ -56,6 +57,9 @@ int32_t AMR_GetClipInfo(const char* path, _MMClipInfo* clip);
 int32_t AMR_GetMIMEType(const char* path, _MM_MIMETYPE* mime);
 int32_t AMR_GetCodecType(const char* path, _MM_CODECTYPE* codec);
 int32_t AMR_GetTrackType(const char* path, int* mask);
+
+// The accurate facts: every frame counted (estimated past 16 MiB).
+int32_t AmrFacts(const char* path, MediaFacts* facts);
 int32_t AMR_GetAudioData2Buf(const char* path, int startSec, int endSec, unsigned char** data, int* size);
 
 }  // namespace metainfo
