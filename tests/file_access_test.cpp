@@ -223,7 +223,8 @@ TEST(PlainFile, PathsOfFourCharactersOrFewerNeverOpen) {
     ASSERT_EQ(chdir(cwd), 0);
 }
 
-TEST(BadHandle, EveryCallAnswersMinusOneAndCloseAnswersZero) {
+// Every call on a bad handle answers -1 (close 0); a closed handle is refused even after its slot is reused.
+TEST(BadHandle, EveryCallAnswersMinusOneAndAClosedHandleIsRefused) {
     char buf[4];
     for (int h : {0, -5, 1, 0x7FFFFFFF}) {
         EXPECT_EQ(MEx_fread(buf, 1, 4, h), -1);
@@ -233,9 +234,6 @@ TEST(BadHandle, EveryCallAnswersMinusOneAndCloseAnswersZero) {
         EXPECT_EQ(MEx_feof(h), -1);
         EXPECT_EQ(MEx_fclose(h), 0);
     }
-}
-
-TEST(BadHandle, AClosedHandleIsRefusedEvenAfterItsSlotIsReused) {
     TempDir dir;
     std::string path = dir.Write("a.bin", Bytes().str("abcd"));
     int first = MEx_fopen(path.c_str(), "rb");
@@ -243,7 +241,6 @@ TEST(BadHandle, AClosedHandleIsRefusedEvenAfterItsSlotIsReused) {
     MEx_fclose(first);
     std::vector<int> open;
     for (int i = 0; i < 64; ++i) open.push_back(MEx_fopen(path.c_str(), "rb"));
-    char buf[4];
     EXPECT_EQ(MEx_fread(buf, 1, 4, first), -1);
     for (int h : open) {
         EXPECT_NE(h, first);
@@ -263,37 +260,33 @@ TEST(GetUINT32, ReadsBothByteOrdersAndZeroFillsAShortRead) {
     MEx_fclose(h);
 }
 
+// The last dot before a content id suffix, cut to eight characters, case kept; a dot in
+// a directory counts; only the first 4095 characters of a path are looked at.
 TEST(GetFileExtension, TakesTheLastDotBeforeAContentIdSuffix) {
-    int r = -1;
-    EXPECT_EQ(Extension("/a/b.music.mp3?cid=x.y", &r), ".mp3");
-    EXPECT_EQ(r, 0);
-    EXPECT_EQ(Extension("/a/b", &r), "");
-    EXPECT_EQ(r, 1);
-    EXPECT_EQ(Extension("/x/song.abcdefghijk", &r), ".abcdefgh");
-    EXPECT_EQ(Extension("/dir.d/file", &r), ".d/file") << "a dot in a directory counts";
-    EXPECT_EQ(Extension("/x/Song.MP3", &r), ".MP3") << "case is kept";
+    const struct {
+        std::string path, ext;
+        int result;
+    } cases[] = {{"/a/b.music.mp3?cid=x.y", ".mp3", 0},
+                 {"/a/b", "", 1},
+                 {"/x/song.abcdefghijk", ".abcdefgh", 0},
+                 {"/dir.d/file", ".d/file", 0},
+                 {"/x/Song.MP3", ".MP3", 0},
+                 {std::string(6000, 'a') + ".mp3", "", 1},
+                 {std::string(100, 'b') + ".wav", ".wav", 0}};
+    for (const auto& c : cases) {
+        int r = -1;
+        EXPECT_EQ(Extension(c.path.c_str(), &r), c.ext) << c.path.size();
+        EXPECT_EQ(r, c.result) << c.path.size();
+    }
 }
 
-TEST(GetFileExtension, AVeryLongPathIsCutNotOverrun) {
-    std::string path(6000, 'a');
-    path += ".mp3";
-    int r = -1;
-    EXPECT_EQ(Extension(path.c_str(), &r), "");
-    EXPECT_EQ(r, 1) << "only the first 4095 characters are looked at";
-    std::string shorter(100, 'b');
-    shorter += ".wav";
-    EXPECT_EQ(Extension(shorter.c_str(), &r), ".wav");
-}
-
+// Only the protected suffixes, case-sensitive, ask the service; no metadata means protected.
 TEST_F(Protected, CheckDRMDecidesByCaseSensitiveSuffixAndServiceAnswer) {
-    EXPECT_EQ(CheckDRM("a.fl"), -1);
-    EXPECT_EQ(CheckDRM("music.DCF"), 0);
-    EXPECT_EQ(CheckDRM("/x/song.mp3"), 0);
-    EXPECT_EQ(CheckDRM("/x/unknown.dcf"), 1) << "no metadata: treated as protected";
     service.metadata["/x/plain.dcf"] = {{"drmtype", "0"}};
-    EXPECT_EQ(CheckDRM("/x/plain.dcf"), 0);
     service.metadata["/x/typed.fl"] = {{"drmtype", "1a"}};
-    EXPECT_EQ(CheckDRM("/x/typed.fl"), 26);
+    const std::pair<const char*, int> cases[] = {{"a.fl", -1},          {"music.DCF", 0},    {"/x/song.mp3", 0},
+                                                 {"/x/unknown.dcf", 1}, {"/x/plain.dcf", 0}, {"/x/typed.fl", 26}};
+    for (const auto& c : cases) EXPECT_EQ(CheckDRM(c.first), c.second) << c.first;
 }
 
 TEST_F(Protected, MetadataKeysAreExactHexParsedCutAndLastWins) {

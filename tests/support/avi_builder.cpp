@@ -20,71 +20,28 @@ Bytes RiffList(const std::string& type, const std::vector<Bytes>& children, cons
 
 static Bytes AviMainHeader(const AviMainFields& s) {
     Bytes body;
-    body.le32(s.microSecPerFrame)
-        .le32(0)
-        .le32(0)
-        .le32(s.flags)
-        .le32(s.totalFrames)
-        .le32(0)
-        .le32(s.streams)
-        .le32(0)
-        .le32(s.width)
-        .le32(s.height)
-        .zeros(16);
-    return RiffChunk("avih", body);
+    body.le32(s.microSecPerFrame).le32(0).le32(0).le32(s.flags).le32(s.totalFrames).le32(0).le32(s.streams);
+    return RiffChunk("avih", body.le32(0).le32(s.width).le32(s.height).zeros(16));
 }
 
 static Bytes AviStreamHeader(const AviStreamFields& s) {
     Bytes body;
-    body.str(s.type)
-        .str(s.handler)
-        .le32(0)
-        .le32(0)
-        .le32(0)
-        .le32(s.scale)
-        .le32(s.rate)
-        .le32(0)
-        .le32(s.length)
-        .le32(0)
-        .le32(0xFFFFFFFF)
-        .le32(s.sampleSize)
-        .zeros(8);
-    return RiffChunk("strh", body);
+    body.str(s.type).str(s.handler).le32(0).le32(0).le32(0).le32(s.scale).le32(s.rate).le32(0).le32(s.length);
+    return RiffChunk("strh", body.le32(0).le32(0xFFFFFFFF).le32(s.sampleSize).zeros(8));
 }
 
 AviStreamFields AviVideoStream(uint32_t scale, uint32_t rate, uint32_t length) {
-    AviStreamFields s;
-    s.scale = scale;
-    s.rate = rate;
-    s.length = length;
-    return s;
+    return {"vids", "FMP4", scale, rate, length, 0};
 }
 
 AviStreamFields AviAudioStream(uint32_t avgBytesPerSec, uint32_t length) {
-    AviStreamFields s;
-    s.type = "auds";
-    s.handler = std::string("\0\0\0\0", 4);
-    s.rate = avgBytesPerSec;
-    s.length = length;
-    s.sampleSize = 1;
-    return s;
+    return {"auds", std::string(4, '\0'), 1, avgBytesPerSec, length, 1};
 }
 
 Bytes AviVideoFormat(uint32_t width, uint32_t height, const std::string& compression, const Bytes& extra) {
     Bytes body;
-    body.le32(40 + static_cast<uint32_t>(extra.size()))
-        .le32(width)
-        .le32(height)
-        .le16(1)
-        .le16(24)
-        .str(compression)
-        .le32(width * height * 3)
-        .le32(0)
-        .le32(0)
-        .le32(0)
-        .le32(0)
-        .raw(extra);
-    return RiffChunk("strf", body);
+    body.le32(40 + static_cast<uint32_t>(extra.size())).le32(width).le32(height).le16(1).le16(24).str(compression);
+    return RiffChunk("strf", body.le32(width * height * 3).le32(0).le32(0).le32(0).le32(0).raw(extra));
 }
 
 Bytes AviAudioFormat(uint16_t formatTag, uint16_t channels, uint32_t sampleRate, uint32_t avgBytesPerSec,

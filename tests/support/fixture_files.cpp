@@ -41,27 +41,10 @@ Seed Id3Frames(int version) {
 }
 
 void AddMp3Files(Files& out) {
-    Id3v1Fields v1;
-    v1.title = "Title";
-    v1.artist = "Artist";
-    v1.track = 4;
-    v1.genre = 13;
-    Mp3Shape mpeg2;
-    mpeg2.version = 2;
-    mpeg2.bitrateIndex = 8;
-    mpeg2.channelMode = 3;
-    Mp3Shape layer2;
-    layer2.layer = 2;
-    Mp3Shape mpeg25;
-    mpeg25.version = 0;
-    mpeg25.bitrateIndex = 5;
-    XingFields xing;
-    xing.frames = 40;
-    xing.bytes = 40 * Mp3FrameSize({});
-    VbriFields vbri;
-    vbri.frames = 40;
-    vbri.bytes = 40 * Mp3FrameSize({});
-    vbri.framesPerEntry = 4;
+    const Id3v1Fields v1{"Title", "Artist", "", "", "", 4, 13};
+    const Mp3Shape mpeg2{2, 3, 8, 0, 0, 3}, layer2{3, 2}, mpeg25{0, 3, 5};
+    const XingFields xing{0xF, 40, 40 * Mp3FrameSize({})};
+    const VbriFields vbri{0x0102, 1, 4, 40 * Mp3FrameSize({}), 40};
 
     Add(out, MEDIA_TYPE_MP3, "frames.mp3", Mp3Frames(40));
     Add(out, MEDIA_TYPE_MP3, "id3v23.mp3", Cat({Id3Frames(3), Mp3Frames(20), Id3v1(v1)}));
@@ -123,18 +106,10 @@ ByteVec VideoTrak() {
 }
 
 void AddMp4Files(Files& out) {
-    const ByteVec ilst = Meta(Box("ilst", Join({Item("\xA9nam", "Title"),
-                                                Item("\xA9"
-                                                     "ART",
-                                                     "Artist"),
-                                                Item("\xA9"
-                                                     "alb",
-                                                     "Album"),
-                                                Item("\xA9"
-                                                     "day",
-                                                     "2009"),
-                                                IlstItem("trkn", 0, {0, 0, 0, 3, 0, 12, 0, 0}),
-                                                IlstItem("gnre", 0, {0, 14}), IlstItem("covr", 13, kJpeg)})));
+    const ByteVec ilst =
+        Meta(Box("ilst", Join({Item("\251nam", "Title"), Item("\251ART", "Artist"), Item("\251alb", "Album"),
+                               Item("\251day", "2009"), IlstItem("trkn", 0, {0, 0, 0, 3, 0, 12, 0, 0}),
+                               IlstItem("gnre", 0, {0, 14}), IlstItem("covr", 13, kJpeg)})));
     const ByteVec udta3gp =
         Box("udta", Join({TextBox("titl", "Title"), TextBox("auth", "Author"), TextBox("perf", "Performer"),
                           TextBox("gnre", "Genre"), TextBox("dscp", "About"), TextBox("cprt", "(c)"), MakerBox()}));
@@ -191,20 +166,14 @@ void AddAsfFiles(Files& out) {
 }
 
 void AddRealMediaFiles(Files& out) {
-    RmProps two;
-    two.numStreams = 2;
-    RmStream audio;
-    audio.typeData = RaHeaderV4(44100, 16, 2, "cook");
-    RmStream audio5 = audio;
-    audio5.typeData = RaHeaderV5(22050, 16, 1, "raac");
-    RmStream video;
-    video.number = 1;
-    video.name = "Video Stream";
-    video.mime = "video/x-pn-realvideo";
-    video.typeData = RvHeader("RV40", 320, 240, 15);
-    RmStream multi = audio;
-    multi.mime = "logical-fileinfo";
-    multi.typeData = RmMulti(2, RaHeaderV4(8000, 16, 1, "sipr"));
+    const RmProps two{64000, 48000, 5000, 2};
+    const RmStream audio{
+        0, 32000, 24000, 5000, "Audio Stream", "audio/x-pn-realaudio", RaHeaderV4(44100, 16, 2, "cook")};
+    const RmStream audio5{
+        0, 32000, 24000, 5000, "Audio Stream", "audio/x-pn-realaudio", RaHeaderV5(22050, 16, 1, "raac")};
+    const RmStream video{1, 32000, 24000, 5000, "Video Stream", "video/x-pn-realvideo", RvHeader("RV40", 320, 240, 15)};
+    const RmStream multi{
+        0, 32000, 24000, 5000, "Audio Stream", "logical-fileinfo", RmMulti(2, RaHeaderV4(8000, 16, 1, "sipr"))};
 
     Add(out, MEDIA_TYPE_REALMEDIA, "audio.ra",
         RmFile(RmProps{}, {RmCont("Title", "Author", "(c)", "About"), RmMdpr(audio)}));
@@ -213,10 +182,7 @@ void AddRealMediaFiles(Files& out) {
 }
 
 void AddAviFiles(Files& out) {
-    AviMainFields main;
-    main.streams = 2;
-    main.width = 320;
-    main.height = 240;
+    const AviMainFields main{40000, 0, 2, 320, 240};
     const Bytes hdrl = AviHdrl(main, {AviStrl(AviVideoStream(1, 25, 10), AviVideoFormat(320, 240, "XVID")),
                                       AviStrl(AviAudioStream(16000, 10), AviAudioFormat(1, 1, 8000, 16000, 2, 16))});
     std::vector<AviFrame> frames;

@@ -40,13 +40,8 @@ std::vector<uint8_t> Mp3Frame(const Mp3FrameLayout& shape) {
 
 std::vector<uint8_t> Id3v2Tag(int version, const std::vector<uint8_t>& body, uint8_t flags) {
     Bytes b;
-    b.str("ID3")
-        .u8(static_cast<uint32_t>(version))
-        .u8(0)
-        .u8(flags)
-        .syncsafe32(static_cast<uint32_t>(body.size()))
-        .raw(body);
-    return b.data();
+    b.str("ID3").u8(static_cast<uint32_t>(version)).u8(0).u8(flags).syncsafe32(static_cast<uint32_t>(body.size()));
+    return b.raw(body).data();
 }
 
 std::vector<uint8_t> AdtsFrame(const AdtsFields& s, const std::vector<uint8_t>& payload) {

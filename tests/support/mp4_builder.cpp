@@ -27,10 +27,8 @@ ByteVec TimeHeader(const std::string& type, uint8_t version, uint32_t timescale,
     if (version == 1) {
         b.be64(creation).be64(creation).be32(timescale).be64(duration);
     } else {
-        b.be32(static_cast<uint32_t>(creation))
-            .be32(static_cast<uint32_t>(creation))
-            .be32(timescale)
-            .be32(static_cast<uint32_t>(duration));
+        const auto created = static_cast<uint32_t>(creation);
+        b.be32(created).be32(created).be32(timescale).be32(static_cast<uint32_t>(duration));
     }
     b.zeros(tail);
     return FullBox(type, version, 0, b);
@@ -65,20 +63,8 @@ ByteVec AudioEntry(const std::string& type, uint16_t channels, uint16_t bits, ui
 
 ByteVec VisualEntry(const std::string& type, uint16_t width, uint16_t height, const ByteVec& children) {
     Bytes b;
-    b.zeros(6)
-        .be16(1)
-        .zeros(16)
-        .be16(width)
-        .be16(height)
-        .be32(0x480000)
-        .be32(0x480000)
-        .be32(0)
-        .be16(1)
-        .zeros(32)
-        .be16(0x18)
-        .be16(0xFFFF)
-        .raw(children);
-    return Box(type, b);
+    b.zeros(6).be16(1).zeros(16).be16(width).be16(height).be32(0x480000).be32(0x480000).be32(0).be16(1);
+    return Box(type, b.zeros(32).be16(0x18).be16(0xFFFF).raw(children));
 }
 
 // A descriptor: tag, then its length in 7-bit groups (high bit: more follow).

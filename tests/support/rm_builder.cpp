@@ -10,38 +10,17 @@ Bytes RmChunk(const std::string& id, const Bytes& body) {
 
 static Bytes RmProp(const RmProps& p) {
     Bytes body;
-    body.be16(p.version)
-        .be32(p.maxBitRate)
-        .be32(p.avgBitRate)
-        .be32(1400)
-        .be32(700)
-        .be32(100)
-        .be32(p.durationMs)
-        .be32(2000)
-        .be32(0)
-        .be32(0)
-        .be16(p.numStreams)
-        .be16(0);
+    body.be16(p.version).be32(p.maxBitRate).be32(p.avgBitRate).be32(1400).be32(700).be32(100);
+    body.be32(p.durationMs).be32(2000).be32(0).be32(0).be16(p.numStreams).be16(0);
     return RmChunk("PROP", body);
 }
 
 Bytes RmMdpr(const RmStream& s) {
     Bytes body;
-    body.be16(s.version)
-        .be16(s.number)
-        .be32(s.maxBitRate)
-        .be32(s.avgBitRate)
-        .be32(1400)
-        .be32(700)
-        .be32(0)
-        .be32(3000)
-        .be32(s.durationMs)
-        .u8(static_cast<uint32_t>(s.name.size()))
-        .str(s.name)
-        .u8(static_cast<uint32_t>(s.mime.size()))
-        .str(s.mime)
-        .be32(static_cast<uint32_t>(s.typeData.size()))
-        .raw(s.typeData);
+    body.be16(s.version).be16(s.number).be32(s.maxBitRate).be32(s.avgBitRate).be32(1400).be32(700).be32(0);
+    body.be32(3000).be32(s.durationMs).u8(static_cast<uint32_t>(s.name.size())).str(s.name);
+    body.u8(static_cast<uint32_t>(s.mime.size())).str(s.mime);
+    body.be32(static_cast<uint32_t>(s.typeData.size())).raw(s.typeData);
     return RmChunk("MDPR", body);
 }
 
@@ -87,19 +66,8 @@ Bytes RaHeaderV5(uint16_t sampleRate, uint16_t sampleSize, uint16_t channels, co
 
 Bytes RvHeader(const std::string& fourcc, uint16_t width, uint16_t height, uint16_t fps) {
     Bytes b;
-    b.be32(34)
-        .str("VIDO")
-        .str(fourcc)
-        .be16(width)
-        .be16(height)
-        .be16(12)
-        .be32(0)
-        .be16(fps)
-        .be16(0)
-        .be32(0)
-        .be16(8)
-        .zeros(4);
-    return b;
+    b.be32(34).str("VIDO").str(fourcc).be16(width).be16(height).be16(12).be32(0).be16(fps).be16(0).be32(0);
+    return b.be16(8).zeros(4);
 }
 
 Bytes RmMulti(uint16_t rules, const Bytes& substream) {
