@@ -347,11 +347,10 @@ def from_metainfo(obj):
 
 
 def from_ffprobe(path):
-    r = run(["ffprobe", "-v", "error", "-print_format", "json", "-show_format", "-show_streams",
-             path], timeout=60)
     try:
-        data = json.loads(r.stdout or b"{}")
-    except ValueError:
+        data = json.loads(run(["ffprobe", "-v", "error", "-print_format", "json", "-show_format",
+                               "-show_streams", path], timeout=60).stdout or b"{}")
+    except (ValueError, subprocess.TimeoutExpired):  # a file ffprobe cannot read answers nothing
         return {}
     fmt, streams = data.get("format") or {}, data.get("streams") or []
     if not fmt:
