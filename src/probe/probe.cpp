@@ -138,6 +138,11 @@ int Probe(const char* path, mi_info** out) {
         delete owner;
         return read == MM_E_OUTOFMEMORY ? MI_E_NO_MEMORY : MI_E_DAMAGED;
     }
+    // The overall rate counts every byte of the file over its play time, as
+    // ffprobe and MediaInfo do.
+    MediaFacts& f = owner->facts;
+    if (f.durationUs > 0)
+        f.bitRate = static_cast<uint64_t>(static_cast<long double>(stamp.size) * 8e6L / f.durationUs);
     FillInfo(owner);
     *out = &owner->info;
     return MI_OK;

@@ -205,7 +205,10 @@ int32_t WaveFacts(const char* path, MediaFacts* f) {
     s.sampleRate = w.rate;
     s.channels = w.channels;
     s.bitsPerSample = CompressedTag(w.tag) ? 0 : w.bits;
-    s.bitRate = static_cast<uint64_t>(w.byteRate) * 8;
+    // ADPCM writers state byte rates loosely; its blocks tell the real one.
+    s.bitRate = w.samplesPerBlock != 0 && (w.tag == 2 || w.tag == 0x11)
+                    ? static_cast<uint64_t>(w.blockAlign) * 8 * w.rate / w.samplesPerBlock
+                    : static_cast<uint64_t>(w.byteRate) * 8;
     f->durationUs = DurationUs(w, &f->durationExact);
     f->bitRate = s.bitRate;
     f->streams.push_back(s);
