@@ -11,10 +11,12 @@ function(run)
   set(out "${out}" PARENT_SCOPE)
 endfunction()
 
-# A consumer's output: the headers' version is the library's, the sample is MP3 (type 1).
+# A consumer's output: the headers' version is the library's, the sample is MP3 (type 1),
+# and its format read through the accurate interface.
 function(expect_consumer program)
   run(${program} ${SAMPLE})
-  if(NOT out MATCHES "version ${VERSION} matches" OR NOT out MATCHES "type 1 result 0")
+  if(NOT out MATCHES "version ${VERSION} matches" OR NOT out MATCHES "type 1 result 0"
+     OR NOT out MATCHES "format mp3")
     message(FATAL_ERROR "${program} answered:\n${out}")
   endif()
 endfunction()

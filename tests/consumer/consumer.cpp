@@ -1,5 +1,7 @@
-// The C consumer's checks from C++, built with pkg-config or the CMake package.
+// The C consumer's checks from C++, built with pkg-config or the CMake package,
+// and the accurate interface through its C++ wrapper.
 #include <metainfo/metainfo.h>
+#include <metainfo/probe.hpp>
 
 #include <cstdio>
 #include <cstring>
@@ -11,6 +13,8 @@ int main(int argc, char** argv) {
         int type = -1;
         const int32_t result = MM_MediaExtractor_DetectMediaType(argv[i], &type);
         std::printf("%s type %d result %d\n", argv[i], type, static_cast<int>(result));
+        const metainfo::MediaInfo info(argv[i]);
+        std::printf("%s format %s\n", argv[i], info->format);
     }
     return MM_VersionNumber() == MM_VERSION_NUMBER ? 0 : 1;
 }
