@@ -72,6 +72,49 @@ void PrintMeta(const _MMMetaInfo& meta) {
     if (meta.pPicture != nullptr) std::printf("    %-12s %u bytes\n", "picture", meta.nPictureSize);
 }
 
+void PrintStream(const mi_stream& s) {
+    const char* codec = s.codec != nullptr ? s.codec : "?";
+    if (s.kind == MI_STREAM_VIDEO) {
+        std::printf("    video %s%s%s, %ux%u", codec, s.profile != nullptr ? " " : "",
+                    s.profile != nullptr ? s.profile : "", s.width, s.height);
+        if (s.frame_rate_den != 0) std::printf(", %.3f fps", static_cast<double>(s.frame_rate_num) / s.frame_rate_den);
+    } else {
+        std::printf("    audio %s%s%s, %u Hz, %u ch", codec, s.profile != nullptr ? " " : "",
+                    s.profile != nullptr ? s.profile : "", s.sample_rate, s.channels);
+        if (s.bits_per_sample != 0) std::printf(", %u bits", s.bits_per_sample);
+    }
+    if (s.bit_rate != 0) std::printf(", %llu bit/s", static_cast<unsigned long long>(s.bit_rate));
+    std::printf("\n");
+}
+
+// The accurate answers: what the file holds.
+void PrintAccurate(const mi_info& info) {
+    std::printf("  %s", info.format != nullptr ? info.format : "?");
+    if (info.mime != nullptr) std::printf(" (%s)", info.mime);
+    if (info.duration_ms >= 0) {
+        std::printf(", %.3f s%s", static_cast<double>(info.duration_ms) / 1000.0,
+                    info.duration_exact != 0 ? "" : " (estimated)");
+    }
+    if (info.bit_rate != 0) std::printf(", %llu bit/s", static_cast<unsigned long long>(info.bit_rate));
+    std::printf("\n");
+    for (size_t i = 0; i < info.stream_count; ++i) PrintStream(info.streams[i]);
+    const std::pair<const char*, const char*> texts[] = {
+        {"title", info.title}, {"artist", info.artist}, {"album", info.album},     {"album artist", info.album_artist},
+        {"genre", info.genre}, {"date", info.date},     {"comment", info.comment}, {"composer", info.composer},
+    };
+    for (const auto& t : texts) {
+        if (t.second != nullptr) std::printf("    %-12s %s\n", t.first, t.second);
+    }
+    if (info.track != 0) std::printf("    %-12s %u/%u\n", "track", info.track, info.track_total);
+    if (info.disc != 0) std::printf("    %-12s %u/%u\n", "disc", info.disc, info.disc_total);
+    for (size_t i = 0; i < info.tag_count; ++i) std::printf("    %-12s %s\n", info.tags[i].key, info.tags[i].value);
+    for (size_t i = 0; i < info.picture_count; ++i) {
+        const mi_picture& p = info.pictures[i];
+        std::printf("    picture %zu: %s, %llu bytes\n", i, p.mime != nullptr ? p.mime : "?",
+                    static_cast<unsigned long long>(p.size));
+    }
+}
+
 void PrintCsvRow(const std::vector<std::string>& row) {
     std::string line;
     for (size_t i = 0; i < row.size(); ++i) line += (i == 0 ? "" : ",") + CsvField(row[i]);
@@ -118,6 +161,9 @@ void Probe(const std::string& path, Report* r) {
 
 void PrintText(const Report& r) {
     std::printf("%s\n", r.path.c_str());
+    if (r.info != nullptr) PrintAccurate(*r.info);
+    if (!r.probed) return;
+    std::printf("  exact answers:\n");
     std::printf("  media type: %d (%s)\n", r.type, metainfo::MediaTypeName(r.type));
     std::printf("  extension check: %s\n", Status(r.checkResult).c_str());
     std::printf("  track type: %s", Status(r.trackResult).c_str());
@@ -157,7 +203,7 @@ bool ProbePrinter::Print(const std::string& path) {
             break;
         case Output::kCsv: PrintCsvRow(CsvRow(ReportJson(r))); break;
         case Output::kText:
-            if (r.probed) PrintText(r);
+            if (r.probed || r.info != nullptr) PrintText(r);
             break;
     }
     std::fflush(stdout);

@@ -68,12 +68,15 @@ std::string PictureMime(const std::string& stated) {
 }
 
 void AddTags(const _MMMetaInfo& meta, MediaFacts* f) {
-    auto item = [&](int kind) { return TrimText(DecodeItemText(meta.aItems[kind])); };
+    auto text = [](const _MMMetaItem& item) {
+        return item.nLength != 0 ? TrimText(DecodeItemText(item)) : std::string();
+    };
+    auto item = [&](int kind) { return text(meta.aItems[kind]); };
     TagFacts& t = f->tags;
     t.title = item(META_TITLE);
     t.artist = item(META_ARTIST);
     t.album = item(META_ALBUM);
-    t.albumArtist = TrimText(DecodeItemText(meta.stAlbumArtist));
+    t.albumArtist = text(meta.stAlbumArtist);
     t.genre = item(META_GENRE);
     t.date = item(META_DATE);
     t.comment = item(META_COMMENT);
