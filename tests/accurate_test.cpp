@@ -133,6 +133,41 @@ INSTANTIATE_TEST_SUITE_P(
         return name;
     });
 
+struct CutRow {
+    const char* name;
+    std::function<std::vector<uint8_t>()> build;
+    int64_t startMs, endMs;
+    size_t bytes;  // of the cut file
+    int64_t durationMs;  // of the cut file, probed again
+};
+
+// Whole frames (blocks) that play within the range, found by walking them.
+TEST(AccurateInterface, CutsWholeFramesOfTheRange) {
+    const CutRow rows[] = {
+        // Frames of 1024 samples at 44.1 kHz, 23.2 ms each: the 5th to the 9th.
+        {"frames.aac", [] { return AdtsWithTagBetween(50); }, 100, 200, 5 * 207, 116},
+        // 20 ms frames of 32 bytes after the 6-byte magic.
+        {"frames.amr", [] { return testing_support::AmrFile(false, 7, 123); }, 1000, 1500, 6 + 25 * 32, 500},
+        // 26.1 ms frames of 417 bytes.
+        {"frames.mp3", [] { return Mp3Stream(100, nullptr, 0, 0, 0); }, 0, 100, 4 * 417, 104},
+        // 2000 samples of 16-bit mono at 8 kHz behind a 44-byte header.
+        {"samples.wav", [] { return testing_support::CanonicalWave(1, 1, 8000, 16, 16000); }, 250, 500, 44 + 4000, 250},
+    };
+    TempDir dir;
+    for (const CutRow& row : rows) {
+        const std::string path = dir.Write(row.name, row.build());
+        const std::string out = dir.PathOf(std::string("cut-") + row.name);
+        ASSERT_EQ(mi_cut(path.c_str(), row.startMs, row.endMs, out.c_str()), MI_OK) << row.name;
+        EXPECT_EQ(testing_support::ReadFileBytes(out).size(), row.bytes) << row.name;
+        mi_info* info = nullptr;
+        ASSERT_EQ(mi_probe(out.c_str(), &info), MI_OK) << row.name;
+        EXPECT_EQ(info->duration_ms, row.durationMs) << row.name;
+        mi_info_free(info);
+        EXPECT_EQ(mi_cut(path.c_str(), 60000, 61000, out.c_str()), MI_E_ARGUMENT) << "past the end";
+    }
+    EXPECT_EQ(mi_cut(dir.PathOf("frames.mp3").c_str(), 500, 500, dir.PathOf("x").c_str()), MI_E_ARGUMENT);
+}
+
 TEST(AccurateInterface, ResultsForWhatIsNotMedia) {
     TempDir dir;
     const std::string text = dir.Write("notes.txt", Bytes().str("just some words, nothing more\n").data());

@@ -52,13 +52,15 @@ bool ProbeNamesFromStdin(bool nul, probe::ProbePrinter* printer) {
     return ok;
 }
 
-// A time argument in whole seconds for the cut, or a usage error.
-int WholeSeconds(const std::string& text, const char* what) {
+// A time argument of the cut in milliseconds, or a usage error; whole seconds
+// only for the MM_ cutters (--exact).
+int64_t CutTime(const std::string& text, const char* what, bool wholeSeconds) {
     int64_t ms = 0;
     if (!probe::ParseTime(text, &ms)) throw CLI::ValidationError(what, "not a time: " + text + " (seconds, or MM:SS)");
-    if (ms % 1000 != 0) throw CLI::ValidationError(what, text + ": the audio is cut at whole seconds");
+    if (wholeSeconds && ms % 1000 != 0)
+        throw CLI::ValidationError(what, text + ": the --exact cut is in whole seconds");
     if (ms / 1000 > 0x7FFFFFFF) throw CLI::ValidationError(what, text + ": too large");
-    return static_cast<int>(ms / 1000);
+    return ms;
 }
 
 }  // namespace
@@ -88,6 +90,8 @@ int main(int argc, char** argv) {
     cutCmd->add_option("start", cutStart, "start: seconds (90) or MM:SS (1:30)")->required();
     cutCmd->add_option("end", cutEnd, "end: seconds or MM:SS")->required();
     cutCmd->add_option("out", cutOut, "the file to write")->required();
+    bool cutExact = false;
+    cutCmd->add_flag("--exact", cutExact, "cut as the MM_ interface does: whole seconds, its own limits");
     cutCmd->footer(kExitCodes);
 
     std::string makerFile, thumbnail;
@@ -116,14 +120,14 @@ int main(int argc, char** argv) {
     coverCmd->add_flag("--all", coverAll, "write every picture, numbered");
     coverCmd->footer(kExitCodes);
 
-    int startSec = 0;
-    int endSec = 0;
+    int64_t startMs = 0;
+    int64_t endMs = 0;
     try {
         app.parse(argc, argv);
         if (cutCmd->parsed()) {
-            startSec = WholeSeconds(cutStart, "start");
-            endSec = WholeSeconds(cutEnd, "end");
-            if (endSec <= startSec) throw CLI::ValidationError("end", "the end must come after the start");
+            startMs = CutTime(cutStart, "start", cutExact);
+            endMs = CutTime(cutEnd, "end", cutExact);
+            if (endMs <= startMs) throw CLI::ValidationError("end", "the end must come after the start");
         }
     } catch (const CLI::ParseError& e) {
         const int code = app.exit(e);
@@ -147,7 +151,7 @@ int main(int argc, char** argv) {
         }
         return ok ? 0 : 1;
     }
-    if (cutCmd->parsed()) return probe::CutCommand(cutFile, startSec, endSec, cutOut);
+    if (cutCmd->parsed()) return probe::CutCommand(cutFile, startMs, endMs, cutOut, cutExact);
     if (makerCmd->parsed()) return probe::MakerCommand(makerFile, thumbnail);
     if (framesCmd->parsed()) return probe::FramesCommand(framesFile, stream, seekOpt->count() > 0, seekMs);
     if (coverCmd->parsed()) return probe::CoverCommand(coverFile, coverOut, coverIndex, coverAll);

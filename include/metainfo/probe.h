@@ -113,6 +113,14 @@ MM_EXPORT void mi_info_free(mi_info* info);
 MM_EXPORT int mi_picture_copy(const char* path, const mi_info* info, size_t index, void* buffer, size_t capacity,
                               size_t* size);
 
+/* Copies the compressed audio of an MP3, ADTS AAC, AMR or WAVE file between
+ * start_ms and end_ms into a new file of the same format at out_path: every
+ * frame (WAVE: block) that plays within the range, found by walking the
+ * frames, so any file size works. MI_E_NOT_MEDIA for other formats,
+ * MI_E_ARGUMENT for an empty range or one past the end, MI_E_IO when the
+ * output cannot be written (nothing is left behind). */
+MM_EXPORT int mi_cut(const char* path, int64_t start_ms, int64_t end_ms, const char* out_path);
+
 /* A short English text of a result ("no such file"), static storage. */
 MM_EXPORT const char* mi_result_text(int result);
 

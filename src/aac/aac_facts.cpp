@@ -47,9 +47,9 @@ struct Walk {
     bool complete = false;  // reached the end of the stream
 };
 
-// Steps over frames and ID3 tags from `at`; stops at anything else, the end
-// of the file or `limit`.
-void WalkFrames(int h, uint64_t size, uint64_t at, uint64_t limit, Walk* w) {
+// Steps over frames and ID3 tags from `at`, showing each frame to visit;
+// stops at anything else, the end of the file, `limit` or when visit says so.
+void WalkFrames(int h, uint64_t size, uint64_t at, uint64_t limit, Walk* w, const FrameVisitor& visit = nullptr) {
     uint8_t p[kId3Header];
     while (at + kAdtsHeader <= size) {
         if (at >= limit) return;
@@ -57,9 +57,11 @@ void WalkFrames(int h, uint64_t size, uint64_t at, uint64_t limit, Walk* w) {
         AdtsHeader frame;
         if (ParseAdts(p, &frame) && at + frame.length <= size) {
             if (w->frames == 0) w->first = frame;
+            const uint32_t samples = frame.blocks * kSamplesPerBlock;
             ++w->frames;
-            w->samples += static_cast<uint64_t>(frame.blocks) * kSamplesPerBlock;
+            w->samples += samples;
             w->frameBytes += frame.length;
+            if (visit && !visit(AudioFrame{at, frame.length, samples})) return;
             at += frame.length;
             continue;
         }
@@ -117,6 +119,21 @@ void AddSbr(const char* path, const Quirks& quirks, StreamFacts* s) {
 }
 
 }  // namespace
+
+bool WalkAdtsFrames(const char* path, uint32_t* rate, const FrameVisitor& visit) {
+    const int h = MEx_fopen(path, "rb");
+    if (h == 0) return false;
+    FileCloser closer(h);
+    uint64_t size = 0;
+    uint64_t start = 0;
+    if (!OpenedFileSize(h, path, &size) || !FindStream(h, size, &start)) return false;
+    Walk first;
+    WalkFrames(h, size, start, start + 1, &first);
+    *rate = g_uSamplingFrequencyTable[first.first.rateIndex];
+    Walk w;
+    WalkFrames(h, size, start, size, &w, visit);
+    return *rate != 0;
+}
 
 bool LooksLikeAdts(const char* path) {
     const int h = MEx_fopen(path, "rb");

@@ -285,7 +285,8 @@ extern "C" int32_t AMR_GetAudioData2File(const char* path, int startSec, int end
 namespace metainfo {
 namespace {
 
-constexpr uint64_t kAmrCountLimit = 16 * 1024 * 1024;  // frames counted; past it the rest is estimated
+constexpr uint64_t kAmrCountLimit = 16 * 1024 * 1024;
+constexpr size_t kAmrMaxBlock = 61 * 16 + 16;  // the largest frame for each of 16 channels, and their headers  // frames counted; past it the rest is estimated
 
 // Frames (blocks of every channel's frame) from the first frame to the end,
 // read in chunks; a block cut off by the end of the file does not count.
@@ -336,6 +337,32 @@ AmrCount CountBlocks(int h, uint64_t start, uint64_t fileSize, int kind, uint32_
 }
 
 }  // namespace
+
+bool WalkAmrFrames(const char* path, uint32_t* rate, uint64_t* prefix, const FrameVisitor& visit) {
+    const int h = MEx_fopen(path, "rb");
+    if (h == 0) return false;
+    FileCloser closer(h);
+    uint8_t head[32];
+    uint64_t fileSize = 0;
+    const int got = MEx_fread(head, 1, sizeof head, h);
+    _AMR_FrameInfo frame;
+    if (got < 16 || ParseAmrHead(head, static_cast<size_t>(got), &frame) != MM_OK ||
+        !OpenedFileSize(h, path, &fileSize))
+        return false;
+    const bool wide = IsWideBand(frame.nFileType);
+    *rate = wide ? 16000 : 8000;
+    *prefix = kAmrKinds[frame.nFileType].firstFrame;
+    uint8_t block[kAmrMaxBlock];
+    for (uint64_t at = *prefix; at < fileSize;) {
+        if (!SeekToOffset(h, at)) break;
+        const int n = MEx_fread(block, 1, sizeof block, h);
+        const uint64_t size = n > 0 ? BlockSize(block, static_cast<size_t>(n), frame.nFileType, frame.nChannels) : 0;
+        if (size == 0 || size > static_cast<uint64_t>(n) || at + size > fileSize) break;
+        if (!visit(AudioFrame{at, static_cast<uint32_t>(size), wide ? 320u : 160u})) break;
+        at += size;
+    }
+    return true;
+}
 
 int32_t AmrFacts(const char* path, MediaFacts* f) {
     const int h = MEx_fopen(path, "rb");

@@ -6,6 +6,7 @@
 #include <cstddef>
 #include <cstdint>
 
+#include "core/audio_frames.h"
 #include "core/facts.h"
 #include "metainfo/records.h"
 
@@ -57,6 +58,11 @@ int32_t AMR_GetClipInfo(const char* path, _MMClipInfo* clip);
 int32_t AMR_GetMIMEType(const char* path, _MM_MIMETYPE* mime);
 int32_t AMR_GetCodecType(const char* path, _MM_CODECTYPE* codec);
 int32_t AMR_GetTrackType(const char* path, int* mask);
+
+// Shows every block (one frame per channel) to visit; *rate gets the
+// sampling rate, *prefix the bytes before the first frame (magic and channel
+// description). False when the file is no AMR storage file.
+bool WalkAmrFrames(const char* path, uint32_t* rate, uint64_t* prefix, const FrameVisitor& visit);
 
 // The accurate facts: every frame counted (estimated past 16 MiB).
 int32_t AmrFacts(const char* path, MediaFacts* facts);

@@ -1,6 +1,7 @@
 #include "speech/wave_facts.h"
 
 #include <cstring>
+#include <vector>
 
 #include "core/byte_reader.h"
 #include "core/file_access.h"
@@ -20,7 +21,9 @@ struct WaveChunks {
     bool haveFormat = false;
     uint16_t tag = 0, channels = 0, blockAlign = 0, bits = 0, samplesPerBlock = 0;
     uint32_t rate = 0, byteRate = 0;
+    std::vector<uint8_t> format;  // the "fmt " body as stored (its first kMaxChunkBody bytes)
     bool haveData = false;
+    uint64_t dataOffset = 0;
     uint64_t dataSize = 0;
     uint64_t factSamples = 0;
     bool haveFact = false;
@@ -30,6 +33,7 @@ struct WaveChunks {
 void ReadFormat(const uint8_t* b, size_t n, WaveChunks* w) {
     if (n < 16) return;
     w->haveFormat = true;
+    w->format.assign(b, b + n);
     w->tag = ReadLE16(b);
     w->channels = ReadLE16(b + 2);
     w->rate = ReadLE32(b + 4);
@@ -119,6 +123,7 @@ void WalkChunks(int h, uint64_t fileSize, bool rf64, WaveChunks* w, TagFacts* t)
             if (rf64 && size == 0xFFFFFFFFu) size = w->ds64Data;
             if (size > fileSize - body) size = fileSize - body;
             w->haveData = true;
+            w->dataOffset = body;
             w->dataSize = size;
         } else {
             ReadChunk(h, id, body, size, fileSize, w, t);
@@ -179,6 +184,31 @@ int64_t DurationUs(const WaveChunks& w, bool* exact) {
 }
 
 }  // namespace
+
+bool ReadWaveLayout(const char* path, WaveLayout* layout) {
+    const int h = MEx_fopen(path, "rb");
+    if (h == 0) return false;
+    FileCloser closer(h);
+    uint64_t size = 0;
+    uint8_t head[12];
+    if (!OpenedFileSize(h, path, &size) || MEx_fread(head, 1, sizeof head, h) != static_cast<int>(sizeof head))
+        return false;
+    const bool rf64 = IsRf64Wave(head, sizeof head);
+    if (!rf64 && !(BytesEqual(head, "RIFF", 4) && BytesEqual(head + 8, "WAVE", 4))) return false;
+    WaveChunks w;
+    TagFacts unused;
+    WalkChunks(h, size, rf64, &w, &unused);
+    if (!w.haveFormat || !w.haveData || w.blockAlign == 0 || w.rate == 0) return false;
+    layout->format = w.format;
+    layout->dataOffset = w.dataOffset;
+    layout->dataSize = w.dataSize - w.dataSize % w.blockAlign;
+    layout->blockAlign = w.blockAlign;
+    layout->rate = w.rate;
+    const bool adpcm = w.tag == 2 || w.tag == 0x11;
+    layout->samplesPerBlock = adpcm ? w.samplesPerBlock : 1;
+    layout->pcm = w.tag == 1 || w.tag == 3 || w.tag == 6 || w.tag == 7;
+    return layout->samplesPerBlock != 0;
+}
 
 bool IsRf64Wave(const uint8_t* head, size_t n) {
     return n >= 12 && (BytesEqual(head, "RF64", 4) || BytesEqual(head, "BW64", 4)) && BytesEqual(head + 8, "WAVE", 4);
