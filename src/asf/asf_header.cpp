@@ -219,7 +219,7 @@ int32_t ASF_ParseFilePropertyObj(int h, _MMClipInfo* clip) {
     // Maximum Bitrate.
     uint8_t b[kAsfFileFieldsSize];
     ReadOrZero(h, b, sizeof b);
-    const AsfFileFields p = ASF_DecodeFileProperties(b);
+    const AsfFileFields p = ASF_DecodeFileFields(b);
     clip->nFileSize = static_cast<uint32_t>(p.fileSize);
     // Milliseconds as a signed 32-bit value: a Preroll longer than the play
     // time gives a negative duration, truncated toward zero.
@@ -229,7 +229,7 @@ int32_t ASF_ParseFilePropertyObj(int h, _MMClipInfo* clip) {
     return 0;
 }
 
-AsfFileFields ASF_DecodeFileProperties(const uint8_t* b) {
+AsfFileFields ASF_DecodeFileFields(const uint8_t* b) {
     return AsfFileFields{ReadLE64(b + 24), ReadLE64(b + 48), ReadLE32(b + 64), ReadLE32(b + 84)};
 }
 

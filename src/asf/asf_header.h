@@ -59,7 +59,7 @@ struct AsfFileFields {
 };
 constexpr uint32_t kAsfFileFieldsSize = 88;  // from the object's size field
 // b: the object from its size field on, kAsfFileFieldsSize bytes.
-AsfFileFields ASF_DecodeFileProperties(const uint8_t* b);
+AsfFileFields ASF_DecodeFileFields(const uint8_t* b);
 int32_t ASF_ParseStreamPropertyObj(int h, _MMClipInfo* clip);
 int32_t ASF_GetVideoIndex(int h, uint32_t* videoStream);
 uint32_t ASF_GetSteamType(int h);

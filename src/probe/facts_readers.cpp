@@ -1,5 +1,8 @@
 #include "probe/facts_readers.h"
 
+#include <array>
+
+#include "asf/asf_facts.h"
 #include "metainfo/metainfo.h"
 #include "probe/contract_facts.h"
 
@@ -9,7 +12,12 @@ namespace {
 using FactsReader = int32_t (*)(const char* path, int type, MediaFacts* facts);
 
 // A null row reads the MM_ answers.
-const FactsReader kFactsReaders[MM_MEDIA_SLOTS] = {};
+constexpr std::array<FactsReader, MM_MEDIA_SLOTS> Readers() {
+    std::array<FactsReader, MM_MEDIA_SLOTS> rows{};
+    rows[MEDIA_TYPE_ASF] = AsfFacts;
+    return rows;
+}
+constexpr std::array<FactsReader, MM_MEDIA_SLOTS> kFactsReaders = Readers();
 
 }  // namespace
 
@@ -21,7 +29,7 @@ int AccurateMediaType(const char* path) {
 
 int32_t ReadFacts(const char* path, int type, MediaFacts* facts) {
     if (type <= 0 || type >= MM_MEDIA_SLOTS) return MM_E_UNSUPPORTED;
-    const FactsReader reader = kFactsReaders[type];
+    const FactsReader reader = kFactsReaders[static_cast<size_t>(type)];
     return reader != nullptr ? reader(path, type, facts) : ContractFacts(path, type, facts);
 }
 
