@@ -93,7 +93,7 @@ TEST(AccurateAsf, FactsOfBuiltHeaders) {
          {AsfFileProperties(0, 20000000, 3000, 0), AsfAudioStream(1, 0x0001, 8000, 1, 384000, 24),
           AsfVideoStream(2, "wvc1", 64, 48)},
          "video/x-ms-wmv -1~ | pcm_s24le 8000x1x24 384000 | vc1/Advanced 64x48@0/0 0 | ;;;;;;0;0/0;0/0;;",
-         "0s 0fps"},
+         "4294967295s 0fps"},
         {"picture and a descriptor running past its object",
          {AsfFileProperties(0, kPlay, 3000, 0),
           AsfExtContentDescription({{"WM/Picture", kBinary, picture.data()}, {"Title", kText, Text("T")}}),
