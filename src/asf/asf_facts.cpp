@@ -70,12 +70,12 @@ public:
             StreamProperties(h);
         } else if (SameGuid(g, ASF_Stream_Bitrate_Properties_Object)) {
             StreamBitrates(h);
-        } else if (SameGuid(g, ASF_Header_Extension_Object)) {
+        } else if (SameGuid(g, ASF_Header_Extension_Object) && o.size >= 46) {
             extensionEnd_ = end_;
             if (SeekTo(h, o.start + 16)) ASF_WalkHdrExtension(h, this);
-        } else if (SameGuid(g, ASF_Content_Description_Object)) {
+        } else if (SameGuid(g, ASF_Content_Description_Object) && o.size >= 34) {
             if (SeekTo(h, o.start + 16)) ASF_WalkContentDescription(h, this);
-        } else if (SameGuid(g, ASF_Extended_Content_Description_Object)) {
+        } else if (SameGuid(g, ASF_Extended_Content_Description_Object) && o.size >= 26) {
             if (SeekTo(h, o.start + 16)) ASF_WalkExtContentDescription(h, this);
         }
         return 0;
@@ -83,7 +83,7 @@ public:
 
     int32_t Inner(int h, const uint8_t* guid, uint64_t size) override {
         const int64_t start = MEx_ftell(h) - static_cast<int64_t>(kObjectHeaderSize);
-        if (start < 0 || size > static_cast<uint64_t>(extensionEnd_ - start)) return kStop;
+        if (start < 0 || start > extensionEnd_ || size > static_cast<uint64_t>(extensionEnd_ - start)) return kStop;
         end_ = start + static_cast<int64_t>(size);
         if (SameGuid(guid, ASF_Extended_Stream_Properties_Object)) {
             uint8_t e[kExtStreamFixed];
@@ -159,7 +159,7 @@ public:
         SplitNumberPair(trackZero_, &zeroBased, &unused);
         if (t.track == 0 && !trackZero_.empty()) t.track = zeroBased + 1;
         if (t.date.size() >= 4 && t.date.find_first_not_of("0123456789") >= 4) {
-            t.year = std::atoi(t.date.substr(0, 4).c_str());
+            for (size_t i = 0; i < 4; ++i) t.year = t.year * 10 + (t.date[i] - '0');
         }
     }
 
