@@ -130,7 +130,72 @@ void VideoStream(int h, uint32_t size, _MM_CODECTYPE* codec) {
     if (SeekTo(h, typeSpecific)) SeekBy(h, static_cast<int64_t>(size) - kPrefixSize);
 }
 
+struct AudioName {
+    uint16_t tag;
+    const char* name;
+    uint32_t bits;  // ffprobe's fixed bits per sample; 0 when it reports none
+};
+
+const AudioName kAudioNames[] = {
+    {0x0002, "adpcm_ms", 4},      {0x0006, "pcm_alaw", 8}, {0x0007, "pcm_mulaw", 8}, {0x000A, "wmavoice", 0},
+    {0x0011, "adpcm_ima_wav", 4}, {0x0050, "mp2", 0},      {0x0055, "mp3", 0},       {0x00FF, "aac", 0},
+    {0x0130, "sipr", 0},          {0x0160, "wmav1", 0},    {0x0161, "wmav2", 0},     {0x0162, "wmapro", 0},
+    {0x0163, "wmalossless", 0},   {0x1610, "aac", 0},      {0x2000, "ac3", 0},       {0x2001, "dts", 0},
+};
+
+const struct {
+    char fourcc[5];
+    const char* name;
+} kVideoNames[] = {
+    {"WMV1", "wmv1"},      {"WMV2", "wmv2"},      {"WMV3", "wmv3"},      {"WMVA", "vc1"},   {"WVC1", "vc1"},
+    {"WMVP", "wmv3image"}, {"WVP2", "vc1image"},  {"MSS1", "mss1"},      {"MSS2", "mss2"},  {"MP43", "msmpeg4v3"},
+    {"DIV3", "msmpeg4v3"}, {"MP42", "msmpeg4v2"}, {"MPG4", "msmpeg4v1"}, {"MP4S", "mpeg4"}, {"M4S2", "mpeg4"},
+    {"XVID", "mpeg4"},     {"DIVX", "mpeg4"},     {"DX50", "mpeg4"},     {"FMP4", "mpeg4"}, {"H264", "h264"},
+    {"AVC1", "h264"},      {"MJPG", "mjpeg"},
+};
+
 }  // namespace
+
+const char* ASF_AudioCodecName(uint16_t formatTag, uint16_t bitsPerSample) {
+    if (formatTag == 0x0001) {
+        switch (bitsPerSample) {
+            case 8: return "pcm_u8";
+            case 24: return "pcm_s24le";
+            case 32: return "pcm_s32le";
+            default: return "pcm_s16le";
+        }
+    }
+    if (formatTag == 0x0003) return bitsPerSample == 64 ? "pcm_f64le" : "pcm_f32le";
+    for (const AudioName& a : kAudioNames) {
+        if (a.tag == formatTag) return a.name;
+    }
+    return nullptr;
+}
+
+uint32_t ASF_AudioSampleBits(uint16_t formatTag, uint16_t bitsPerSample) {
+    if (formatTag == 0x0001 || formatTag == 0x0003) return bitsPerSample;
+    for (const AudioName& a : kAudioNames) {
+        if (a.tag == formatTag) return a.bits;
+    }
+    return 0;
+}
+
+const char* ASF_VideoCodecName(uint32_t compression) {
+    uint32_t upper = 0;
+    for (uint32_t shift = 0; shift < 32; shift += 8) {
+        uint32_t c = compression >> shift & 0xFFu;
+        upper |= (c >= 'a' && c <= 'z' ? c - 32 : c) << shift;
+    }
+    for (const auto& v : kVideoNames) {
+        if (FourCC(v.fourcc) == upper) return v.name;
+    }
+    return nullptr;
+}
+
+const char* ASF_Wmv3ProfileName(uint8_t first) {
+    static const char* const kNames[] = {"Simple", "Main", "Complex", "Advanced"};
+    return kNames[first >> 6];
+}
 
 uint32_t ASF_SimpleProfileLevel(uint32_t kbps, uint32_t fps, int32_t w, int32_t h) {
     bool lowRate = kbps < 97 && fps < 16;

@@ -157,7 +157,39 @@ int32_t RunDeferred(int h, uint16_t mode, void* out, uint32_t allowance, uint32_
     return 0;
 }
 
+// Checks the Header Object at the start of the opened file and leaves the
+// file at its first object; the walk's file size is set on the way.
+bool OpenHeader(int h, const char* path, uint64_t* fileSize, uint32_t* count, uint64_t* headerSize) {
+    s_asfFileSize = OpenedFileSize(h, path, fileSize) ? SaturateU32(*fileSize) : 0;
+    if (h == 0) return false;
+    uint8_t head[24];  // GUID and the size, which only the facts walk uses
+    if (!ReadExact(h, head, sizeof head) || !SameGuid(head, ASF_Header_Object)) return false;
+    if (headerSize != nullptr) *headerSize = ReadLE64(head + 16);
+    return Read32(h, count) && *count <= kMaxHeaderObjects && SeekBy(h, 2);
+}
+
 }  // namespace
+
+int32_t ASF_WalkHeader(const char* path, AsfObjectVisitor* visitor, uint64_t* fileSize) {
+    const int h = MEx_fopen(path, "rb");
+    FileCloser closer(h);
+    *fileSize = 0;
+    uint32_t count = 0;
+    uint64_t headerSize = 0;
+    if (!OpenHeader(h, path, fileSize, &count, &headerSize)) return kWalkFailed;
+    const uint64_t headerEnd = headerSize < *fileSize ? headerSize : *fileSize;
+    uint64_t at = 30;  // past the Header Object's own fields
+    for (uint32_t i = 0; i < count && at + kObjectHeaderSize <= headerEnd; ++i) {
+        uint8_t head[kObjectHeaderSize];
+        if (!SeekTo(h, static_cast<int64_t>(at)) || !ReadExact(h, head, sizeof head)) return kWalkFailed;
+        const uint64_t size = ReadLE64(head + 16);
+        if (size < kObjectHeaderSize || size > headerEnd - at) return kWalkFailed;
+        const int32_t result = visitor->Object(h, AsfObjectRef{head, static_cast<int64_t>(at), size});
+        if (result != 0) return result;
+        at += size;
+    }
+    return 0;
+}
 
 int32_t ASF_GetMediaInfo(const char* path, uint16_t mode, void* out, int32_t flag) {
     uint32_t videoStream = kNoVideoStream;
@@ -165,14 +197,8 @@ int32_t ASF_GetMediaInfo(const char* path, uint16_t mode, void* out, int32_t fla
     const int h = prepared ? MEx_fopen(path, "rb") : 0;
     FileCloser closer(h);
     uint64_t fileSize = 0;
-    s_asfFileSize = OpenedFileSize(h, path, &fileSize) ? SaturateU32(fileSize) : 0;
-    if (h == 0) return kWalkFailed;
-
-    uint8_t head[24];  // GUID and the size, which nothing uses
-    if (!ReadExact(h, head, sizeof head) || !SameGuid(head, ASF_Header_Object)) return kWalkFailed;
     uint32_t count = 0;
-    if (!Read32(h, &count) || count > kMaxHeaderObjects) return kWalkFailed;
-    if (!SeekBy(h, 2)) return kWalkFailed;
+    if (!OpenHeader(h, path, &fileSize, &count, nullptr)) return kWalkFailed;
 
     const uint32_t allowance = static_cast<uint32_t>(flag);
     Deferred deferred;
@@ -191,18 +217,20 @@ int32_t ASF_ParseFilePropertyObj(int h, _MMClipInfo* clip) {
     // Size, File ID, File Size, Creation Date, Data Packets Count, Play and
     // Send Duration, Preroll, Flags, Minimum and Maximum Data Packet Size,
     // Maximum Bitrate.
-    uint8_t b[88];
+    uint8_t b[kAsfFileFieldsSize];
     ReadOrZero(h, b, sizeof b);
-    uint64_t fileSize = ReadLE64(b + 24);
-    uint64_t playDuration = ReadLE64(b + 48);
-    uint32_t preroll = ReadLE32(b + 64);
-    clip->nFileSize = static_cast<uint32_t>(fileSize);
+    const AsfFileFields p = ASF_DecodeFileFields(b);
+    clip->nFileSize = static_cast<uint32_t>(p.fileSize);
     // Milliseconds as a signed 32-bit value: a Preroll longer than the play
     // time gives a negative duration, truncated toward zero.
-    int32_t ms = static_cast<int32_t>(static_cast<uint32_t>(playDuration / 10000 - preroll));
+    int32_t ms = static_cast<int32_t>(static_cast<uint32_t>(p.playDuration / 10000 - p.preroll));
     clip->nDuration = static_cast<uint32_t>(ms / 1000);
-    clip->nBitrate = ReadLE32(b + 84);
+    clip->nBitrate = p.maxBitrate;
     return 0;
+}
+
+AsfFileFields ASF_DecodeFileFields(const uint8_t* b) {
+    return AsfFileFields{ReadLE64(b + 24), ReadLE64(b + 48), ReadLE32(b + 64), ReadLE32(b + 84)};
 }
 
 int32_t ASF_GetVideoIndex(int h, uint32_t* videoStream) {

@@ -112,14 +112,84 @@ int32_t TakeValue(int h, _MMMetaInfo* meta, const uint8_t* name, uint32_t nameLe
     return SeekBy(h, length) ? 0 : kBroken;
 }
 
-// Reads a name of `length` bytes and narrows it; null when it cannot be read.
-Buffer ReadName(int h, uint16_t length, uint32_t* narrowed) {
-    Buffer name = ReadBuffer(h, length);
-    if (name != nullptr) *narrowed = ASF_unicode2ascii(name.get(), length);
-    return name;
-}
+// The record's projection of the descriptors: names narrowed to their low
+// bytes, the first value of each item kept, the rating as its word.
+class MetaSink : public AsfAttributeSink {
+public:
+    MetaSink(_MMMetaInfo* meta, uint32_t allowance) : meta_(meta), allowance_(allowance) {}
+
+    int32_t Description(int h, uint32_t field, uint16_t length) override {
+        static const int kItems[] = {META_TITLE, META_ARTIST, META_COPYRIGHT, META_COMMENT};
+        if (field < 4) return FillItem(h, &meta_->aItems[kItems[field]], length, kStringEncoding) ? 0 : kBroken;
+        Buffer rating = ReadBuffer(h, length);
+        if (rating == nullptr) return kBroken;
+        ASF_ConvertRating(length, rating.get(), meta_);
+        return 0;
+    }
+
+    int32_t Attribute(int h, const AsfAttribute& a) override {
+        Buffer name(new (std::nothrow) uint8_t[a.nameLength == 0 ? 1 : a.nameLength]);
+        if (name == nullptr) return kBroken;
+        if (a.nameLength != 0) std::memcpy(name.get(), a.name, a.nameLength);
+        const uint32_t narrowed = ASF_unicode2ascii(name.get(), a.nameLength);
+        return TakeValue(h, meta_, name.get(), narrowed, a.type, a.length, allowance_);
+    }
+
+private:
+    _MMMetaInfo* meta_;
+    uint32_t allowance_;
+};
 
 }  // namespace
+
+int32_t ASF_WalkContentDescription(int h, AsfAttributeSink* sink) {
+    uint8_t b[8 + 10];
+    if (!ReadExact(h, b, sizeof b)) return kBroken;
+    for (uint32_t field = 0; field < 5; ++field) {
+        const int32_t result = sink->Description(h, field, ReadLE16(b + 8 + 2 * field));
+        if (result != 0) return result;
+    }
+    return 0;
+}
+
+int32_t ASF_WalkExtContentDescription(int h, AsfAttributeSink* sink) {
+    uint8_t b[8 + 2];
+    if (!ReadExact(h, b, sizeof b)) return kBroken;
+    uint16_t count = ReadLE16(b + 8);
+    for (uint32_t i = 0; i < count; ++i) {
+        uint16_t nameLength = 0;
+        if (!Read16(h, &nameLength)) return kBroken;
+        Buffer name = ReadBuffer(h, nameLength);
+        if (name == nullptr) return kBroken;
+        uint16_t type = 0;
+        uint16_t valueLength = 0;
+        if (!Read16(h, &type) || type > kMaxDataType) return kBroken;
+        if (!Read16(h, &valueLength)) return kBroken;
+        const int32_t result = sink->Attribute(h, AsfAttribute{name.get(), nameLength, type, valueLength, true});
+        if (result != 0) return result;
+    }
+    return 0;
+}
+
+int32_t ASF_WalkMetaData(int h, AsfAttributeSink* sink) {
+    uint16_t count = 0;
+    if (!Read16(h, &count)) return kBroken;
+    for (uint32_t i = 0; i < count; ++i) {
+        // Reserved or Language List Index, Stream Number, Name Length,
+        // Data Type, Data Length.
+        uint8_t r[12];
+        if (!ReadExact(h, r, sizeof r)) return kBroken;
+        uint16_t nameLength = ReadLE16(r + 4);
+        uint16_t type = ReadLE16(r + 6);
+        uint32_t length = ReadLE32(r + 8);
+        if (type > kMaxDataType) return kBroken;
+        Buffer name = ReadBuffer(h, nameLength);
+        if (name == nullptr) return kBroken;
+        const int32_t result = sink->Attribute(h, AsfAttribute{name.get(), nameLength, type, length, false});
+        if (result != 0) return result;
+    }
+    return 0;
+}
 
 int32_t ASF_InitMetaInfo(_MMMetaInfo* meta) {
     if (meta == nullptr) return -1;
@@ -139,19 +209,8 @@ int32_t ASF_InitMetaInfo(_MMMetaInfo* meta) {
 }
 
 int32_t ASF_ParseContentDescriptionObj(int h, _MMMetaInfo* meta) {
-    uint8_t b[8 + 10];
-    if (!ReadExact(h, b, sizeof b)) return kBroken;
-    static const int kItems[] = {META_TITLE, META_ARTIST, META_COPYRIGHT, META_COMMENT};
-    for (size_t i = 0; i < 4; ++i) {
-        if (!FillItem(h, &meta->aItems[kItems[i]], ReadLE16(b + 8 + 2 * i), kStringEncoding)) {
-            return kBroken;
-        }
-    }
-    uint16_t ratingLength = ReadLE16(b + 16);
-    Buffer rating = ReadBuffer(h, ratingLength);
-    if (rating == nullptr) return kBroken;
-    ASF_ConvertRating(ratingLength, rating.get(), meta);
-    return 0;
+    MetaSink sink(meta, 0);
+    return ASF_WalkContentDescription(h, &sink);
 }
 
 void ASF_ConvertRating(uint16_t length, uint8_t* text, _MMMetaInfo* meta) {
@@ -210,45 +269,16 @@ int32_t ASF_ParseContentBrandingObj(int h, _MMMetaInfo* meta, uint32_t allowance
 }
 
 int32_t ASF_ParseExtContentDescriptionObj(int h, _MMMetaInfo* meta, uint32_t allowance) {
-    uint8_t b[8 + 2];
-    if (!ReadExact(h, b, sizeof b)) return kBroken;
-    uint16_t count = ReadLE16(b + 8);
-    for (uint32_t i = 0; i < count; ++i) {
-        uint16_t nameLength = 0;
-        if (!Read16(h, &nameLength)) return kBroken;
-        uint32_t narrowed = 0;
-        Buffer name = ReadName(h, nameLength, &narrowed);
-        if (name == nullptr) return kBroken;
-        uint16_t type = 0;
-        uint16_t valueLength = 0;
-        if (!Read16(h, &type) || type > kMaxDataType) return kBroken;
-        if (!Read16(h, &valueLength)) return kBroken;
-        if (TakeValue(h, meta, name.get(), narrowed, type, valueLength, allowance) != 0) return kBroken;
-    }
-    return 0;
+    MetaSink sink(meta, allowance);
+    return ASF_WalkExtContentDescription(h, &sink);
 }
 
 int32_t ASF_ParseMetaDataObj(int h, _MMMetaInfo* meta, uint32_t allowance) {
-    uint16_t count = 0;
-    if (!Read16(h, &count)) return kBroken;
-    for (uint32_t i = 0; i < count; ++i) {
-        // Reserved or Language List Index, Stream Number, Name Length,
-        // Data Type, Data Length.
-        uint8_t r[12];
-        if (!ReadExact(h, r, sizeof r)) return kBroken;
-        uint16_t nameLength = ReadLE16(r + 4);
-        uint16_t type = ReadLE16(r + 6);
-        uint32_t length = ReadLE32(r + 8);
-        if (type > kMaxDataType) return kBroken;
-        uint32_t narrowed = 0;
-        Buffer name = ReadName(h, nameLength, &narrowed);
-        if (name == nullptr) return kBroken;
-        if (TakeValue(h, meta, name.get(), narrowed, type, length, allowance) != 0) return kBroken;
-    }
-    return 0;
+    MetaSink sink(meta, allowance);
+    return ASF_WalkMetaData(h, &sink);
 }
 
-int32_t ASF_ParseHdrExtensionObj(int h, _MMMetaInfo* meta, uint32_t allowance) {
+int32_t ASF_WalkHdrExtension(int h, AsfExtensionVisitor* visitor) {
     // Size, Reserved Field 1 and 2, then Header Extension Data Size.
     uint8_t b[30];
     if (!ReadExact(h, b, sizeof b)) return kBroken;
@@ -260,14 +290,27 @@ int32_t ASF_ParseHdrExtensionObj(int h, _MMMetaInfo* meta, uint32_t allowance) {
         uint32_t size = ReadLE32(head + 16);
         // An object smaller than its own header would never move the walk on.
         if (size < kObjectHeaderSize) return kBroken;
-        if (SameGuid(head, ASF_Metadata_Object) || SameGuid(head, ASF_Metadata_Library_Object)) {
-            if (ASF_ParseMetaDataObj(h, meta, allowance) != 0) return kBroken;
-        } else if (!SeekBy(h, static_cast<int64_t>(size) - kObjectHeaderSize)) {
-            return kBroken;
-        }
+        const int32_t result = visitor->Inner(h, head, ReadLE64(head + 16));
+        if (result != 0) return result;
         total += size;
     }
     return 0;
+}
+
+int32_t ASF_ParseHdrExtensionObj(int h, _MMMetaInfo* meta, uint32_t allowance) {
+    struct : AsfExtensionVisitor {
+        _MMMetaInfo* meta;
+        uint32_t allowance;
+        int32_t Inner(int file, const uint8_t* guid, uint64_t size) override {
+            if (SameGuid(guid, ASF_Metadata_Object) || SameGuid(guid, ASF_Metadata_Library_Object)) {
+                return ASF_ParseMetaDataObj(file, meta, allowance) != 0 ? kBroken : 0;
+            }
+            return SeekBy(file, static_cast<int64_t>(static_cast<uint32_t>(size)) - kObjectHeaderSize) ? 0 : kBroken;
+        }
+    } visitor;
+    visitor.meta = meta;
+    visitor.allowance = allowance;
+    return ASF_WalkHdrExtension(h, &visitor);
 }
 
 int32_t ASF_ParseWMPicturObj(const uint8_t* value, _MMMetaInfo* meta, uint32_t length, uint32_t allowance) {

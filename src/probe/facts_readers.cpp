@@ -1,6 +1,7 @@
 #include "probe/facts_readers.h"
 
 #include "aac/aac_facts.h"
+#include "asf/asf_facts.h"
 #include "avi/avi_queries.h"
 #include "core/file_access.h"
 #include "core/quirks.h"
@@ -48,7 +49,7 @@ const FactsReader kFactsReaders[MM_MEDIA_SLOTS] = {
     /* 1 MP3 */ ReadMp3,
     /* 2 RealMedia */ nullptr,
     /* 3 MP4 */ nullptr,
-    /* 4 ASF */ nullptr,
+    /* 4 ASF */ AsfFacts,
     /* 5 MIDI */ nullptr,
     /* 6 AAC */ ReadAac,
     /* 7 WAVE */ ReadWave,
