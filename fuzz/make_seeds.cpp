@@ -82,6 +82,7 @@ const std::vector<Route>& Routes() {
 
 void PutForType(int type, const std::string& name, const Seed& bytes) {
     Put("detect", name, bytes);
+    Put("probe", name, bytes);
     for (const Route& r : Routes()) {
         if (r.type != type) continue;
         for (const std::string& t : r.targets) Put(t, name, bytes);

@@ -16,7 +16,7 @@ set -euo pipefail
 root=$(cd "$(dirname "$0")/.." && pwd)
 build=${FUZZ_BUILD:-$root/build-fuzz}
 work=${FUZZ_WORK:-$build/fuzz-work}
-all_targets=(detect mp3 mp4 aac asf realmedia avi speech extract avi_parser mp4_maker)
+all_targets=(detect mp3 mp4 aac asf realmedia avi speech extract avi_parser mp4_maker probe)
 seconds=60
 jobs=1
 build_first=1
@@ -35,7 +35,7 @@ usage() { sed -n '2,16p' "$0" | sed 's/^# \{0,1\}//'; exit 2; }
 # targets that see every format.
 dicts_of() {
   case $1 in
-    detect) echo mp3 aac mp4 asf realmedia avi speech ;;
+    detect | probe) echo mp3 aac mp4 asf realmedia avi speech ;;
     extract) echo mp3 aac speech ;;
     avi_parser) echo avi ;;
     mp4_maker) echo mp4 ;;
