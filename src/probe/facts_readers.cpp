@@ -1,6 +1,7 @@
 #include "probe/facts_readers.h"
 
 #include "metainfo/metainfo.h"
+#include "mp4/mp4_facts.h"
 #include "probe/contract_facts.h"
 
 namespace metainfo {
@@ -9,7 +10,9 @@ namespace {
 using FactsReader = int32_t (*)(const char* path, int type, MediaFacts* facts);
 
 // A null row reads the MM_ answers.
-const FactsReader kFactsReaders[MM_MEDIA_SLOTS] = {};
+const FactsReader kFactsReaders[MM_MEDIA_SLOTS] = {
+    nullptr, nullptr, nullptr, Mp4Facts,  // MEDIA_TYPE_MP4
+};
 
 }  // namespace
 
