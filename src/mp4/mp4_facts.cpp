@@ -59,14 +59,31 @@ int64_t TrackMicros(const Mp4Truth& truth, const Mp4TrackTruth& t) {
     return t.timescale != 0 && t.duration != 0 ? Micros(t.duration, t.timescale) : -1;
 }
 
+// A 3GPP brand: "3gp4", "3gp6", ... and 3GPP2's "3g2a" (*second).
 bool Is3gpBrand(uint32_t brand, bool* second) {
+    if ((brand >> 16) != (FourCC("3g  ") >> 16)) return false;
     *second = (brand >> 8) == (FourCC("3g2a") >> 8);
-    return (brand >> 16) == (FourCC("3g  ") >> 16);
+    return true;
+}
+
+// 3GPP by the major brand, or by a compatible one under a maker's own major
+// brand ("kddi").
+bool Is3gpFile(const Mp4Truth& truth, bool* second) {
+    if (Is3gpBrand(truth.majorBrand, second)) return true;
+    static const uint32_t kMp4Brands[] = {FourCC("isom"), FourCC("iso2"), FourCC("mp41"), FourCC("mp42"),
+                                          FourCC("M4A "), FourCC("M4B "), FourCC("M4V "), FourCC("qt  ")};
+    for (uint32_t b : kMp4Brands) {
+        if (b == truth.majorBrand) return false;
+    }
+    for (uint32_t b : truth.brands) {
+        if (Is3gpBrand(b, second)) return true;
+    }
+    return false;
 }
 
 std::string MimeOf(const Mp4Truth& truth, bool hasVideo) {
     bool second = false;
-    if (Is3gpBrand(truth.majorBrand, &second))
+    if (Is3gpFile(truth, &second))
         return std::string(hasVideo ? "video/" : "audio/") + (second ? "3gpp2" : "3gpp");
     if (truth.majorBrand == FourCC("qt  ")) return "video/quicktime";
     return hasVideo ? "video/mp4" : "audio/mp4";
@@ -81,8 +98,10 @@ void AddStream(const Mp4TrackTruth& t, MediaFacts* f) {
     }
     // The media's bytes over the media's length, as ffprobe tells a stream's
     // rate; a rate the codec box states where the samples are not counted.
+    // AC-3 frames carry padding and a nominal rate, which ffprobe tells.
+    const bool nominal = t.declaredBitrate != 0 && (s.codec == "ac3" || s.codec == "eac3");
     const uint64_t duration = t.duration != 0 ? t.duration : t.sttsDuration;
-    if (t.bytesKnown && t.sampleBytes != 0 && duration != 0) {
+    if (!nominal && t.bytesKnown && t.sampleBytes != 0 && duration != 0) {
         s.bitRate = MulDiv(t.sampleBytes * 8, t.timescale, duration);
     } else {
         s.bitRate = t.declaredBitrate;
