@@ -1,6 +1,7 @@
 // A track's first sample entry as the accurate reader tells it: the codec in
 // ffprobe's words, its profile and level, and the stream's shape, from the
 // entry and the codec boxes inside it.
+#include <cmath>
 #include <cstring>
 
 #include "core/byte_reader.h"
@@ -49,7 +50,7 @@ const char* Lookup(const Named* table, size_t n, uint32_t code) {
 }
 
 // Sample entry types whose codec needs no codec box.
-const Named kEntryCodecs[] = {
+constexpr Named kEntryCodecs[] = {
     {FourCC("samr"), "amr_nb"},    {FourCC("sawb"), "amr_wb"},    {FourCC("Opus"), "opus"},
     {FourCC("fLaC"), "flac"},      {FourCC("alac"), "alac"},      {FourCC("ac-3"), "ac3"},
     {FourCC("ec-3"), "eac3"},      {FourCC(".mp3"), "mp3"},       {FourCC("sowt"), "pcm_s16le"},
@@ -67,7 +68,7 @@ const Named kEntryCodecs[] = {
 };
 
 // MPEG-4 object types of "esds" in ffprobe's words.
-const Named kObjectTypes[] = {
+constexpr Named kObjectTypes[] = {
     {0x20, "mpeg4"},      {0x21, "h264"},       {0x23, "hevc"},       {0x40, "aac"},        {0x60, "mpeg2video"},
     {0x61, "mpeg2video"}, {0x62, "mpeg2video"}, {0x63, "mpeg2video"}, {0x64, "mpeg2video"}, {0x65, "mpeg2video"},
     {0x66, "aac"},        {0x67, "aac"},        {0x68, "aac"},        {0x69, "mp3"},        {0x6A, "mpeg1video"},
@@ -75,7 +76,7 @@ const Named kObjectTypes[] = {
     {0xAD, "opus"},       {0xDD, "vorbis"},     {0xE1, "qcelp"},
 };
 
-const Named kAacProfiles[] = {{1, "Main"}, {2, "LC"}, {3, "SSR"}, {4, "LTP"}, {23, "LD"}, {39, "ELD"}};
+constexpr Named kAacProfiles[] = {{1, "Main"}, {2, "LC"}, {3, "SSR"}, {4, "LTP"}, {23, "LD"}, {39, "ELD"}};
 
 const char* const kMpeg4Profiles[16] = {"Simple Profile",
                                         "Simple Scalable Profile",
@@ -182,9 +183,8 @@ void AudioCodecBox(const View& v, uint64_t children, StreamFacts* s, uint64_t* d
     View box{nullptr, 0};
     View wave{nullptr, 0};
     // QuickTime keeps the codec boxes of a sound entry inside "wave".
-    if (FindChild(v, children, FourCC("wave"), &wave) && FindChild(wave, 0, FourCC("esds"), &box)) {
-        EsdsFacts(box, s, declared);
-    } else if (FindChild(v, children, FourCC("esds"), &box)) {
+    const bool inWave = FindChild(v, children, FourCC("wave"), &wave) && FindChild(wave, 0, FourCC("esds"), &box);
+    if (inWave || FindChild(v, children, FourCC("esds"), &box)) {
         EsdsFacts(box, s, declared);
     } else if (FindChild(v, children, FourCC("dfLa"), &box) && box.Has(0, 26)) {
         // Full-box word, block header, then STREAMINFO: rate 20 bits, channels 3, depth 5.
@@ -203,9 +203,9 @@ void AudioCodecBox(const View& v, uint64_t children, StreamFacts* s, uint64_t* d
         const uint32_t bits = uint32_t(box.U8(0)) << 16 | uint32_t(box.U8(1)) << 8 | box.U8(2);
         if ((bits >> 22) < 3) s->sampleRate = kAc3Rates[bits >> 22];
         s->channels = kAc3Channels[(bits >> 11) & 7] + ((bits >> 10) & 1);
-        if (((bits >> 5) & 0x1F) < 19) *declared = kAc3Kbps[(bits >> 5) & 0x1F] * 1000u;
+        if (((bits >> 5) & 0x1F) < 19) *declared = uint64_t{kAc3Kbps[(bits >> 5) & 0x1F]} * 1000;
     } else if (FindChild(v, children, FourCC("dec3"), &box) && box.Has(0, 5)) {
-        *declared = (box.U16(0) >> 3) * 1000u;
+        *declared = (uint64_t{box.U16(0)} >> 3) * 1000;
         // The first independent substream.
         const uint32_t sub = uint32_t(box.U8(2)) << 16 | uint32_t(box.U8(3)) << 8 | box.U8(4);
         if ((sub >> 22) < 3) s->sampleRate = kAc3Rates[sub >> 22];
@@ -234,7 +234,7 @@ void AudioEntryFacts(const View& v, uint32_t type, StreamFacts* s, uint64_t* dec
         double rate = 0;
         const uint64_t raw = uint64_t(v.U32(40)) << 32 | v.U32(44);
         std::memcpy(&rate, &raw, sizeof rate);
-        s->sampleRate = rate > 0 && rate < 1e7 ? static_cast<uint32_t>(rate + 0.5) : 0;
+        s->sampleRate = rate > 0 && rate < 1e7 ? static_cast<uint32_t>(std::lround(rate)) : 0;
         s->channels = v.U32(48);
         s->bitsPerSample = v.U32(56);
         flags = v.U32(60);
