@@ -171,7 +171,8 @@ void VideoCodecBox(const View& v, uint64_t children, StreamFacts* s, uint64_t* d
     } else if (FindChild(v, children, FourCC("esds"), &box)) {
         EsdsFacts(box, s, declared);
     }
-    if (FindChild(v, children, FourCC("btrt"), &box) && box.Has(0, 12)) *declared = box.U32(8);
+    // A codec box's own rate wins over the generic one.
+    if (*declared == 0 && FindChild(v, children, FourCC("btrt"), &box) && box.Has(0, 12)) *declared = box.U32(8);
 }
 
 // Codec boxes of audio entries that state rate, channels and depth.
@@ -211,7 +212,8 @@ void AudioCodecBox(const View& v, uint64_t children, StreamFacts* s, uint64_t* d
         if ((sub >> 22) < 3) s->sampleRate = kAc3Rates[sub >> 22];
         s->channels = kAc3Channels[(sub >> 9) & 7] + ((sub >> 8) & 1);
     }
-    if (FindChild(v, children, FourCC("btrt"), &box) && box.Has(0, 12)) *declared = box.U32(8);
+    // A codec box's own rate wins over the generic one.
+    if (*declared == 0 && FindChild(v, children, FourCC("btrt"), &box) && box.Has(0, 12)) *declared = box.U32(8);
 }
 
 // PCM names by sign, depth and byte order.
