@@ -17,12 +17,15 @@ namespace {
 // value * mul / div without overflow for the sizes and times of a file.
 uint64_t MulDiv(uint64_t value, uint64_t mul, uint64_t div) {
     if (div == 0) return 0;
-    return static_cast<uint64_t>(static_cast<long double>(value) * mul / div);
+    const long double q = static_cast<long double>(value) * mul / div;
+    // A hostile file's times can make any rate; no answer beyond 2^63 is one.
+    return q < 9.2e18L ? static_cast<uint64_t>(q) : 0;
 }
 
 // Ticks of a timescale in microseconds, rounded.
 int64_t Micros(uint64_t ticks, uint32_t timescale) {
     const uint64_t whole = ticks / timescale, part = ticks % timescale;
+    if (whole > (uint64_t{1} << 42)) return -1;  // past a hundred years: no length a file has
     return static_cast<int64_t>(whole * 1000000 + (part * 1000000 + timescale / 2) / timescale);
 }
 
@@ -83,8 +86,7 @@ bool Is3gpFile(const Mp4Truth& truth, bool* second) {
 
 std::string MimeOf(const Mp4Truth& truth, bool hasVideo) {
     bool second = false;
-    if (Is3gpFile(truth, &second))
-        return std::string(hasVideo ? "video/" : "audio/") + (second ? "3gpp2" : "3gpp");
+    if (Is3gpFile(truth, &second)) return std::string(hasVideo ? "video/" : "audio/") + (second ? "3gpp2" : "3gpp");
     if (truth.majorBrand == FourCC("qt  ")) return "video/quicktime";
     return hasVideo ? "video/mp4" : "audio/mp4";
 }
