@@ -19,9 +19,12 @@ struct Quirks {
     bool adtsStopsAtForeignBytes;
     // An AAC-LC stream at 88.2 kHz or more reads as SBR at twice the rate.
     bool aacHighRateIsSbr;
+    // An MPEG-4 audio configuration that opens with object type 29 (SBR with
+    // parametric stereo) is not read: plain AAC of no known profile.
+    bool aacPsConfigUnread;
 };
 
-inline constexpr Quirks kContract{true, true, true, true, true};
-inline constexpr Quirks kAccurate{false, false, false, false, false};
+inline constexpr Quirks kContract{true, true, true, true, true, true};
+inline constexpr Quirks kAccurate{false, false, false, false, false, false};
 
 }  // namespace metainfo

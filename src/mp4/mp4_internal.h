@@ -6,6 +6,7 @@
 #include <cstdint>
 
 #include "core/list_node.h"
+#include "core/quirks.h"
 #include "metainfo/records.h"
 
 namespace metainfo {
@@ -69,12 +70,16 @@ struct MP4TrackNode {
     uint32_t bitsOrFrameRate;
 };
 
+struct Mp4Truth;
+
 struct _ME_ClipInfoEx {
     _MMClipInfo clip;
     MP4TrackNode* tracks;  // head of the ring, null without "trak"
     // Set by a codec query, which walks the same boxes but reports no bit
     // rate: no sample-size table is summed for it.
     bool codecOnly;
+    // The accurate reader's record, filled by the same walk; null for MM_ calls.
+    Mp4Truth* truth;
 };
 
 // The node being filled: the last one of the ring (null without any).
@@ -164,10 +169,23 @@ struct mp4AudioSpecificConfig {
     uint8_t extensionFlag;
     int8_t sbrPresentFlag;
     uint8_t implicitSbr;
+    uint8_t psPresentFlag;
 };
 // bits must hold kAscBufferSize readable bytes (zero padding past the data).
 constexpr size_t kAscBufferSize = 512;
-int32_t AudioSpecificConfig(const uint8_t* bits, mp4AudioSpecificConfig* asc);
+int32_t AudioSpecificConfig(const uint8_t* bits, mp4AudioSpecificConfig* asc, const Quirks& quirks);
+
+// The fields of an "esds" box (from its header); dsi: the decoder-specific
+// information, null when the box ends before it.
+struct EsdsFields {
+    uint8_t objectType = 0;
+    uint32_t maxBitrate = 0;
+    uint32_t avgBitrate = 0;
+    const uint8_t* dsi = nullptr;
+    size_t dsiAvail = 0;
+};
+// MM_OK once the bit rates are read; kMp4BadEntry when not an "esds".
+int32_t ReadEsds(const uint8_t* esds, size_t avail, EsdsFields* fields);
 
 // User data (mp4_udta.cpp).
 int32_t AnaUdta(int h, int mode, void* out);
@@ -176,6 +194,11 @@ int32_t AnaIlst(int h, _MMMetaInfo* meta);
 int32_t AnaID32(int h, _MMMetaInfo* meta);
 uint32_t judgeLangue(const char* data);
 void GenreToString(_MMMetaItem* item);
+// A 3GPP text box ("titl", "albm", ...) whole in buf: its text's bytes
+// (album: without the trailing track byte). False when it is not one.
+bool Read3gppText(const uint8_t* buf, size_t avail, bool album, const uint8_t** text, size_t* length);
+// A "yrrc" box whole in buf.
+bool Read3gppYear(const uint8_t* buf, size_t avail, uint16_t* year);
 
 // Maker boxes (mp4_maker.cpp).
 int32_t AnaMaker(int h, _MAKERINFO* maker);

@@ -9,6 +9,7 @@
 #include "mp4/mp4_internal.h"
 #include "core/codes.h"
 #include "mp4/mp4_qcp_bridge.h"
+#include "mp4/mp4_truth.h"
 
 namespace metainfo {
 namespace {
@@ -222,7 +223,7 @@ size_t AnaBaseDescriptor(const uint8_t* descriptor, size_t avail) {
     return length + 1;
 }
 
-int32_t AudioSpecificConfig(const uint8_t* bits, mp4AudioSpecificConfig* asc) {
+int32_t AudioSpecificConfig(const uint8_t* bits, mp4AudioSpecificConfig* asc, const Quirks& quirks) {
     if (bits == nullptr) return -7;
     if (asc == nullptr) return -8;
     std::memset(asc, 0, sizeof *asc);
@@ -237,7 +238,8 @@ int32_t AudioSpecificConfig(const uint8_t* bits, mp4AudioSpecificConfig* asc) {
     asc->samplingFrequency = kSamplingFrequencies[asc->samplingFrequencyIndex];
     if (asc->channelConfiguration >= 8) return -3;
     asc->sbrPresentFlag = -1;
-    if (asc->audioObjectType == 5) {
+    if (asc->audioObjectType == 29 && !quirks.aacPsConfigUnread) asc->psPresentFlag = 1;
+    if (asc->audioObjectType == 5 || asc->psPresentFlag == 1) {
         asc->sbrPresentFlag = 1;
         asc->samplingFrequency = ExtensionFrequency(&b, &asc->samplingFrequencyIndex);
         asc->audioObjectType = static_cast<uint8_t>(b.Get(5));
@@ -260,6 +262,7 @@ int32_t AudioSpecificConfig(const uint8_t* bits, mp4AudioSpecificConfig* asc) {
             if (asc->sbrPresentFlag == 0) return MM_OK;
             uint8_t index = 0;
             asc->samplingFrequency = ExtensionFrequency(&b, &index);
+            if (b.GetWide(11) == 0x548) asc->psPresentFlag = static_cast<uint8_t>(b.Get(1));
         }
     }
     if (asc->sbrPresentFlag == -1 && asc->samplingFrequency <= 24000) {
@@ -270,9 +273,7 @@ int32_t AudioSpecificConfig(const uint8_t* bits, mp4AudioSpecificConfig* asc) {
     return MM_OK;
 }
 
-int32_t AnaESDBox(const uint8_t* esds, size_t avail, int kind, _ME_ClipInfoEx* info) {
-    MP4TrackNode* node = CurrentTrack(info);
-    if (node == nullptr) return MM_E_FAIL;
+int32_t ReadEsds(const uint8_t* esds, size_t avail, EsdsFields* fields) {
     _MP4BOX box;
     const int header = AnaBox(esds, avail, &box);
     if (header == 0 || box.type != FourCC("esds")) return kMp4BadEntry;
@@ -286,9 +287,24 @@ int32_t AnaESDBox(const uint8_t* esds, size_t avail, int kind, _ME_ClipInfoEx* i
     // Decoder configuration descriptor.
     if (!r.Skip(AnaBaseDescriptor(esds + r.position(), r.remaining()))) return MM_E_FAIL;
     const size_t oti = r.position();
-    uint8_t objectType = 0;
-    uint32_t avgBitrate = 0;
-    if (!r.U8(&objectType) || !r.Skip(8) || !r.BE32(&avgBitrate)) return MM_E_FAIL;
+    if (!r.U8(&fields->objectType) || !r.Skip(4) || !r.BE32(&fields->maxBitrate) || !r.BE32(&fields->avgBitrate))
+        return MM_E_FAIL;
+    // Decoder-specific information, 13 bytes after the object type.
+    if (r.Seek(oti + 13) && !r.empty() && r.Skip(AnaBaseDescriptor(esds + r.position(), r.remaining()))) {
+        fields->dsi = esds + r.position();
+        fields->dsiAvail = r.remaining();
+    }
+    return MM_OK;
+}
+
+int32_t AnaESDBox(const uint8_t* esds, size_t avail, int kind, _ME_ClipInfoEx* info) {
+    MP4TrackNode* node = CurrentTrack(info);
+    if (node == nullptr) return MM_E_FAIL;
+    EsdsFields fields;
+    const int32_t read = ReadEsds(esds, avail, &fields);
+    if (read != MM_OK) return read;
+    const uint8_t objectType = fields.objectType;
+    const uint32_t avgBitrate = fields.avgBitrate;
     if (kind == kVideo) {
         info->clip.nVideoBitrate = avgBitrate;
         node->bitrate = avgBitrate;
@@ -296,17 +312,16 @@ int32_t AnaESDBox(const uint8_t* esds, size_t avail, int kind, _ME_ClipInfoEx* i
     }
     info->clip.nAudioBitrate = avgBitrate;
     node->bitrate = avgBitrate;
-    // Decoder-specific information, 13 bytes after the object type.
-    if (!r.Seek(oti + 13) || r.empty()) return MM_E_FAIL;
-    if (!r.Skip(AnaBaseDescriptor(esds + r.position(), r.remaining()))) return MM_E_FAIL;
-    const uint8_t* payload = esds + r.position();
+    if (fields.dsi == nullptr) return MM_E_FAIL;
+    ByteReader r(fields.dsi, fields.dsiAvail);
+    const uint8_t* payload = fields.dsi;
     if (objectType == 0xE1) return AnaQLCM(payload, r.remaining(), info, node);
     // The bit syntax reads without bounds of its own: a zero-padded copy
     // holds more than the longest configuration can reach.
     uint8_t bits[kAscBufferSize] = {0};
     std::memcpy(bits, payload, r.remaining() < sizeof bits ? r.remaining() : sizeof bits);
     mp4AudioSpecificConfig asc;
-    AudioSpecificConfig(bits, &asc);
+    AudioSpecificConfig(bits, &asc, kContract);
     node->codec = asc.sbrPresentFlag == 1 ? CODEC_MP4AUDIO_MP4A_AAC_PLUS_V1 : CODEC_MP4AUDIO_MP4A_AAC;
     switch (asc.audioObjectType) {
         case 1: node->codecDetail = PROFILE_AAC_MAIN; break;
@@ -334,6 +349,8 @@ int32_t AnaStsd(int h, uint32_t /*handlerType*/, _ME_ClipInfoEx* info) {
     const Entry e{buf.data + at + 4, buf.size - at - 4};
     _MP4BOX entry;
     if (AnaBox(e.data, e.avail, &entry) == 0) return MM_E_FAIL;
+    if (info->truth != nullptr && info->truth->Track() != nullptr)
+        SampleEntryFacts(e.data, e.avail, info->truth->Track());
     _MMClipInfo& clip = info->clip;
     switch (entry.type) {
         case FourCC("mp4a"): ++clip.bHasAudio; return AnaMp4aSampleEntry(e, info, node);
@@ -355,11 +372,11 @@ int32_t AnaStsd(int h, uint32_t /*handlerType*/, _ME_ClipInfoEx* info) {
 namespace {
 
 // Sum of n big-endian 32-bit sample sizes from the current position, read in
-// blocks; 32-bit arithmetic, wrapping as it always has.
-uint32_t SumSampleSizes(int h, uint64_t n) {
+// blocks.
+uint64_t SumSampleSizes(int h, uint64_t n) {
     constexpr size_t kBlock = 16384;
     uint8_t block[kBlock * 4];
-    uint32_t total = 0;
+    uint64_t total = 0;
     while (n > 0) {
         const size_t want = n < kBlock ? static_cast<size_t>(n) : kBlock;
         // Counted in bytes: a protected file's reads answer bytes, not items.
@@ -370,6 +387,13 @@ uint32_t SumSampleSizes(int h, uint64_t n) {
         if (entries < want) break;
     }
     return total;
+}
+
+// The bytes of all samples: the one size times the count, or the table summed.
+uint64_t StreamBytes(int h, uint64_t held, uint32_t sampleSize, uint32_t sampleCount) {
+    if (sampleSize != 0) return uint64_t(sampleSize) * sampleCount;
+    const uint64_t entries = (held - 20) / 4;
+    return SumSampleSizes(h, sampleCount < entries ? sampleCount : entries);
 }
 
 }  // namespace
@@ -387,6 +411,11 @@ int32_t AnaStsz(int h, uint32_t handlerType, _ME_ClipInfoEx* info) {
     if (MEx_fread(fields, 1, sizeof fields, h) != static_cast<int>(sizeof fields)) return MM_E_FAIL;
     const uint32_t sampleSize = ReadBE32(fields + 4);
     const uint32_t sampleCount = ReadBE32(fields + 8);
+    Mp4TrackTruth* truth = info->truth != nullptr ? info->truth->Track() : nullptr;
+    if (truth != nullptr) {
+        truth->sampleBytes = StreamBytes(h, held, sampleSize, sampleCount);
+        truth->bytesKnown = true;
+    }
     const int32_t duration = static_cast<int32_t>(info->clip.nDuration);
     if (duration <= 0) return MM_OK;
     MP4TrackNode* node = CurrentTrack(info);
@@ -400,11 +429,9 @@ int32_t AnaStsz(int h, uint32_t handlerType, _ME_ClipInfoEx* info) {
     // The sum only feeds a bit rate the sample entry left unknown.
     uint32_t* field = video ? &info->clip.nVideoBitrate : audio ? &info->clip.nAudioBitrate : nullptr;
     if (field == nullptr || *field != 0 || info->codecOnly) return MM_OK;
-    uint32_t total = sampleSize * sampleCount;
-    if (sampleSize == 0) {
-        const uint64_t entries = (held - 20) / 4;
-        total = SumSampleSizes(h, sampleCount < entries ? sampleCount : entries);
-    }
+    // 32-bit arithmetic, wrapping as it always has.
+    const auto total =
+        static_cast<uint32_t>(truth != nullptr ? truth->sampleBytes : StreamBytes(h, held, sampleSize, sampleCount));
     const int32_t bits = static_cast<int32_t>(total * 8u);
     *field = static_cast<uint32_t>(bits / duration);
     if (node != nullptr) node->bitrate = *field;

@@ -270,6 +270,23 @@ int32_t AnaData(int h, _DATA* data) {
 
 }  // namespace
 
+bool Read3gppText(const uint8_t* buf, size_t avail, bool album, const uint8_t** text, size_t* length) {
+    _INFOBOX box;
+    if (ParseTextBox(buf, avail, album, &box) != MM_OK || box.text == nullptr) return false;
+    // The box's own bytes: the text lies right after the language word.
+    const size_t at = static_cast<size_t>(AnaFullBox(buf, avail, &box.header)) + 2;
+    *text = buf + at;
+    *length = box.textLength;
+    return true;
+}
+
+bool Read3gppYear(const uint8_t* buf, size_t avail, uint16_t* year) {
+    _YRRCBOX box;
+    if (AnaYrrcBox(buf, avail, &box) != MM_OK) return false;
+    *year = box.recordingYear;
+    return true;
+}
+
 uint32_t judgeLangue(const char* data) {
     if (data == nullptr) return 0;
     const uint8_t a = static_cast<uint8_t>(data[0]), b = static_cast<uint8_t>(data[1]);

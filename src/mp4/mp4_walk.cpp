@@ -12,6 +12,7 @@
 #include "metainfo/mp4.h"
 #include "mp4/mp4_file.h"
 #include "mp4/mp4_internal.h"
+#include "mp4/mp4_truth.h"
 
 namespace metainfo {
 namespace {
@@ -34,6 +35,22 @@ bool EnterContainer(int h, uint32_t type, int64_t* end) {
     if (!ReadExpectedBox(h, type, &header, &start)) return false;
     *end = start + header.size;
     return true;
+}
+
+// The exact timescale and duration of a movie or media header for the
+// accurate reader (version 1 keeps 64-bit times).
+void RecordTimes(const BoxBuffer& buf, size_t at, uint8_t version, uint32_t type, Mp4Truth* truth) {
+    const size_t need = version == 1 ? 28 : 16;
+    if (version > 1 || buf.size < at + need) return;
+    const uint32_t timescale = ReadBE32(buf.data + at + (version == 1 ? 16 : 8));
+    const uint64_t duration = version == 1 ? ReadBE64(buf.data + at + 20) : ReadBE32(buf.data + at + 12);
+    if (type == FourCC("mvhd")) {
+        truth->movieTimescale = timescale;
+        truth->movieDuration = duration;
+    } else if (Mp4TrackTruth* track = truth->Track()) {
+        track->timescale = timescale;
+        track->duration = duration;
+    }
 }
 
 // Movie and media headers differ only in type and in one error code.
@@ -62,6 +79,7 @@ int32_t AnaTimeHeader(int h, uint32_t type, int32_t noMemory, _ME_ClipInfoEx* in
         timescale = ReadBE32(buf.data + at + 16);
         duration = ReadBE32(buf.data + at + 20);
     }
+    if (info->truth != nullptr) RecordTimes(buf, at, full.version, type, info->truth);
     int32_t seconds = static_cast<int32_t>(duration);
     if (timescale != 0) {
         // Signed division; through 64 bits so that INT_MIN / -1 cannot trap.
@@ -78,14 +96,20 @@ void SetKind(_ME_ClipInfoEx* info, uint32_t handlerType) {
     if (node == nullptr) return;
     if (handlerType == kSoun) node->kind = 1;
     if (handlerType == kVide) node->kind = 16;
+    if (info->truth != nullptr && info->truth->Track() != nullptr) info->truth->Track()->handler = handlerType;
 }
 
 int32_t AnaStbl(int h, uint32_t handlerType, _ME_ClipInfoEx* info) {
     int64_t end = 0;
     if (!EnterContainer(h, FourCC("stbl"), &end)) return kMp4BadContainer;
-    return WalkChildren(h, end, [&](uint32_t type, int64_t, uint32_t) {
+    Mp4TrackTruth* truth = info->truth != nullptr ? info->truth->Track() : nullptr;
+    return WalkChildren(h, end, [&](uint32_t type, int64_t start, uint32_t size) {
         if (type == FourCC("stsd")) AnaStsd(h, handlerType, info);
         if (type == FourCC("stsz")) AnaStsz(h, handlerType, info);
+        if (truth == nullptr) return;
+        if (type == FourCC("stts")) SttsFacts(h, start, size, truth);
+        if (type == FourCC("stco") || type == FourCC("co64"))
+            ChunkOffsetFacts(h, start, size, type == FourCC("co64"), truth);
     });
 }
 
@@ -135,6 +159,15 @@ int32_t AnaMdia(int h, int mode, void* out) {
     return result;
 }
 
+bool AddTruthTrack(Mp4Truth* truth) {
+    try {
+        truth->tracks.emplace_back();
+    } catch (const std::bad_alloc&) {
+        return false;
+    }
+    return true;
+}
+
 int32_t AnaTrak(int h, int mode, void* out) {
     int64_t end = 0;
     if (!EnterContainer(h, FourCC("trak"), &end)) return kMp4BadContainer;
@@ -148,17 +181,23 @@ int32_t AnaTrak(int h, int mode, void* out) {
         } else {
             _ListNodeAddPrev(&info->tracks->link, &node->link);
         }
+        if (info->truth != nullptr && !AddTruthTrack(info->truth)) return MM_E_OUTOFMEMORY;
     }
-    return WalkChildren(h, end, [&](uint32_t type, int64_t, uint32_t) {
+    return WalkChildren(h, end, [&](uint32_t type, int64_t start, uint32_t size) {
         if (type == FourCC("mdia")) AnaMdia(h, mode, out);
         if (type == FourCC("tkhd") && info != nullptr) AnaTkhd(h, info);
+        if (type == FourCC("edts") && info != nullptr && info->truth != nullptr)
+            EditListFacts(h, start, size, info->truth->Track());
     });
 }
 
 int32_t AnaMoov(int h, int mode, void* out) {
     int64_t end = 0;
     if (!EnterContainer(h, FourCC("moov"), &end)) return kMp4BadContainer;
-    return WalkChildren(h, end, [&](uint32_t type, int64_t, uint32_t) {
+    Mp4Truth* truth = mode == kModeClip ? static_cast<_ME_ClipInfoEx*>(out)->truth : nullptr;
+    return WalkChildren(h, end, [&](uint32_t type, int64_t start, uint32_t size) {
+        if (truth != nullptr && type == FourCC("meta")) MetaFacts(h, start, size, truth);
+        if (truth != nullptr && type == FourCC("udta")) UdtaFacts(h, start, size, truth);
         if (type == FourCC("mvhd") && mode == kModeClip) {
             AnaMvhd(h, static_cast<_ME_ClipInfoEx*>(out));
         } else if (type == FourCC("trak") && (mode == kModeClip || mode == kModeTrackType)) {
@@ -169,6 +208,17 @@ int32_t AnaMoov(int h, int mode, void* out) {
             AnaUdta(h, mode, out);
         }
     });
+}
+
+void RecordBrands(const _FILETYPEBOX& ftyp, Mp4Truth* truth) {
+    if (truth == nullptr) return;
+    truth->majorBrand = ftyp.majorBrand;
+    if (ftyp.compatibleBrands == nullptr) return;
+    try {
+        truth->brands.assign(ftyp.compatibleBrands, ftyp.compatibleBrands + ftyp.brandCount);
+    } catch (const std::bad_alloc&) {
+        truth->brands.clear();
+    }
 }
 
 int32_t OpenedWalk(int h, uint64_t fileSize, int mode, void* out) {
@@ -219,6 +269,10 @@ int32_t AnaTkhd(int h, _ME_ClipInfoEx* info) {
     const uint32_t width = ReadBE32(buf.data + offset) >> 16;
     const uint32_t height = ReadBE32(buf.data + offset + 4) >> 16;
     // The first track that declares a size wins.
+    if (info->truth != nullptr && info->truth->Track() != nullptr) {
+        info->truth->Track()->tkhdWidth = width;
+        info->truth->Track()->tkhdHeight = height;
+    }
     if (width != 0 && info->clip.nWidth == 0) info->clip.nWidth = width;
     if (height != 0 && info->clip.nHeight == 0) info->clip.nHeight = height;
     return MM_OK;
@@ -251,6 +305,7 @@ int32_t MP4_ParseFile(int h, int mode, void* out) {
         BoxBuffer buf;
         if (!ReadBoxBuffer(h, first.size, &buf)) return MM_E_OUTOFMEMORY;
         AnaFileType(buf.data, buf.size, &ftyp);
+        if (mode == kModeClip) RecordBrands(ftyp, static_cast<_ME_ClipInfoEx*>(out)->truth);
     } else if (first.type == FourCC("mdat")) {
         SeekTo(h, origin);
     } else {
@@ -265,6 +320,8 @@ int32_t MP4_ParseFile(int h, int mode, void* out) {
             AnaMoov(h, mode, out);
         } else if (box.type == FourCC("udta") && (mode == kModeMeta || mode == kModeMaker)) {
             AnaUdta(h, mode, out);
+        } else if (box.type == FourCC("udta") && mode == kModeClip && static_cast<_ME_ClipInfoEx*>(out)->truth) {
+            UdtaFacts(h, start, box.size, static_cast<_ME_ClipInfoEx*>(out)->truth);
         }
         // "free", "skip", "mdat", "moof", "mfra", "uuid" and others carry nothing to gather.
         SeekTo(h, start + box.size);

@@ -7,6 +7,7 @@
 #include "core/quirks.h"
 #include "metainfo/metainfo.h"
 #include "mp3/mp3_stream_facts.h"
+#include "mp4/mp4_facts.h"
 #include "probe/contract_facts.h"
 #include "speech/amr.h"
 #include "speech/wave_facts.h"
@@ -48,7 +49,7 @@ const FactsReader kFactsReaders[MM_MEDIA_SLOTS] = {
     /* 0 */ nullptr,
     /* 1 MP3 */ ReadMp3,
     /* 2 RealMedia */ nullptr,
-    /* 3 MP4 */ nullptr,
+    /* 3 MP4 */ Mp4Facts,
     /* 4 ASF */ AsfFacts,
     /* 5 MIDI */ nullptr,
     /* 6 AAC */ ReadAac,
