@@ -1,6 +1,7 @@
 #include "probe/facts_readers.h"
 
 #include "metainfo/metainfo.h"
+#include "mp3/mp3_facts.h"
 #include "probe/contract_facts.h"
 
 namespace metainfo {
@@ -9,7 +10,15 @@ namespace {
 using FactsReader = int32_t (*)(const char* path, int type, MediaFacts* facts);
 
 // A null row reads the MM_ answers.
-const FactsReader kFactsReaders[MM_MEDIA_SLOTS] = {};
+constexpr FactsReader kFactsReaders[MM_MEDIA_SLOTS] = {
+    /* 0 unknown */ nullptr,
+    /* 1 MP3 */ Mp3Facts,
+    /* 2 */ nullptr,
+    /* 3 */ nullptr,
+    /* 4 */ nullptr,
+    /* 5 */ nullptr,
+    /* 6 AAC */ Mp3Facts,
+};
 
 }  // namespace
 
