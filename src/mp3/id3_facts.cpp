@@ -79,6 +79,10 @@ std::string PictureMime(const std::string& stated) {
     return "image/" + (lower == "jpg" ? std::string("jpeg") : lower);
 }
 
+bool StartsWithYear(const std::string& s) {
+    return s.size() >= 4 && s.find_first_not_of("0123456789") >= 4;
+}
+
 struct Comment {
     std::string description, text;
 };
@@ -100,7 +104,7 @@ public:
 
     // Date, comment and the numbers, once every frame was seen.
     void Finish() {
-        if (tags_->date.empty()) tags_->date = !tdrc_.empty() ? tdrc_ : DateOf(tyer_, tdat_);
+        if (tags_->date.empty()) tags_->date = StartsWithYear(tdrc_) ? tdrc_ : DateOf(tyer_, tdat_);
         const Comment* chosen = nullptr;
         for (const Comment& c : comments_) {
             if (c.description.empty() && !c.text.empty()) {
@@ -130,7 +134,8 @@ private:
         const auto digits = [](const std::string& s) {
             return s.size() == 4 && s.find_first_not_of("0123456789") == std::string::npos;
         };
-        if (!digits(year) || !digits(dayMonth)) return year;
+        if (!digits(year)) return std::string();
+        if (!digits(dayMonth)) return year;
         return year + "-" + dayMonth.substr(2, 2) + "-" + dayMonth.substr(0, 2);
     }
 
@@ -303,13 +308,13 @@ void ReadV1(int h, uint64_t fileSize, uint64_t tagEnd, TagFacts* t) {
     fill(&t->artist, field(33, 30));
     fill(&t->album, field(63, 30));
     fill(&t->comment, field(97, v11 ? 28 : 30));
-    fill(&t->date, field(93, 4));
+    if (StartsWithYear(field(93, 4))) fill(&t->date, field(93, 4));
     if (v11 && t->track == 0) t->track = tag[126];
     if (tag[127] < kGenreCount) fill(&t->genre, id3_strGenre[tag[127]]);
 }
 
 void YearFromDate(TagFacts* t) {
-    if (t->year != 0 || t->date.size() < 4 || t->date.find_first_not_of("0123456789") < 4) return;
+    if (t->year != 0 || !StartsWithYear(t->date)) return;
     t->year = std::stoi(t->date.substr(0, 4));
 }
 
