@@ -84,4 +84,6 @@ std::string Id3GenreName(const std::string& value) {
     return rest.empty() ? value : rest;
 }
 
+bool StartsWithYear(const std::string& date) { return date.size() >= 4 && date.find_first_not_of("0123456789") >= 4; }
+
 }  // namespace metainfo

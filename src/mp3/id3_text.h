@@ -20,4 +20,7 @@ std::vector<std::string> Id3TextValues(uint8_t encoding, const uint8_t* p, size_
 // "RX" "Remix", "CR" "Cover"; other text as it stands.
 std::string Id3GenreName(const std::string& value);
 
+// Whether a date starts with a four-digit year.
+bool StartsWithYear(const std::string& date);
+
 }  // namespace metainfo
