@@ -14,6 +14,16 @@ struct Quirks {
     bool id3YearKeepsEncodingByte;
     // UTF-16 text without a byte-order mark (encoding 2, UTF-16BE) is empty.
     bool id3Utf16BeEmpty;
+    // The v2.4 extended header is not passed over: its bytes are walked as frames.
+    bool id3V24ExtendedHeaderAsFrames;
+    // A frame size is read only as the version states it (iTunes writes
+    // syncsafe sizes into v2.3 and plain ones into v2.4); one that runs past
+    // the tag fails the whole tag.
+    bool id3FrameSizeAsStated;
+    // Under v2.2/2.3 whole-tag unsynchronisation a frame takes its stated
+    // size in stored bytes, so frames after one holding FF bytes are read
+    // out of step.
+    bool id3UnsyncSizeIsStored;
     // Bytes between ADTS frames that are not a frame (an ID3 tag) end the
     // stream, so a file that starts with them is of no known type.
     bool adtsStopsAtForeignBytes;
@@ -24,7 +34,7 @@ struct Quirks {
     bool aacPsConfigUnread;
 };
 
-inline constexpr Quirks kContract{true, true, true, true, true, true};
-inline constexpr Quirks kAccurate{false, false, false, false, false, false};
+inline constexpr Quirks kContract{true, true, true, true, true, true, true, true, true};
+inline constexpr Quirks kAccurate{false, false, false, false, false, false, false, false, false};
 
 }  // namespace metainfo

@@ -29,9 +29,9 @@ bool AllZero(const uint8_t* p, size_t n) {
     return true;
 }
 
-// Raw bytes of unsynchronised data that yield `want` plain bytes (Sync's rule:
-// the byte after an FF is dropped when it is 00 and never examined itself).
-uint32_t RawSpan(const uint8_t* raw, uint32_t rawLength, uint32_t want) {
+}  // namespace
+
+uint32_t UnsyncRawSpan(const uint8_t* raw, uint32_t rawLength, uint32_t want) {
     uint32_t r = 0;
     uint32_t w = 0;
     while (r < rawLength && w < want) {
@@ -42,6 +42,8 @@ uint32_t RawSpan(const uint8_t* raw, uint32_t rawLength, uint32_t want) {
     }
     return r;
 }
+
+namespace {
 
 // v2.3 extended header behind an unsynchronised tag: its size field and body
 // are read through the unsynchronisation; the file is left after them.
@@ -55,14 +57,14 @@ int32_t SkipUnsyncExtendedHeader(int h, uint32_t tagSize, uint32_t* extendedSize
     Sync(plain, got);
     const uint32_t size = ReadBE32(plain);
     if (size == 0 || size > tagSize) return MM_E_FAIL;
-    const int64_t bodyStart = start + static_cast<int64_t>(RawSpan(raw, static_cast<uint32_t>(got), 4));
+    const int64_t bodyStart = start + static_cast<int64_t>(UnsyncRawSpan(raw, static_cast<uint32_t>(got), 4));
     if (MEx_fseek(h, bodyStart, SEEK_SET) != 0) return MM_E_FAIL;
     // Up to twice the size in raw bytes, never more than the tag holds.
     const uint32_t want = static_cast<uint32_t>(std::min<uint64_t>(uint64_t(size) * 2, tagSize));
     uint8_t* scratch = new (std::nothrow) uint8_t[want];
     if (scratch == nullptr) return MM_E_NOEXTENSION;  // the code this step has always given for memory
     const int read = MEx_fread(scratch, 1, want, h);
-    const uint32_t span = read > 0 ? RawSpan(scratch, static_cast<uint32_t>(read), size) : 0;
+    const uint32_t span = read > 0 ? UnsyncRawSpan(scratch, static_cast<uint32_t>(read), size) : 0;
     delete[] scratch;
     if (MEx_fseek(h, bodyStart + static_cast<int64_t>(span), SEEK_SET) != 0) return MM_E_FAIL;
     *extendedSize = size;
@@ -197,56 +199,133 @@ int32_t GetUnsyncPicData(int h, uint32_t frameSize, ID3_MetaInfo* ctx) {
     return MM_OK;
 }
 
-// Frames of versions 2.3 and 2.4 (10-byte headers).
-int32_t ParseFrames(int h, ID3_MetaInfo* ctx) {
-    const bool v24 = ctx->version == 4;
-    while (ctx->remaining > 9) {
-        uint8_t header[kFrameHeaderSize];
-        // A tag cut short by the end of the file ends where the file does.
-        if (MEx_fread(header, 1, kFrameHeaderSize, h) != static_cast<int>(kFrameHeaderSize)) return MM_OK;
-        if (AllZero(header, 4)) return MM_OK;  // padding
-        const uint32_t id = ReadBE32(header);
-        uint32_t size = 0;
-        if (v24) {
-            size = ReadSyncsafe32(header + 4);
-        } else {
-            size = ReadBE32(header + 4);
-            if (static_cast<int32_t>(size) < 0) return MM_E_FAIL;
-        }
-        if (uint64_t(size) + kFrameHeaderSize > ctx->remaining) return MM_E_FAIL;
-        ctx->remaining -= kFrameHeaderSize + size;
-        if (size == 0) continue;
-        const uint8_t flags = header[9];
-        const bool unsync = v24 ? ((flags & 0x02) != 0 || ctx->unsync != 0) : ctx->unsync != 0;
+// The contract's reading of each frame: table frames into their items, the
+// first picture into the record.
+class ContractSink final : public ID3_FrameSink {
+public:
+    explicit ContractSink(const Quirks& quirks) : quirks_(quirks) {}
+    int32_t Frame(int h, const ID3_Frame& frame, ID3_MetaInfo* ctx) override {
+        return ctx->version == 2 ? FrameV22(h, frame, ctx) : FrameV23(h, frame, ctx);
+    }
 
-        if (id == FrameId("APIC")) {
-            const int64_t bodyStart = MEx_ftell(h);
-            if (GetPicData(h, size, ctx, unsync) == MM_E_OUTOFMEMORY) return MM_E_FAIL;
-            if (MEx_fseek(h, bodyStart + static_cast<int64_t>(size), SEEK_SET) != 0) return MM_E_FAIL;
-            continue;
-        }
-        if (!IsTableFrame(id)) {
-            if (!PassOver(h, size, v24)) return MM_E_FAIL;
-            continue;
-        }
+private:
+    const Quirks& quirks_;
+
+    static int32_t Picture(int h, const ID3_Frame& frame, ID3_MetaInfo* ctx) {
+        const int64_t bodyStart = MEx_ftell(h);
+        if (GetPicData(h, frame.size, ctx, frame.unsync) == MM_E_OUTOFMEMORY) return MM_E_FAIL;
+        return MEx_fseek(h, bodyStart + static_cast<int64_t>(frame.size), SEEK_SET) == 0 ? MM_OK : MM_E_FAIL;
+    }
+
+    int32_t FrameV23(int h, const ID3_Frame& frame, ID3_MetaInfo* ctx) {
+        const bool v24 = ctx->version == 4;
+        const uint32_t id = frame.id;
+        if (id == FrameId("APIC")) return Picture(h, frame, ctx);
+        if (!IsTableFrame(id)) return PassOver(h, frame.size, v24) ? MM_OK : MM_E_FAIL;
         bool complete = false;
-        uint8_t* body = ReadBody(h, size, &complete);
+        uint8_t* body = ReadBody(h, frame.size, &complete);
         if (body == nullptr) return MM_E_FAIL;
         if (v24 && !complete) {
             delete[] body;
             return MM_E_FAIL;
         }
-        uint32_t length = size;
-        if (unsync) length = static_cast<uint32_t>(Sync(body, static_cast<int>(length)));
-        if (v24 && (flags & 0x01) != 0 && length > 3) length = RemoveDataLengthIndicator(body, length);
+        uint32_t length = frame.size;
+        if (frame.unsync) length = static_cast<uint32_t>(Sync(body, static_cast<int>(length)));
+        if (v24 && (frame.flags & 0x01) != 0 && length > 3) length = RemoveDataLengthIndicator(body, length);
         const uint8_t encodingByte = length > 0 ? body[0] : 0;
-        GetMetaData(id, body, length, ctx->meta);
+        GetMetaData(id, body, length, ctx->meta, quirks_);
         if (v24 && length > 0) {
             if (_MMMetaItem* item = V24TextItem(id, ctx->meta)) SetV24Encoding(item, encodingByte);
         }
         delete[] body;
+        return MM_OK;
     }
-    return MM_OK;
+
+    int32_t FrameV22(int h, const ID3_Frame& frame, ID3_MetaInfo* ctx) {
+        if (frame.id == FrameId("PIC")) return Picture(h, frame, ctx);
+        if (!IsTableFrame(frame.id)) return PassOver(h, frame.size, false) ? MM_OK : MM_E_FAIL;
+        bool complete = false;
+        uint8_t* body = ReadBody(h, frame.size, &complete);
+        if (body == nullptr) return MM_E_FAIL;
+        uint32_t length = frame.size;
+        if (frame.unsync) length = static_cast<uint32_t>(Sync(body, static_cast<int>(length)));
+        GetMetaData(frame.id, body, length, ctx->meta, quirks_);
+        delete[] body;
+        return MM_OK;
+    }
+};
+
+// Reads through unsynchronisation: up to `want` plain bytes into out (when
+// not null) from at most `limit` stored bytes. The file is left after the
+// stored bytes taken (an FF's stuffing zero included); returns the plain count.
+uint32_t ReadThroughUnsync(int h, uint8_t* out, uint32_t want, uint32_t limit, uint32_t* stored) {
+    const int64_t start = MEx_ftell(h);
+    uint8_t block[4096];
+    uint32_t raw = 0;
+    uint32_t plain = 0;
+    bool afterFF = false;
+    bool done = false;
+    while (!done && raw < limit && (plain < want || afterFF)) {
+        const uint32_t n = std::min<uint32_t>(sizeof block, limit - raw);
+        const int got = MEx_fread(block, 1, n, h);
+        if (got <= 0) break;
+        for (int i = 0; i < got && !done; ++i) {
+            const uint8_t c = block[i];
+            if (afterFF) {
+                afterFF = false;
+                if (c == 0) {
+                    ++raw;
+                    continue;
+                }
+            }
+            if (plain >= want) {
+                done = true;
+                break;
+            }
+            if (out != nullptr) out[plain] = c;
+            ++raw;
+            ++plain;
+            afterFF = c == 0xFF;
+        }
+        if (static_cast<uint32_t>(got) < n) break;
+    }
+    MEx_fseek(h, start + static_cast<int64_t>(raw), SEEK_SET);
+    *stored = raw;
+    return plain;
+}
+
+bool IsFrameIdChar(uint8_t c) { return (c >= 'A' && c <= 'Z') || (c >= '0' && c <= '9'); }
+
+// Whether a frame body of `size` bytes (at most room) from here ends where
+// the tag does, or where another frame or the padding begins.
+bool EndsAtFrame(int h, uint32_t size, uint32_t room) {
+    if (room - size < kFrameHeaderSize) return true;
+    const int64_t here = MEx_ftell(h);
+    uint8_t next[4] = {};
+    const bool read = MEx_fseek(h, here + static_cast<int64_t>(size), SEEK_SET) == 0 && MEx_fread(next, 1, 4, h) == 4;
+    MEx_fseek(h, here, SEEK_SET);
+    if (!read) return false;
+    return AllZero(next, 4) ||
+           (IsFrameIdChar(next[0]) && IsFrameIdChar(next[1]) && IsFrameIdChar(next[2]) && IsFrameIdChar(next[3]));
+}
+
+// A v2.3/2.4 frame size as its writer meant it, at most room; UINT32_MAX when
+// no reading fits. iTunes wrote syncsafe sizes into v2.3 tags and plain ones
+// into v2.4: v2.3 takes the syncsafe reading when the plain one runs past the
+// tag, v2.4 the plain one when only that ends at the next frame.
+uint32_t FrameSizeOf(int h, const uint8_t* field, uint8_t version, uint32_t room) {
+    const uint32_t plain = ReadBE32(field);
+    const bool syncsafeForm = ((field[0] | field[1] | field[2] | field[3]) & 0x80) == 0;
+    const uint32_t syncsafe = syncsafeForm ? ReadSyncsafe32(field) : UINT32_MAX;
+    if (version == 3) return plain <= room ? plain : (syncsafe <= room ? syncsafe : UINT32_MAX);
+    if (syncsafe <= room && (syncsafe == plain || EndsAtFrame(h, syncsafe, room))) return syncsafe;
+    if (plain <= room && EndsAtFrame(h, plain, room)) return plain;
+    return syncsafe <= room ? syncsafe : UINT32_MAX;
+}
+
+int32_t ParseFrames(int h, ID3_MetaInfo* ctx) {
+    ContractSink sink(kContract);
+    return WalkID3Frames(h, ctx, kContract, &sink);
 }
 
 int32_t GetMetaInfoOnHandle(int h, const char* path, _MMMetaInfo* meta, int pictureLimit) {
@@ -258,7 +337,64 @@ int32_t GetMetaInfoOnHandle(int h, const char* path, _MMMetaInfo* meta, int pict
 
 }  // namespace
 
-int32_t ParseV2Header(int h, ID3_MetaInfo* ctx) {
+int32_t WalkID3Frames(int h, ID3_MetaInfo* ctx, const Quirks& quirks, ID3_FrameSink* sink) {
+    const bool v22 = ctx->version == 2;
+    const uint32_t headerSize = v22 ? kV22FrameHeaderSize : kFrameHeaderSize;
+    // v2.2/2.3 unsynchronise the whole tag: headers and bodies are read through it.
+    const bool throughUnsync = ctx->unsync != 0 && ctx->version < 4 && !quirks.id3UnsyncSizeIsStored;
+    while (ctx->remaining >= headerSize) {
+        uint8_t header[kFrameHeaderSize];
+        uint32_t headerStored = headerSize;
+        if (throughUnsync) {
+            if (ReadThroughUnsync(h, header, headerSize, ctx->remaining, &headerStored) != headerSize) return MM_OK;
+        } else if (MEx_fread(header, 1, headerSize, h) != static_cast<int>(headerSize)) {
+            // A tag cut short by the end of the file ends where the file does.
+            return MM_OK;
+        }
+        if (AllZero(header, v22 ? 3 : 4)) return MM_OK;  // padding
+        ID3_Frame frame{};
+        const uint32_t room = ctx->remaining - headerStored;
+        if (v22) {
+            frame.id = uint32_t(header[0]) << 16 | uint32_t(header[1]) << 8 | header[2];
+            frame.size = uint32_t(header[3]) << 16 | uint32_t(header[4]) << 8 | header[5];
+        } else {
+            frame.id = ReadBE32(header);
+            frame.flags = header[9];
+            if (!quirks.id3FrameSizeAsStated) {
+                frame.size = FrameSizeOf(h, header + 4, ctx->version, room);
+            } else if (ctx->version == 4) {
+                frame.size = ReadSyncsafe32(header + 4);
+            } else {
+                frame.size = ReadBE32(header + 4);
+                if (static_cast<int32_t>(frame.size) < 0) return MM_E_FAIL;
+            }
+        }
+        frame.stored = frame.size;
+        if (throughUnsync && frame.size <= room) {
+            uint32_t stored = 0;
+            const int64_t bodyStart = MEx_ftell(h);
+            const uint32_t plain = ReadThroughUnsync(h, nullptr, frame.size, room, &stored);
+            if (MEx_fseek(h, bodyStart, SEEK_SET) != 0) return MM_E_FAIL;
+            frame.stored = plain == frame.size ? stored : UINT32_MAX;
+        }
+        if (frame.stored > room) {
+            if (quirks.id3FrameSizeAsStated) return MM_E_FAIL;
+            // As much of the frame as the tag holds, and no more frames.
+            frame.size = frame.stored = room;
+        }
+        ctx->remaining = room - frame.stored;
+        if (frame.size == 0) continue;
+        frame.unsync = ctx->unsync != 0 || (ctx->version == 4 && (frame.flags & 0x02) != 0);
+        const int32_t result = sink->Frame(h, frame, ctx);
+        if (result != MM_OK) return result;
+    }
+    return MM_OK;
+}
+
+int32_t ParseV2Header(int h, ID3_MetaInfo* ctx) { return ParseV2Header(h, ctx, kContract); }
+
+int32_t ParseV2Header(int h, ID3_MetaInfo* ctx, const Quirks& quirks) {
+    const int64_t start = MEx_ftell(h);
     uint8_t header[kTagHeaderSize];
     if (MEx_fread(header, 1, kTagHeaderSize, h) != static_cast<int>(kTagHeaderSize)) return kID3ShortHeader;
     if (!BytesEqual(header, "ID3", 3)) return MM_E_FAIL;
@@ -279,45 +415,30 @@ int32_t ParseV2Header(int h, ID3_MetaInfo* ctx) {
             const int32_t skipped = SkipUnsyncExtendedHeader(h, tagSize, &extendedSize);
             if (skipped != MM_OK) return skipped;
         }
+    } else if ((flags & 0x40) != 0 && ctx->version == 4 && !quirks.id3V24ExtendedHeaderAsFrames) {
+        // Its size counts itself; a frame in its place means a writer set the flag for nothing.
+        uint8_t field[4];
+        if (MEx_fread(field, 1, 4, h) != 4) return MM_E_FAIL;
+        const uint32_t size = ReadSyncsafe32(field);
+        const bool frameInstead = IsFrameIdChar(field[0]) && IsFrameIdChar(field[1]) && IsFrameIdChar(field[2]);
+        if (!frameInstead && (size < 6 || size > tagSize)) return MM_E_FAIL;
+        const int64_t skip = frameInstead ? -4 : static_cast<int64_t>(size) - 4;
+        if (MEx_fseek(h, skip, SEEK_CUR) != 0) return MM_E_FAIL;
     }
-    // The header's ten bytes are counted against the tag size as well, as the
-    // handset always has; a tag too small for that holds no frames.
-    const uint64_t consumed = uint64_t(kTagHeaderSize) + extendedSize;
+    if (quirks.id3NeedsPadding) {
+        // The header's ten bytes are counted against the tag size as well, as
+        // the handset always has; a tag too small for that holds no frames.
+        const uint64_t consumed = uint64_t(kTagHeaderSize) + extendedSize;
+        ctx->remaining = tagSize > consumed ? static_cast<uint32_t>(tagSize - consumed) : 0;
+        return MM_OK;
+    }
+    const int64_t framesStart = MEx_ftell(h);
+    const uint64_t consumed = framesStart > start ? static_cast<uint64_t>(framesStart - start) - kTagHeaderSize : 0;
     ctx->remaining = tagSize > consumed ? static_cast<uint32_t>(tagSize - consumed) : 0;
     return MM_OK;
 }
 
-int32_t ParseID3V2_2(int h, ID3_MetaInfo* ctx) {
-    while (ctx->remaining >= kV22FrameHeaderSize) {
-        uint8_t header[kV22FrameHeaderSize];
-        if (MEx_fread(header, 1, kV22FrameHeaderSize, h) != static_cast<int>(kV22FrameHeaderSize)) return MM_OK;
-        if (AllZero(header, 3)) return MM_OK;
-        const uint32_t id = uint32_t(header[0]) << 16 | uint32_t(header[1]) << 8 | header[2];
-        const uint32_t size = uint32_t(header[3]) << 16 | uint32_t(header[4]) << 8 | header[5];
-        if (uint64_t(size) + kV22FrameHeaderSize > ctx->remaining) return MM_E_FAIL;
-        ctx->remaining -= kV22FrameHeaderSize + size;
-        if (size == 0) continue;
-        if (id == FrameId("PIC")) {
-            const int64_t bodyStart = MEx_ftell(h);
-            if (GetPicData(h, size, ctx, ctx->unsync != 0) == MM_E_OUTOFMEMORY) return MM_E_FAIL;
-            if (MEx_fseek(h, bodyStart + static_cast<int64_t>(size), SEEK_SET) != 0) return MM_E_FAIL;
-            continue;
-        }
-        if (!IsTableFrame(id)) {
-            if (!PassOver(h, size, false)) return MM_E_FAIL;
-            continue;
-        }
-        bool complete = false;
-        uint8_t* body = ReadBody(h, size, &complete);
-        if (body == nullptr) return MM_E_FAIL;
-        uint32_t length = size;
-        if (ctx->unsync != 0) length = static_cast<uint32_t>(Sync(body, static_cast<int>(length)));
-        GetMetaData(id, body, length, ctx->meta);
-        delete[] body;
-    }
-    return MM_OK;
-}
-
+int32_t ParseID3V2_2(int h, ID3_MetaInfo* ctx) { return ParseFrames(h, ctx); }
 int32_t ParseID3V2_3(int h, ID3_MetaInfo* ctx) { return ParseFrames(h, ctx); }
 int32_t ParseID3V2_4(int h, ID3_MetaInfo* ctx) { return ParseFrames(h, ctx); }
 

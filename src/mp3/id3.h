@@ -4,6 +4,7 @@
 
 #include <cstdint>
 
+#include "core/quirks.h"
 #include "metainfo/records.h"
 
 namespace metainfo {
@@ -40,9 +41,39 @@ int32_t ParseID3V1(int h, _MMMetaInfo* meta);
 // h, when not 0, is the file open from path (its size is then known without a stat).
 int32_t ID3_InitMetaData(const char* path, _MMMetaInfo* meta, ID3_MetaInfo* ctx, int pictureLimit, int h = 0);
 
+// One frame as the walker meets it; the file stands at its body.
+struct ID3_Frame {
+    uint32_t id;  // four characters, or three in v2.2 (FrameId)
+    uint32_t size;  // the size its header states
+    uint32_t stored;  // bytes its body takes in the file
+    uint8_t flags;  // second flag byte (v2.3/2.4); 0 in v2.2
+    bool unsync;  // the body is stored unsynchronised
+};
+
+// Takes the frames of a tag. It leaves the file after the body (the walker
+// reads the next header from where it stands).
+class ID3_FrameSink {
+public:
+    // MM_OK walks on; any other result ends the walk with it.
+    virtual int32_t Frame(int h, const ID3_Frame& frame, ID3_MetaInfo* ctx) = 0;
+
+protected:
+    ~ID3_FrameSink() = default;
+};
+
+// The frames of the tag whose header ParseV2Header read, in file order.
+// MM_OK at the tag's end, padding or the file's end; MM_E_FAIL for a frame
+// that does not fit the tag; else what the sink returned.
+int32_t WalkID3Frames(int h, ID3_MetaInfo* ctx, const Quirks& quirks, ID3_FrameSink* sink);
+
+// Bytes of unsynchronised data (at most rawLength) that yield `want` plain
+// bytes, as Sync reads them.
+uint32_t UnsyncRawSpan(const uint8_t* raw, uint32_t rawLength, uint32_t want);
+
 // Steps of ParseID3V2, visible for tests.
 constexpr int32_t kID3ShortHeader = static_cast<int32_t>(0x80070005u);
 int32_t ParseV2Header(int h, ID3_MetaInfo* ctx);
+int32_t ParseV2Header(int h, ID3_MetaInfo* ctx, const Quirks& quirks);
 int32_t ParseID3V2_2(int h, ID3_MetaInfo* ctx);
 int32_t ParseID3V2_3(int h, ID3_MetaInfo* ctx);
 int32_t ParseID3V2_4(int h, ID3_MetaInfo* ctx);

@@ -13,6 +13,7 @@ constexpr uint32_t kEncodingLatin1 = ENCODING_LATIN1;
 constexpr uint32_t kEncodingUtf16BE = ENCODING_UTF16BE;
 constexpr uint32_t kEncodingUtf8 = ENCODING_UTF8;
 constexpr uint8_t kId3Utf16 = 1;
+constexpr uint8_t kId3Utf16BE = 2;
 constexpr int kAlbumArtist = -1;
 
 enum class FrameKind { kText, kComment, kGenre, kTimeStamp, kPlayCount, kRating };
@@ -70,7 +71,11 @@ void CopyInto(_MMMetaItem* item, const uint8_t* text, uint32_t length, uint32_t 
 }
 
 // Encoding code of a text: UTF-16 is delivered big-endian, a UTF-8 mark keeps it as UTF-8.
-int32_t TextEncodingOf(uint8_t id3Encoding, uint8_t* text, uint32_t length, uint32_t* encoding) {
+int32_t TextEncodingOf(uint8_t id3Encoding, uint8_t* text, uint32_t length, uint32_t* encoding, const Quirks& quirks) {
+    if (id3Encoding == kId3Utf16BE && !quirks.id3Utf16BeEmpty) {
+        *encoding = kEncodingUtf16BE;
+        return MM_OK;
+    }
     if (id3Encoding != kId3Utf16) {
         *encoding = kEncodingLatin1;
         return MM_OK;
@@ -128,24 +133,25 @@ void ReshapeV1Item(_MMMetaItem* item, uint32_t fieldLength) {
     item->nLength = zero != nullptr ? static_cast<uint32_t>(static_cast<const uint8_t*>(zero) - item->szData) : n;
 }
 
-int32_t FillTextFrame(uint8_t* body, uint32_t size, _MMMetaItem* item) {
+int32_t FillTextFrame(uint8_t* body, uint32_t size, _MMMetaItem* item, const Quirks& quirks) {
     if (item->nLength != 0) return MM_E_FAIL;  // the first frame wins
     if (body == nullptr || size < 1) return MM_E_FAIL;
     uint8_t* text = body + 1;
     const uint32_t length = size - 1;
     uint32_t encoding = kEncodingLatin1;
-    if (TextEncodingOf(body[0], text, length, &encoding) != MM_OK) return MM_E_FAIL;
+    if (TextEncodingOf(body[0], text, length, &encoding, quirks) != MM_OK) return MM_E_FAIL;
     CopyInto(item, text, length, encoding);
     return MM_OK;
 }
 
-int32_t FillCommentsFrame(uint8_t* body, uint32_t size, _MMMetaItem* item) {
+int32_t FillCommentsFrame(uint8_t* body, uint32_t size, _MMMetaItem* item, const Quirks& quirks) {
     if (item->nLength != 0) return MM_E_FAIL;
     if (body == nullptr || size < 1) return MM_E_FAIL;
     const uint8_t encoding = body[0];
+    const bool utf16BE = encoding == kId3Utf16BE && !quirks.id3Utf16BeEmpty;
     // The short description (after encoding byte and language) ends at its terminator.
     uint32_t textStart = size;
-    if (encoding == kId3Utf16) {
+    if (encoding == kId3Utf16 || utf16BE) {
         for (uint32_t k = 4; k + 1 < size; ++k) {
             if (body[k] == 0 && body[k + 1] == 0) {
                 textStart = k + 2;
@@ -162,7 +168,7 @@ int32_t FillCommentsFrame(uint8_t* body, uint32_t size, _MMMetaItem* item) {
     }
     const uint32_t length = size > textStart ? size - textStart : 0;
     uint8_t* text = body + std::min(textStart, size);
-    uint32_t code = kEncodingLatin1;
+    uint32_t code = utf16BE ? kEncodingUtf16BE : kEncodingLatin1;
     if (encoding == kId3Utf16) {
         if (AdjustByteOrder(text, length) != MM_OK) return MM_E_FAIL;
         code = StartsWithUtf8Mark(text, length) ? kEncodingUtf8 : kEncodingUtf16BE;
@@ -171,8 +177,8 @@ int32_t FillCommentsFrame(uint8_t* body, uint32_t size, _MMMetaItem* item) {
     return MM_OK;
 }
 
-int32_t FillGenreFrame(uint8_t* body, uint32_t size, _MMMetaItem* item) {
-    const int32_t filled = FillTextFrame(body, size, item);
+int32_t FillGenreFrame(uint8_t* body, uint32_t size, _MMMetaItem* item, const Quirks& quirks) {
+    const int32_t filled = FillTextFrame(body, size, item, quirks);
     if (filled != MM_OK) return filled;
     const uint8_t* open = static_cast<const uint8_t*>(std::memchr(body, '(', size));
     const uint8_t* close = static_cast<const uint8_t*>(std::memchr(body, ')', size));
@@ -197,12 +203,16 @@ int32_t FillGenreFrame(uint8_t* body, uint32_t size, _MMMetaItem* item) {
     return MM_OK;
 }
 
-int32_t FillTimeStamp(const uint8_t* body, uint32_t size, _MMMetaInfo* meta) {
+int32_t FillTimeStamp(const uint8_t* body, uint32_t size, _MMMetaInfo* meta, const Quirks& quirks) {
     _MMMetaItem* year = &meta->aItems[META_YEAR];
     _MMMetaItem* date = &meta->aItems[META_DATE];
     _MMMetaItem* time = &meta->aItems[META_TIME];
     if (year->nLength != 0 || date->nLength != 0 || time->nLength != 0) return MM_E_FAIL;
-    // Offsets count the encoding byte, as the frame has always been read.
+    // The contract's offsets count the encoding byte.
+    if (!quirks.id3YearKeepsEncodingByte && size > 0) {
+        ++body;
+        --size;
+    }
     switch (size) {
         case 4: break;
         case 7:
@@ -226,14 +236,14 @@ _MMMetaItem* V24TextItem(uint32_t id, _MMMetaInfo* meta) {
     return rule != nullptr && rule->v24Text ? ItemOf(*rule, meta) : nullptr;
 }
 
-int32_t GetMetaData(uint32_t id, uint8_t* body, uint32_t size, _MMMetaInfo* meta) {
+int32_t GetMetaData(uint32_t id, uint8_t* body, uint32_t size, _MMMetaInfo* meta, const Quirks& quirks) {
     const FrameRule* rule = RuleFor(id);
     if (rule == nullptr || meta == nullptr || body == nullptr) return MM_OK;
     switch (rule->kind) {
-        case FrameKind::kText: FillTextFrame(body, size, ItemOf(*rule, meta)); return MM_OK;
-        case FrameKind::kComment: FillCommentsFrame(body, size, ItemOf(*rule, meta)); return MM_OK;
-        case FrameKind::kGenre: FillGenreFrame(body, size, ItemOf(*rule, meta)); return MM_OK;
-        case FrameKind::kTimeStamp: FillTimeStamp(body, size, meta); return MM_OK;
+        case FrameKind::kText: FillTextFrame(body, size, ItemOf(*rule, meta), quirks); return MM_OK;
+        case FrameKind::kComment: FillCommentsFrame(body, size, ItemOf(*rule, meta), quirks); return MM_OK;
+        case FrameKind::kGenre: FillGenreFrame(body, size, ItemOf(*rule, meta), quirks); return MM_OK;
+        case FrameKind::kTimeStamp: FillTimeStamp(body, size, meta, quirks); return MM_OK;
         case FrameKind::kPlayCount:
             if (size < 4) return MM_E_FAIL;
             meta->nPlayCount = ReadBE32(body);

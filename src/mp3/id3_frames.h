@@ -4,6 +4,7 @@
 
 #include <cstdint>
 
+#include "core/quirks.h"
 #include "metainfo/records.h"
 
 namespace metainfo {
@@ -17,7 +18,7 @@ constexpr uint32_t FrameId(const char (&s)[4]) {
 }
 
 // 0; MM_E_FAIL for a short "PCNT" or a "POPM" without terminator.
-int32_t GetMetaData(uint32_t id, uint8_t* body, uint32_t size, _MMMetaInfo* meta);
+int32_t GetMetaData(uint32_t id, uint8_t* body, uint32_t size, _MMMetaInfo* meta, const Quirks& quirks);
 
 // True for the frames that fill the record; all others are passed over.
 bool IsTableFrame(uint32_t id);
@@ -25,10 +26,10 @@ bool IsTableFrame(uint32_t id);
 // The item a text frame of v2.4 takes its encoding code from, or null.
 _MMMetaItem* V24TextItem(uint32_t id, _MMMetaInfo* meta);
 
-int32_t FillTextFrame(uint8_t* body, uint32_t size, _MMMetaItem* item);
-int32_t FillCommentsFrame(uint8_t* body, uint32_t size, _MMMetaItem* item);
-int32_t FillGenreFrame(uint8_t* body, uint32_t size, _MMMetaItem* item);
-int32_t FillTimeStamp(const uint8_t* body, uint32_t size, _MMMetaInfo* meta);
+int32_t FillTextFrame(uint8_t* body, uint32_t size, _MMMetaItem* item, const Quirks& quirks);
+int32_t FillCommentsFrame(uint8_t* body, uint32_t size, _MMMetaItem* item, const Quirks& quirks);
+int32_t FillGenreFrame(uint8_t* body, uint32_t size, _MMMetaItem* item, const Quirks& quirks);
+int32_t FillTimeStamp(const uint8_t* body, uint32_t size, _MMMetaInfo* meta, const Quirks& quirks);
 
 // Swaps UTF-16 text that starts with FF FE into big-endian order, mark
 // included. MM_E_INVALIDARG for an odd length with that mark.

@@ -8,6 +8,7 @@
 #include "metainfo/metainfo.h"
 #include "mp3/mp3_stream_facts.h"
 #include "mp4/mp4_facts.h"
+#include "mp3/id3_facts.h"
 #include "probe/contract_facts.h"
 #include "speech/amr.h"
 #include "speech/wave_facts.h"
@@ -18,30 +19,23 @@ namespace {
 using FactsReader = int32_t (*)(const char* path, int type, MediaFacts* facts);
 
 int32_t ReadWave(const char* path, int /*type*/, MediaFacts* facts) { return WaveFacts(path, facts); }
-int32_t ReadAac(const char* path, int type, MediaFacts* facts) {
-    const int32_t read = AacFacts(path, kAccurate, facts);
+// ADTS and MPEG audio carry ID3 tags: before the stream, and ID3v1 at its end.
+int32_t WithId3Tags(int32_t read, const char* path, MediaFacts* facts) {
     if (read != MM_OK) return read;
-    MediaFacts contract;
-    if (ContractFacts(path, type, &contract) == MM_OK) {
-        facts->tags = contract.tags;
-        facts->pictures = contract.pictures;
-    }
-    return MM_OK;
+    uint64_t tagEnd = 0;
+    return ReadId3Facts(path, &facts->tags, &facts->pictures, &tagEnd) ? MM_OK : MM_E_OUTOFMEMORY;
+}
+
+int32_t ReadAac(const char* path, int /*type*/, MediaFacts* facts) {
+    return WithId3Tags(AacFacts(path, kAccurate, facts), path, facts);
 }
 
 int32_t ReadAmr(const char* path, int /*type*/, MediaFacts* facts) { return AmrFacts(path, facts); }
 
 int32_t ReadAvi(const char* path, int /*type*/, MediaFacts* facts) { return AviFacts(path, facts); }
 
-int32_t ReadMp3(const char* path, int type, MediaFacts* facts) {
-    const int32_t read = Mp3StreamFacts(path, facts);
-    if (read != MM_OK) return read;
-    MediaFacts contract;
-    if (ContractFacts(path, type, &contract) == MM_OK) {
-        facts->tags = contract.tags;
-        facts->pictures = contract.pictures;
-    }
-    return MM_OK;
+int32_t ReadMp3(const char* path, int /*type*/, MediaFacts* facts) {
+    return WithId3Tags(Mp3StreamFacts(path, facts), path, facts);
 }
 
 // A null row reads the MM_ answers.

@@ -112,7 +112,7 @@ def test_cover_writes_the_picture_bytes(files):
     assert run(["cover", str(files["dir"] / "cover.mp3"), "-o", str(out)]).returncode == 0
     assert out.read_bytes() == files["png"]
     line = json.loads(run(["probe", "--json", str(files["dir"] / "cover.mp3")]).stdout)
-    assert line["pictures"] == [{"mime": "image/png", "type": None, "description": None, "size": len(files["png"])}]
+    assert line["pictures"] == [{"mime": "image/png", "type": 3, "description": None, "size": len(files["png"])}]
 
 
 def test_names_from_stdin_and_not_utf8(files):

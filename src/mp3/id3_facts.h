@@ -1,0 +1,19 @@
+// ID3 tags of an MP3 or AAC file for the accurate interface: the v2 tag at
+// the start (read with the frame walker the MM_ interface uses) and the v1
+// tag at the end for what v2 lacks.
+#pragma once
+
+#include <cstdint>
+#include <vector>
+
+#include "core/facts.h"
+
+namespace metainfo {
+
+// Fills tags and pictures from the file's ID3 tags. *tagEnd gets the bytes
+// the v2 tags at the start take (footers and tags repeated behind the first
+// included): where the audio starts. False only when memory runs out; a file
+// without tags (or that cannot be read) leaves tags and pictures as they are.
+bool ReadId3Facts(const char* path, TagFacts* tags, std::vector<PictureFacts>* pictures, uint64_t* tagEnd);
+
+}  // namespace metainfo
