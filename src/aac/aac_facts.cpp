@@ -53,7 +53,9 @@ void WalkFrames(int h, uint64_t size, uint64_t at, uint64_t limit, Walk* w, cons
     uint8_t p[kId3Header];
     while (at + kAdtsHeader <= size) {
         if (at >= limit) return;
-        if (!SeekToOffset(h, at) || MEx_fread(p, 1, sizeof p, h) < static_cast<int>(kAdtsHeader)) break;
+        if (!SeekToOffset(h, at)) break;
+        const int got = MEx_fread(p, 1, sizeof p, h);
+        if (got < static_cast<int>(kAdtsHeader)) break;
         AdtsHeader frame;
         if (ParseAdts(p, &frame) && at + frame.length <= size) {
             if (w->frames == 0) w->first = frame;
@@ -65,7 +67,7 @@ void WalkFrames(int h, uint64_t size, uint64_t at, uint64_t limit, Walk* w, cons
             at += frame.length;
             continue;
         }
-        const uint64_t tag = at + kId3Header <= size ? Id3TagBytes(p) : 0;
+        const uint64_t tag = got == static_cast<int>(kId3Header) ? Id3TagBytes(p) : 0;
         if (tag == 0) break;
         at += tag;
     }
@@ -73,26 +75,36 @@ void WalkFrames(int h, uint64_t size, uint64_t at, uint64_t limit, Walk* w, cons
     w->complete = true;
 }
 
-// The first offset in the sync window where kFramesToAccept frames follow
-// each other (ID3 tags between them allowed).
+// Where the ID3v2 tags at `at` (one after another) end.
+uint64_t SkipTags(int h, uint64_t size, uint64_t at) {
+    constexpr int kMostTags = 64;
+    uint8_t p[kId3Header];
+    for (int i = 0; i < kMostTags && at + kId3Header <= size; ++i) {
+        if (!SeekToOffset(h, at) || MEx_fread(p, 1, sizeof p, h) != static_cast<int>(sizeof p)) break;
+        const uint64_t tag = Id3TagBytes(p);
+        if (tag == 0) break;
+        at += tag;
+    }
+    return at;
+}
+
+// The first offset in the sync window after the leading tags where
+// kFramesToAccept frames follow each other (ID3 tags between them allowed).
 bool FindStream(int h, uint64_t size, uint64_t* start) {
-    std::vector<uint8_t> buffer(kSyncWindow);
-    uint8_t* window = buffer.data();
-    if (!SeekToOffset(h, 0)) return false;
-    const int got = MEx_fread(window, 1, kSyncWindow, h);
+    const uint64_t from = SkipTags(h, size, 0);
+    std::vector<uint8_t> window(kSyncWindow);
+    if (from >= size || !SeekToOffset(h, from)) return false;
+    const int got = MEx_fread(window.data(), 1, kSyncWindow, h);
     if (got < static_cast<int>(kAdtsHeader)) return false;
     const auto n = static_cast<uint64_t>(got);
-    uint64_t at = 0;
-    for (uint64_t tag = Id3TagBytes(window); tag != 0 && at + kId3Header <= n; tag = Id3TagBytes(window + at))
-        at += tag;
-    for (; at + kAdtsHeader <= n; ++at) {
+    for (uint64_t i = 0; i + kAdtsHeader <= n; ++i) {
         AdtsHeader frame;
-        if (!ParseAdts(window + at, &frame)) continue;
+        if (!ParseAdts(window.data() + i, &frame)) continue;
         Walk probe;
-        WalkFrames(h, size, at, at + kFramesToAccept * kMaxFrame, &probe);
+        WalkFrames(h, size, from + i, from + i + kFramesToAccept * kMaxFrame, &probe);
         // A short walk stops at the file's end only for a short file.
         if (probe.frames >= kFramesToAccept || (probe.frames > 0 && probe.end + kAdtsHeader > size)) {
-            *start = at;
+            *start = from + i;
             return true;
         }
     }

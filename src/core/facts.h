@@ -42,6 +42,25 @@ struct TagFacts {
     int32_t year = 0;
     uint32_t track = 0, trackTotal = 0, disc = 0, discTotal = 0;
     std::vector<std::pair<std::string, std::string>> extra;  // key as the file names it, value
+
+    // Takes from other what this lacks (a second tag of the same file).
+    void FillFrom(const TagFacts& other) {
+        for (std::string TagFacts::*text :
+             {&TagFacts::title, &TagFacts::artist, &TagFacts::album, &TagFacts::albumArtist, &TagFacts::genre,
+              &TagFacts::date, &TagFacts::comment, &TagFacts::composer}) {
+            if ((this->*text).empty()) this->*text = other.*text;
+        }
+        if (year == 0) year = other.year;
+        if (track == 0) {
+            track = other.track;
+            trackTotal = other.trackTotal;
+        }
+        if (disc == 0) {
+            disc = other.disc;
+            discTotal = other.discTotal;
+        }
+        extra.insert(extra.end(), other.extra.begin(), other.extra.end());
+    }
 };
 
 struct MediaFacts {

@@ -81,13 +81,28 @@ bool ReadId3Facts(const char* path, TagFacts* tags, std::vector<PictureFacts>* p
     *tagEnd = TagsEnd(h, fileSize);
     bool memory = true;
     try {
-        if (*tagEnd > 0) memory = ReadId3V2Facts(h, fileSize, tags, pictures);
+        if (*tagEnd > 0) memory = ReadId3V2Facts(h, fileSize, 0, tags, pictures);
         ReadV1(h, fileSize, *tagEnd, tags);
         YearFromDate(tags);
     } catch (const std::bad_alloc&) {
         return false;
     }
     return memory;
+}
+
+bool ReadId3FactsAt(const char* path, uint64_t offset, TagFacts* tags, std::vector<PictureFacts>* pictures) {
+    const int h = path != nullptr ? MEx_fopen(path, "rb") : 0;
+    if (h == 0) return true;
+    FileCloser closer(h);
+    uint64_t fileSize = 0;
+    if (!OpenedFileSize(h, path, &fileSize) || offset >= fileSize || TagLengthAt(h, offset, fileSize) == 0) return true;
+    try {
+        const bool memory = ReadId3V2Facts(h, fileSize, offset, tags, pictures);
+        YearFromDate(tags);
+        return memory;
+    } catch (const std::bad_alloc&) {
+        return false;
+    }
 }
 
 }  // namespace metainfo

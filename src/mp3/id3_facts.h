@@ -16,4 +16,8 @@ namespace metainfo {
 // without tags (or that cannot be read) leaves tags and pictures as they are.
 bool ReadId3Facts(const char* path, TagFacts* tags, std::vector<PictureFacts>* pictures, uint64_t* tagEnd);
 
+// Fills tags and pictures from an ID3v2 tag at `offset` inside another
+// container (a WAVE "id3 " chunk). False only when memory runs out.
+bool ReadId3FactsAt(const char* path, uint64_t offset, TagFacts* tags, std::vector<PictureFacts>* pictures);
+
 }  // namespace metainfo

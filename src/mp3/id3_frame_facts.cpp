@@ -269,12 +269,12 @@ private:
 
 }  // namespace
 
-bool ReadId3V2Facts(int h, uint64_t fileSize, TagFacts* tags, std::vector<PictureFacts>* pictures) {
+bool ReadId3V2Facts(int h, uint64_t fileSize, uint64_t at, TagFacts* tags, std::vector<PictureFacts>* pictures) {
     ID3_MetaInfo ctx{};
     ctx.sizeBound = SaturateU32(fileSize);
     FactsSink sink(tags, pictures);
     bool memory = true;
-    if (SeekToOffset(h, 0) && ParseV2Header(h, &ctx, kAccurate) == MM_OK) {
+    if (SeekToOffset(h, at) && ParseV2Header(h, &ctx, kAccurate) == MM_OK) {
         memory = WalkID3Frames(h, &ctx, kAccurate, &sink) != MM_E_OUTOFMEMORY;
     }
     sink.Finish();

@@ -8,9 +8,9 @@
 
 namespace metainfo {
 
-// Reads the v2 tag at the start of h (a file of fileSize bytes) into tags and
+// Reads the v2 tag at `at` in h (a file of fileSize bytes) into tags and
 // pictures, through the frame walker the MM_ interface uses. False only when
 // memory runs out.
-bool ReadId3V2Facts(int h, uint64_t fileSize, TagFacts* tags, std::vector<PictureFacts>* pictures);
+bool ReadId3V2Facts(int h, uint64_t fileSize, uint64_t at, TagFacts* tags, std::vector<PictureFacts>* pictures);
 
 }  // namespace metainfo

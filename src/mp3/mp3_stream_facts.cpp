@@ -6,6 +6,7 @@
 #include "core/file_access.h"
 #include "metainfo/records.h"
 #include "mp3/mp3_frame.h"
+#include "mp3/mp3_frames.h"
 #include "mp3/mp3_info.h"
 
 namespace metainfo {
@@ -15,6 +16,7 @@ constexpr size_t kFrameWindow = 4096;
 constexpr size_t kVbriOffset = 36;
 constexpr uint64_t kV1TagSize = 128;
 constexpr uint64_t kApeFooterSize = 32;
+constexpr uint64_t kCountedBytes = 1024 * 1024;  // streams this short have their frames counted
 
 // What the first frame's VBR header says; zeros where it says nothing.
 struct VbrHeader {
@@ -116,6 +118,20 @@ void FillTiming(const _FrameHeader_Info& header, const VbrHeader& vbr, uint64_t 
     }
 }
 
+// A short stream without a VBR header: its frames counted, so that tag and
+// padding bytes at its end do not count as play time.
+void CountFrames(const char* path, MediaFacts* f) {
+    uint32_t rate = 0;
+    uint64_t samples = 0;
+    WalkMp3Frames(path, &rate, [&](const AudioFrame& frame) {
+        samples += frame.samples;
+        return true;
+    });
+    if (samples == 0 || rate == 0) return;
+    f->durationUs = static_cast<int64_t>(samples * 1000000 / rate);
+    f->durationExact = true;
+}
+
 }  // namespace
 
 int32_t Mp3StreamFacts(const char* path, MediaFacts* f) {
@@ -142,6 +158,7 @@ int32_t Mp3StreamFacts(const char* path, MediaFacts* f) {
     s.sampleRate = header.sampleRate;
     s.channels = header.channelMode == 3 ? 1 : 2;
     FillTiming(header, vbr, audioBytes, f, &s);
+    if (!vbr.found && audioBytes <= kCountedBytes) CountFrames(path, f);
     f->bitRate = s.bitRate;
     f->streams.push_back(s);
     return MM_OK;

@@ -141,8 +141,7 @@ int Probe(const char* path, mi_info** out) {
     // The overall rate counts every byte of the file over its play time, as
     // ffprobe and MediaInfo do.
     MediaFacts& f = owner->facts;
-    if (f.durationUs > 0)
-        f.bitRate = static_cast<uint64_t>(static_cast<long double>(stamp.size) * 8e6L / f.durationUs);
+    if (f.durationUs > 0) f.bitRate = static_cast<uint64_t>(static_cast<long double>(stamp.size) * 8e6L / f.durationUs);
     FillInfo(owner);
     *out = &owner->info;
     return MI_OK;

@@ -286,7 +286,8 @@ namespace metainfo {
 namespace {
 
 constexpr uint64_t kAmrCountLimit = 16 * 1024 * 1024;
-constexpr size_t kAmrMaxBlock = 61 * 16 + 16;  // the largest frame for each of 16 channels, and their headers  // frames counted; past it the rest is estimated
+constexpr size_t kAmrMaxBlock = 61 * 16 + 16;  // the largest frame for each of 16 channels, and their headers  //
+                                               // frames counted; past it the rest is estimated
 
 // Frames (blocks of every channel's frame) from the first frame to the end,
 // read in chunks; a block cut off by the end of the file does not count.

@@ -6,6 +6,7 @@
 #include "core/byte_reader.h"
 #include "core/file_access.h"
 #include "core/text.h"
+#include "mp3/id3_facts.h"
 #include "metainfo/records.h"
 #include "probe/contract_facts.h"
 
@@ -28,6 +29,7 @@ struct WaveChunks {
     uint64_t factSamples = 0;
     bool haveFact = false;
     uint64_t ds64Data = 0, ds64Samples = 0;
+    uint64_t id3Offset = 0;  // of an "id3 " chunk's tag; 0 when none
 };
 
 void ReadFormat(const uint8_t* b, size_t n, WaveChunks* w) {
@@ -100,6 +102,8 @@ void ReadChunk(int h, const char* id, uint64_t body, uint64_t size, uint64_t fil
     } else if (std::memcmp(id, "fact", 4) == 0 && ReadBody(h, body, want, small, &got) && got >= 4) {
         w->haveFact = true;
         w->factSamples = ReadLE32(small);
+    } else if ((std::memcmp(id, "id3 ", 4) == 0 || std::memcmp(id, "ID3 ", 4) == 0) && w->id3Offset == 0) {
+        w->id3Offset = body;
     } else if (std::memcmp(id, "LIST", 4) == 0 && size >= 4 && size <= kMaxInfoList && body + size <= fileSize) {
         std::string list(static_cast<size_t>(size), '\0');
         auto* bytes = reinterpret_cast<uint8_t*>(&list[0]);
@@ -228,6 +232,13 @@ int32_t WaveFacts(const char* path, MediaFacts* f) {
     WalkChunks(h, size, rf64, &w, &f->tags);
     if (!w.haveFormat || !w.haveData) return MM_E_FAIL;
 
+    // An ID3 tag in its own chunk says more than the INFO list, and wins.
+    if (w.id3Offset != 0) {
+        TagFacts id3;
+        if (!ReadId3FactsAt(path, w.id3Offset, &id3, &f->pictures)) return MM_E_OUTOFMEMORY;
+        id3.FillFrom(f->tags);
+        f->tags = id3;
+    }
     f->format = "wav";
     f->mime = "audio/wav";
     StreamFacts s;
