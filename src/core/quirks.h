@@ -24,9 +24,6 @@ struct Quirks {
     // size in stored bytes, so frames after one holding FF bytes are read
     // out of step.
     bool id3UnsyncSizeIsStored;
-    // Bytes between ADTS frames that are not a frame (an ID3 tag) end the
-    // stream, so a file that starts with them is of no known type.
-    bool adtsStopsAtForeignBytes;
     // An AAC-LC stream at 88.2 kHz or more reads as SBR at twice the rate.
     bool aacHighRateIsSbr;
     // An MPEG-4 audio configuration that opens with object type 29 (SBR with
@@ -34,7 +31,7 @@ struct Quirks {
     bool aacPsConfigUnread;
 };
 
-inline constexpr Quirks kContract{true, true, true, true, true, true, true, true, true};
-inline constexpr Quirks kAccurate{false, false, false, false, false, false, false, false, false};
+inline constexpr Quirks kContract{true, true, true, true, true, true, true, true};
+inline constexpr Quirks kAccurate{false, false, false, false, false, false, false, false};
 
 }  // namespace metainfo

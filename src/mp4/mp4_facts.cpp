@@ -91,7 +91,7 @@ std::string MimeOf(const Mp4Truth& truth, bool hasVideo) {
     return hasVideo ? "video/mp4" : "audio/mp4";
 }
 
-void AddStream(const Mp4TrackTruth& t, MediaFacts* f) {
+void AddStream(const Mp4TrackTruth& t, uint64_t fileSize, MediaFacts* f) {
     StreamFacts s = t.stream;
     if (s.kind == StreamFacts::kVideo) {
         if (s.width == 0) s.width = t.tkhdWidth;
@@ -103,7 +103,8 @@ void AddStream(const Mp4TrackTruth& t, MediaFacts* f) {
     // AC-3 frames carry padding and a nominal rate, which ffprobe tells.
     const bool nominal = t.declaredBitrate != 0 && (s.codec == "ac3" || s.codec == "eac3");
     const uint64_t duration = t.duration != 0 ? t.duration : t.sttsDuration;
-    if (!nominal && t.bytesKnown && t.sampleBytes != 0 && duration != 0) {
+    // A sample table that sums to more than the file holds says nothing.
+    if (!nominal && t.bytesKnown && t.sampleBytes != 0 && t.sampleBytes <= fileSize && duration != 0) {
         s.bitRate = MulDiv(t.sampleBytes * 8, t.timescale, duration);
     } else {
         s.bitRate = t.declaredBitrate;
@@ -132,7 +133,7 @@ void Assemble(const Mp4Truth& truth, uint64_t fileSize, MediaFacts* f) {
     for (const Mp4TrackTruth& t : truth.tracks) {
         if (t.handler != FourCC("soun") && t.handler != FourCC("vide")) continue;
         if (t.hasEntry) {
-            AddStream(t, f);
+            AddStream(t, fileSize, f);
             hasVideo = hasVideo || t.handler == FourCC("vide");
         }
         const int64_t us = TrackMicros(truth, t);
