@@ -487,28 +487,6 @@ TEST(AsfMeta, PicturesAndBanners) {
     EXPECT_EQ(MM_MediaExtractor_FreeMetaInfo(&meta), 0);
 }
 
-TEST(AsfCorpus, EveryWmaIsAnsweredAndAgreesWithFfprobe) {
-    const std::string corpus = CorpusDir();
-    if (corpus.empty()) GTEST_SKIP() << testing_support::NoCorpusReason();
-    int files = 0;
-    for (const char* sub : {"/mutagen/", "/taglib/"}) {
-        for (const auto& entry : std::filesystem::directory_iterator(corpus + sub)) {
-            if (entry.path().extension() != ".wma") continue;
-            const std::string path = entry.path().string();
-            SCOPED_TRACE(path);
-            ++files;
-            const Answers a(path);
-            EXPECT_EQ(a.mask & TRACK_AUDIO, TRACK_AUDIO);
-            EXPECT_GE(a.clip.bHasAudio, 1u);
-            if (!HaveFfmpeg()) continue;
-            auto audio = Probe(path, "-select_streams a:0 -show_entries stream=sample_rate,channels");
-            EXPECT_EQ(a.clip.nSampleRate, Number(audio, "sample_rate"));
-            EXPECT_EQ(a.clip.nChannels, Number(audio, "channels"));
-        }
-    }
-    EXPECT_GT(files, 0);
-}
-
 // Audio alone and with WMV1 and WMV2 video: every query agrees with ffprobe;
 // durations are whole seconds.
 TEST(AsfFfmpeg, WrittenFilesAgreeWithFfprobe) {
