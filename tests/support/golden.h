@@ -34,12 +34,13 @@ private:
     std::vector<std::pair<std::string, std::string>> lines_, given_;
 };
 
-// Every slot's answer for a file of a type on one line, records filled with a pattern
-// first so that fields a slot leaves alone show: track, codec, clip, metadata (items,
+// Every slot's answer for a file of a type on one line, records filled with `fill`
+// first (a pattern shows the fields a slot leaves alone): track, codec, clip, metadata (items,
 // then the picture's first bytes), MIME type, the first second's audio data. With
 // viaPublic the exported queries answer instead of the type's slots (MIME and audio
 // data come from the slots either way). A slot the type lacks shows "-".
-std::string SlotAnswers(const std::string& path, int type, bool viaPublic = false, int pictureLimit = 1);
+std::string SlotAnswers(const std::string& path, int type, bool viaPublic = false, int pictureLimit = 1,
+                        uint8_t fill = 0);
 
 namespace golden_detail {
 
@@ -109,7 +110,7 @@ inline Golden::~Golden() {
     for (const auto& l : out) file << l.first << '\t' << l.second << '\n';
 }
 
-inline std::string SlotAnswers(const std::string& path, int type, bool viaPublic, int pictureLimit) {
+inline std::string SlotAnswers(const std::string& path, int type, bool viaPublic, int pictureLimit, uint8_t fill) {
     const char* p = path.c_str();
     const bool slot = type > 0 && type < MM_MEDIA_SLOTS;
     std::string s;
@@ -121,7 +122,7 @@ inline std::string SlotAnswers(const std::string& path, int type, bool viaPublic
         s += "track -";
     }
     _MM_CODECTYPE codec;
-    std::memset(&codec, 0xAB, sizeof codec);
+    std::memset(&codec, fill, sizeof codec);
     if (viaPublic || (slot && MM_GetCodecType[type] != nullptr)) {
         const int32_t r =
             viaPublic ? MM_MediaExtractor_GetCodecType(p, type, &codec) : MM_GetCodecType[type](p, &codec);
@@ -130,8 +131,8 @@ inline std::string SlotAnswers(const std::string& path, int type, bool viaPublic
         s += " | -";
     }
     _MMClipInfo clip, pattern;
-    std::memset(&clip, 0xAB, sizeof clip);
-    std::memset(&pattern, 0xAB, sizeof pattern);
+    std::memset(&clip, fill, sizeof clip);
+    std::memset(&pattern, fill, sizeof pattern);
     std::memset(clip.szFormat, 0, sizeof clip.szFormat);
     std::memset(pattern.szFormat, 0, sizeof pattern.szFormat);
     if (viaPublic || (slot && MM_GetClipInfo[type] != nullptr)) {
@@ -158,7 +159,7 @@ inline std::string SlotAnswers(const std::string& path, int type, bool viaPublic
     if (slot && MM_GetMIMEType[type] != nullptr) {
         const int32_t r = MM_GetMIMEType[type](p, &mime);
         s += " | " + (r != MM_OK
-                          ? Hex(r)
+                          ? Hex(r) + (mime.pszMimeType != nullptr ? " (set)" : "")
                           : std::string(mime.pszMimeType != nullptr ? mime.pszMimeType : "(null)") + "/" +
                                 std::to_string(mime.nMimeLength) +
                                 (mime.pszVideoMimeType != nullptr ? std::string(" ") + mime.pszVideoMimeType : ""));
@@ -171,7 +172,7 @@ inline std::string SlotAnswers(const std::string& path, int type, bool viaPublic
         unsigned char* data = nullptr;
         int size = -1;
         const int32_t r = MM_GetAudioData[type](p, 0, 1, &data, &size);
-        s += " | cut " + Hex(r) + (r == MM_OK ? " " + std::to_string(size) : "");
+        s += " | cut " + Hex(r) + (r == MM_OK ? " " + std::to_string(size) : data != nullptr ? " (set)" : "");
         MM_MediaExtractor_FreeBuffer(data);
     } else {
         s += " | -";
