@@ -301,7 +301,8 @@ TEST(AacClip, ChecksClipAndCodecOfEachFileShape) {
     Golden golden("aac", "clips");
     for (const auto& c : cases) {
         const std::string path = dir.Write("a.aac", c.file);
-        golden.Check(c.name, std::to_string(Verify(path)) + " | " + Probe(path));
+        const int32_t check = Verify(path);
+        golden.Check(c.name, std::to_string(check) + " | " + Probe(path));
     }
     golden.Check("missing", Probe(dir.PathOf("missing.aac")));
     int type = 0;  // detection takes the late ADIF file
