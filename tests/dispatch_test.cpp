@@ -5,11 +5,8 @@
 #include <sys/stat.h>
 
 #include <algorithm>
-#include <cctype>
 #include <cstddef>
 #include <cstring>
-#include <filesystem>
-#include <set>
 #include <string>
 #include <vector>
 

@@ -6,7 +6,6 @@
 
 #include <cstdio>
 #include <cstring>
-#include <filesystem>
 #include <thread>
 
 #include "metainfo/extract.h"
