@@ -9,7 +9,6 @@
 #include <chrono>
 #include <cstdlib>
 #include <cstring>
-#include <filesystem>
 #include <random>
 #include <string>
 #include <thread>
@@ -27,6 +26,7 @@
 #include "metainfo/metainfo.h"
 #include "support/aac_builder.h"
 #include "support/bytes.h"
+#include "support/golden.h"
 #include "support/media.h"
 #include "support/summary.h"
 
@@ -242,94 +242,68 @@ TEST(AacClip, ChecksClipAndCodecOfEachFileShape) {
     const struct {
         const char* name;
         Data file;
-        int32_t check;
-        const char* clip;
     } cases[] = {
         // An SBR fill element (extension 13 or 14) gives the AAC+ code and doubles the rate;
         // the profile goes into the subtype; a reserved sampling index gives rate, bit rate
         // and duration 0.
-        {"24 kHz mono", Frames(8, 60, 6, 1), MM_OK,
-         "aac size=480 bps=11250 audio=1 abps=11250 hz=24000 ch=1 bits=16 a=2011/0/2102 v=0/0/0"},
-        {"sbr 13", Frames(8, 60, 6, 2, 0, 13), MM_OK,
-         "aac size=480 bps=11250 audio=1 abps=11250 hz=48000 ch=2 bits=16 a=2012/0/2101 v=0/0/0"},
-        {"sbr 14", Frames(8, 60, 6, 1, 2, 14), MM_OK,
-         "aac size=480 bps=11250 audio=1 abps=11250 hz=48000 ch=1 bits=16 a=2012/0/2103 v=0/0/0"},
-        {"profile 3, no channel configuration", Frames(8, 60, 4, 0, 3), MM_OK,
-         "aac size=480 bps=20671 audio=1 abps=20671 hz=44100 ch=4294967295 bits=16 a=2011/0/1234 v=0/0/0"},
-        {"channel configuration 7", Frames(8, 60, 4, 7), MM_OK,
-         "aac size=480 bps=20671 audio=1 abps=20671 hz=44100 ch=8 bits=16 a=2011/0/2102 v=0/0/0"},
-        {"sampling index 13", Frames(8, 60, 13), MM_OK, "aac size=480 audio=1 ch=2 bits=16 a=2011/0/2102 v=0/0/0"},
+        {"24 kHz mono", Frames(8, 60, 6, 1)},
+        {"sbr 13", Frames(8, 60, 6, 2, 0, 13)},
+        {"sbr 14", Frames(8, 60, 6, 1, 2, 14)},
+        {"profile 3, no channel configuration", Frames(8, 60, 4, 0, 3)},
+        {"channel configuration 7", Frames(8, 60, 4, 7)},
+        {"sampling index 13", Frames(8, 60, 13)},
         // Only frames followed by a whole maximal frame's worth of data are walked (besides
         // the first two), so SBR in the third frame of a short file is not seen.
-        {"sbr in a short file", Cat({sbrThird, Frames(5, 200)}), MM_OK,
-         "aac size=1600 bps=68906 audio=1 abps=68906 hz=44100 ch=2 bits=16 a=2011/0/2102 v=0/0/0"},
-        {"sbr in a long file", Cat({sbrThird, Frames(60, 200)}), MM_OK,
-         "aac size=12600 dur=1 bps=68906 audio=1 abps=68906 hz=88200 ch=2 bits=16 a=2012/0/2102 v=0/0/0"},
+        {"sbr in a short file", Cat({sbrThird, Frames(5, 200)})},
+        {"sbr in a long file", Cat({sbrThird, Frames(60, 200)})},
         // From four frames on, the average leaves out the first and the two largest:
         // of 130 100 120 300 250 160 it keeps 100 120 160.
-        {"three frames", Cat({AdtsFrames(AdtsLayout(4, 2), {60, 100, 140}), Zeros(200)}), MM_OK,
-         "aac size=500 bps=34453 audio=1 abps=34453 hz=44100 ch=2 bits=16 a=2011/0/2102 v=0/0/0"},
-        {"six frames", Cat({AdtsFrames(AdtsLayout(4, 2), {130, 100, 120, 300, 250, 160}), Zeros(200)}), MM_OK,
-         "aac size=1260 bps=43410 audio=1 abps=43410 hz=44100 ch=2 bits=16 a=2011/0/2102 v=0/0/0"},
-        {"too long a third frame", Cat({Frames(2, 200), tooLong, Frames(6, 300)}), MM_OK,
-         "aac size=2500 bps=68906 audio=1 abps=68906 hz=44100 ch=2 bits=16 a=2011/0/2102 v=0/0/0"},
-        {"whole third frame", Cat({Frames(2, 200), Frames(7, 300)}), MM_OK,
-         "aac size=2500 bps=97502 audio=1 abps=97502 hz=44100 ch=2 bits=16 a=2011/0/2102 v=0/0/0"},
-        {"too long a first frame", Cat({tooLong, Frames(6, 300)}), MM_E_UNSUPPORTED, "-2147024665"},
+        {"three frames", Cat({AdtsFrames(AdtsLayout(4, 2), {60, 100, 140}), Zeros(200)})},
+        {"six frames", Cat({AdtsFrames(AdtsLayout(4, 2), {130, 100, 120, 300, 250, 160}), Zeros(200)})},
+        {"too long a third frame", Cat({Frames(2, 200), tooLong, Frames(6, 300)})},
+        {"whole third frame", Cat({Frames(2, 200), Frames(7, 300)})},
+        {"too long a first frame", Cat({tooLong, Frames(6, 300)})},
         // The second frame must match the first; a lone frame's second header lies beyond the data.
-        {"ssr after lc", Cat({one, Frames(2, 100, 4, 2, 2)}), MM_E_UNSUPPORTED, "-2147024665"},
-        {"main after lc", Cat({Silent(1), Silent(2, main)}), MM_E_UNSUPPORTED, "-2147024665"},
-        {"mpeg-2 after mpeg-4", Cat({Silent(1), Silent(2, mpeg2)}), MM_E_UNSUPPORTED, "-2147024665"},
-        {"lone frame", Cat({Zeros(20), one}), MM_E_UNSUPPORTED, "-2147024665"},
-        {"one frame", Silent(1), MM_E_UNSUPPORTED, "-2147467259"},
+        {"ssr after lc", Cat({one, Frames(2, 100, 4, 2, 2)})},
+        {"main after lc", Cat({Silent(1), Silent(2, main)})},
+        {"mpeg-2 after mpeg-4", Cat({Silent(1), Silent(2, mpeg2)})},
+        {"lone frame", Cat({Zeros(20), one})},
+        {"one frame", Silent(1)},
         // Only the first 4096 bytes after the tag (and its footer) are scanned.
-        {"three frames of 11 bytes", Silent(3), MM_OK,
-         "aac size=33 bps=3789 audio=1 abps=3789 hz=44100 ch=2 bits=16 a=2011/0/2102 v=0/0/0"},
-        {"50 bytes before", Cat({Zeros(50), Silent(3)}), MM_OK,
-         "aac size=83 bps=3789 audio=1 abps=3789 hz=44100 ch=2 bits=16 a=2011/0/2102 v=0/0/0"},
-        {"4089 bytes before", Cat({Zeros(4089), Silent(3)}), MM_E_UNSUPPORTED,
-         "aac size=4122 bps=3789 audio=1 abps=3789 hz=44100 ch=2 bits=16 a=2011/0/2102 v=0/0/0"},
-        {"4000-byte tag", Cat({Id3v2Tag(4, Zeros(4000), 0x10), Zeros(10), Silent(3)}), MM_OK,
-         "aac size=4053 bps=3789 audio=1 abps=3789 hz=44100 ch=2 bits=16 a=2011/0/2102 v=0/0/0"},
+        {"three frames of 11 bytes", Silent(3)},
+        {"50 bytes before", Cat({Zeros(50), Silent(3)})},
+        {"4089 bytes before", Cat({Zeros(4089), Silent(3)})},
+        {"4000-byte tag", Cat({Id3v2Tag(4, Zeros(4000), 0x10), Zeros(10), Silent(3)})},
         // (2100 - 100) x 8 / 8000; starting at the footer would give 1990 bytes, 1 second.
-        {"footer tag", Cat({footerTag, speech, Zeros(60)}), MM_OK,
-         "aac size=2100 dur=2 bps=8000 audio=1 abps=8000 hz=8000 ch=1 bits=16 a=2011/0/2102 v=0/0/0"},
-        {"trailing tag", Cat({speech, Zeros(79), Bytes().str("TAG").zeros(125).data()}), MM_OK,
-         "aac size=2127 dur=1 bps=8000 audio=1 abps=8000 hz=8000 ch=1 bits=16 a=2011/0/2102 v=0/0/0"},
-        {"four bytes after the tag", Cat({Id3v2Tag(3, Zeros(10)), {0xFF, 0xF1, 0x50, 0x80}}), MM_E_UNSUPPORTED,
-         "-2147024665"},
-        {"three bytes after the tag", Cat({Id3v2Tag(3, Zeros(10)), {0xFF, 0xF1, 0x50}}), MM_E_FAIL, "-2147467259"},
-        {"tag and two bytes", Cat({Id3v2Tag(3, Zeros(200)), Zeros(2)}), MM_E_FAIL, "-2147467259"},
-        {"15 bytes", Zeros(15), MM_E_UNSUPPORTED, "-2147467259"},
-        {"zeros", Zeros(200), MM_E_UNSUPPORTED, "-2147024665"},
+        {"footer tag", Cat({footerTag, speech, Zeros(60)})},
+        {"trailing tag", Cat({speech, Zeros(79), Bytes().str("TAG").zeros(125).data()})},
+        {"four bytes after the tag", Cat({Id3v2Tag(3, Zeros(10)), {0xFF, 0xF1, 0x50, 0x80}})},
+        {"three bytes after the tag", Cat({Id3v2Tag(3, Zeros(10)), {0xFF, 0xF1, 0x50}})},
+        {"tag and two bytes", Cat({Id3v2Tag(3, Zeros(200)), Zeros(2)})},
+        {"15 bytes", Zeros(15)},
+        {"zeros", Zeros(200)},
         // ADIF is accepted where the check meets it, but read only at the start of the data.
         // The copyright id shifts every later field by 9 bytes; a zero bit rate gives duration
         // 0; SBR in the first block gives the AAC+ code and doubles the rate.
-        {"adif", Cat({AdifFile(Adif(false, false, 3, 96000), AacBlock(true, 0, 20)), Zeros(24000)}), MM_OK,
-         "aac size=24037 dur=2 bps=96000 audio=1 abps=96000 hz=48000 ch=2 bits=16 a=2001/0/2102 v=0/0/0"},
-        {"adif copyright", Cat({AdifFile(Adif(true, false, 8, 64000), AacBlock(true, 0, 20)), Zeros(24000)}), MM_OK,
-         "aac size=24046 dur=3 bps=64000 audio=1 abps=64000 hz=16000 ch=2 bits=16 a=2001/0/2102 v=0/0/0"},
-        {"adif copyright vbr", Cat({AdifFile(Adif(true, true, 8, 64000), AacBlock(true, 0, 20)), Zeros(24000)}), MM_OK,
-         "aac size=24043 dur=3 bps=64000 audio=1 abps=64000 hz=16000 ch=2 bits=16 a=2001/0/2102 v=0/0/0"},
-        {"adif bit rate 0", Cat({AdifFile(Adif(false, false, 3, 0), AacBlock(true, 0, 20)), Zeros(24000)}), MM_OK,
-         "aac size=24037 audio=1 hz=48000 ch=2 bits=16 a=2001/0/2102 v=0/0/0"},
-        {"adif sbr", Cat({AdifFile(Adif(false, true, 6, 64000), AacBlock(true, 13, 20)), Zeros(24000)}), MM_OK,
-         "aac size=24034 dur=3 bps=64000 audio=1 abps=64000 hz=48000 ch=2 bits=16 a=2002/0/2102 v=0/0/0"},
+        {"adif", Cat({AdifFile(Adif(false, false, 3, 96000), AacBlock(true, 0, 20)), Zeros(24000)})},
+        {"adif copyright", Cat({AdifFile(Adif(true, false, 8, 64000), AacBlock(true, 0, 20)), Zeros(24000)})},
+        {"adif copyright vbr", Cat({AdifFile(Adif(true, true, 8, 64000), AacBlock(true, 0, 20)), Zeros(24000)})},
+        {"adif bit rate 0", Cat({AdifFile(Adif(false, false, 3, 0), AacBlock(true, 0, 20)), Zeros(24000)})},
+        {"adif sbr", Cat({AdifFile(Adif(false, true, 6, 64000), AacBlock(true, 13, 20)), Zeros(24000)})},
         // Program configuration elements are summed and the last object type kept.
-        {"adif pces", AdifFile(pces, AacBlock(true, 0, 20)), MM_OK,
-         "aac size=50 bps=128000 audio=1 abps=128000 hz=44100 ch=9 bits=16 a=2001/0/2103 v=0/0/0"},
-        {"adif after a tag", Cat({Id3v2Tag(3, Zeros(30)), adif}), MM_OK,
-         "aac size=76 bps=128000 audio=1 abps=128000 hz=44100 bits=16 a=2001/0/2102 v=0/0/0"},
-        {"adif late", Cat({Zeros(40), adif}), MM_OK, "-2147024665"},
-        {"ADIF mid-file", Cat({Zeros(30), Bytes().str("ADIF").data(), Zeros(30)}), MM_OK, "-2147024665"},
+        {"adif pces", AdifFile(pces, AacBlock(true, 0, 20))},
+        {"adif after a tag", Cat({Id3v2Tag(3, Zeros(30)), adif})},
+        {"adif late", Cat({Zeros(40), adif})},
+        {"ADIF mid-file", Cat({Zeros(30), Bytes().str("ADIF").data(), Zeros(30)})},
     };
     TempDir dir;
+    Golden golden("aac", "clips");
     for (const auto& c : cases) {
         const std::string path = dir.Write("a.aac", c.file);
-        EXPECT_EQ(Verify(path), c.check) << c.name;
-        EXPECT_EQ(Probe(path), c.clip) << c.name;
+        const int32_t check = Verify(path);
+        golden.Check(c.name, std::to_string(check) + " | " + Probe(path));
     }
-    EXPECT_EQ(Probe(dir.PathOf("missing.aac")), "1");
+    golden.Check("missing", Probe(dir.PathOf("missing.aac")));
     int type = 0;  // detection takes the late ADIF file
     ASSERT_EQ(MM_MediaExtractor_DetectMediaType(dir.Write("late.aac", Cat({Zeros(40), adif})).c_str(), &type), MM_OK);
     EXPECT_EQ(type, MEDIA_TYPE_AAC);
@@ -378,30 +352,6 @@ TEST(AacClip, TruncatedAdifHeadersAnswerWithoutFault) {
         _MMClipInfo clip;
         EXPECT_EQ(AAC_GetClipInfo(path.c_str(), &clip), MM_OK) << cut;
     }
-}
-
-// Every corpus file, AAC or not and hostile ones included, is answered by the
-// AAC readers without a fault or a leaked handle; known files give their values.
-TEST(AacCorpus, EveryFileIsAnsweredWithoutFaultAndKnownFilesGiveTheirValues) {
-    const std::string corpus = CorpusDir();
-    if (corpus.empty()) GTEST_SKIP() << testing_support::NoCorpusReason();
-    const int before = OpenDescriptors();
-    for (const char* sub : {"/mutagen", "/taglib"}) {
-        for (const auto& entry : std::filesystem::directory_iterator(corpus + sub)) {
-            const std::string path = entry.path().string();
-            Probe(path);
-            unsigned char* data = nullptr;
-            int length = 0;
-            if (AAC_GetAuidoData_Buf(path.c_str(), 0, 1, &data, &length) == MM_OK) MM_MediaExtractor_FreeBuffer(data);
-        }
-    }
-    EXPECT_EQ(before, OpenDescriptors());
-    EXPECT_EQ(Probe(corpus + "/mutagen/adif.aac"),
-              "aac size=4096 bps=128000 audio=1 abps=128000 hz=48000 ch=2 bits=16 a=2001/0/1234 v=0/0/0");
-    EXPECT_EQ(Probe(corpus + "/mutagen/empty.aac"),
-              "aac size=2577 dur=3 bps=5167 audio=1 abps=5167 hz=44100 ch=2 bits=16 a=2011/0/2102 v=0/0/0");
-    EXPECT_EQ(Probe(corpus + "/taglib/empty1s.aac"),
-              "aac size=147 bps=1378 audio=1 abps=1378 hz=11025 ch=1 bits=16 a=2011/0/2102 v=0/0/0");
 }
 
 // Before the file variant's audio come the 20 bytes after the first 128: byte

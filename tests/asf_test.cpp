@@ -6,7 +6,6 @@
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
-#include <filesystem>
 #include <map>
 #include <string>
 #include <tuple>
@@ -18,6 +17,7 @@
 #include "metainfo/metainfo.h"
 #include "support/asf_builder.h"
 #include "support/bytes.h"
+#include "support/golden.h"
 #include "support/summary.h"
 
 using namespace testing_support;
@@ -159,41 +159,34 @@ TEST(AsfClip, FilePropertiesAndTheFirstStreamsGiveTheClip) {
     const struct {
         const char* name;
         std::vector<uint8_t> file;
-        const char* clip;
     } cases[] = {
         {"song.wma",
          AsfFile({AsfFileProperties(123456, 3 * kSecond, 500, 128000), AsfAudioStream(1, 0x0161, 22050, 1, 32000, 8),
-                  AsfAudioStream(2, 0x0161, 48000, 2, 320000, 24)}),
-         "wma size=123456 dur=2 bps=128000 audio=2 abps=32000 hz=22050 ch=1 bits=8"},
-        {"a.wma", AsfFile({AsfFileProperties(1000, 15 * kSecond / 10, 3000, 64000)}),
-         "wma size=1000 dur=4294967295 bps=64000"},
+                  AsfAudioStream(2, 0x0161, 48000, 2, 320000, 24)})},
+        {"a.wma", AsfFile({AsfFileProperties(1000, 15 * kSecond / 10, 3000, 64000)})},
         // Without bit rate or Header Extension objects: video gets the rest of the bit rate, no frame rate.
-        {"v.wmv", AsfFile({props, AsfAudioStream(1, 0x0161, 44100, 2, 128000), Wmv("WMV2", {0, 0, 0, 0}, 2, 320, 240)}),
-         "wmv size=1000 dur=1 bps=500000 audio=1 video=1 abps=128000 hz=44100 ch=2 bits=16 vbps=372000 w=320 h=240"},
+        {"v.wmv",
+         AsfFile({props, AsfAudioStream(1, 0x0161, 44100, 2, 128000), Wmv("WMV2", {0, 0, 0, 0}, 2, 320, 240)})},
         // Nor a frame rate when the Header Extension describes another stream.
-        {"w.wmv", AsfFile({AsfHeaderExtension({AsfExtStreamProperties(7, 400000)}), Wmv("WMV2", {0, 0, 0, 0}, 3)}),
-         "wmv video=1 w=176 h=144"},
+        {"w.wmv", AsfFile({AsfHeaderExtension({AsfExtStreamProperties(7, 400000)}), Wmv("WMV2", {0, 0, 0, 0}, 3)})},
         // The first video stream is chosen for bit rate and frame rate (10000000 / 666666)
         // whatever the object order.
-        {"x.wmv",
-         AsfFile({AsfStreamBitrates({{1, 96000}, {3, 111000}, {5, 222000}}),
-                  AsfHeaderExtension({AsfObject(asf_guid::kPadding, Bytes().zeros(8)),
-                                      AsfExtStreamProperties(5, 400000), AsfExtStreamProperties(3, 666666)}),
-                  props, AsfAudioStream(1, 0x0161, 44100, 2, 96000), Wmv("WMV2", {0, 0, 0, 0}, 3),
-                  Wmv("WMV2", {0, 0, 0, 0}, 5, 640, 480)}),
-         "wmv size=1000 dur=1 bps=500000 audio=1 video=2 abps=96000 hz=44100 ch=2 bits=16 vbps=111000 w=176 h=144 "
-         "fps=15"},
+        {"x.wmv", AsfFile({AsfStreamBitrates({{1, 96000}, {3, 111000}, {5, 222000}}),
+                           AsfHeaderExtension({AsfObject(asf_guid::kPadding, Bytes().zeros(8)),
+                                               AsfExtStreamProperties(5, 400000), AsfExtStreamProperties(3, 666666)}),
+                           props, AsfAudioStream(1, 0x0161, 44100, 2, 96000), Wmv("WMV2", {0, 0, 0, 0}, 3),
+                           Wmv("WMV2", {0, 0, 0, 0}, 5, 640, 480)})},
         // Fewer objects than counted end at the file end.
         {"b.wma",
-         AsfHeader({AsfFileProperties(1000, 3 * kSecond, 0, 1), AsfAudioStream(1, 0x0161, 8000, 1, 8000)}, 9).data(),
-         "wma size=1000 dur=3 bps=1 audio=1 abps=8000 hz=8000 ch=1 bits=16"},
+         AsfHeader({AsfFileProperties(1000, 3 * kSecond, 0, 1), AsfAudioStream(1, 0x0161, 8000, 1, 8000)}, 9).data()},
         // The format is the extension without its dot, cut to eight characters.
-        {"x.Asf", AsfFile({AsfFileProperties(1000, kSecond, 0, 1)}), "Asf size=1000 dur=1 bps=1"},
-        {"x.abcdefghijk", AsfFile({AsfFileProperties(1000, kSecond, 0, 1)}), "abcdefgh size=1000 dur=1 bps=1"},
-        {"noext", AsfFile({AsfFileProperties(1000, kSecond, 0, 1)}), "-2147467259"},
+        {"x.Asf", AsfFile({AsfFileProperties(1000, kSecond, 0, 1)})},
+        {"x.abcdefghijk", AsfFile({AsfFileProperties(1000, kSecond, 0, 1)})},
+        {"noext", AsfFile({AsfFileProperties(1000, kSecond, 0, 1)})},
     };
     ASSERT_EQ(dir.path().find('.'), std::string::npos);
-    for (const auto& c : cases) EXPECT_EQ(ClipOf(dir.Write(c.name, c.file)), c.clip) << c.name;
+    Golden golden("asf", "clips");
+    for (const auto& c : cases) golden.Check(c.name, ClipOf(dir.Write(c.name, c.file)));
     // Audio 0x1, video 0x10 and so on up to binary 0x1000000, OR-ed; padding adds nothing.
     std::vector<Bytes> streams;
     for (const char* type :
@@ -266,53 +259,52 @@ TEST(AsfCodec, CodesProfilesAndLevelsOfTheStreams) {
     };
     const struct {
         std::vector<Bytes> streams;
-        const char* codec;
     } cases[] = {
-        {{Wma(0x0161, 44100, 128000)}, "a=6001/6010/0 v=0/0/0"},
-        {{Wma(0x0161, 48000, 320000)}, "a=6001/6011/0 v=0/0/0"},
-        {{Wma(0x0161, 49153, 128000)}, "a=6001/0/0 v=0/0/0"},
-        {{Wma(0x0161, 49152, 128000)}, "a=6001/6010/0 v=0/0/0"},
-        {{Wma(0x0161, 44100, 192992)}, "a=6001/6010/0 v=0/0/0"},
-        {{Wma(0x0161, 44100, 193000)}, "a=6001/6011/0 v=0/0/0"},
-        {{Wma(0x0161, 44100, 394240)}, "a=6001/6011/0 v=0/0/0"},
-        {{Wma(0x0161, 44100, 394248)}, "a=6001/0/0 v=0/0/0"},
-        {{Wma(0x0162, 44100, 128000)}, "a=6002/6010/0 v=0/0/0"},
-        {{Wma(0x0163, 44100, 128000)}, "a=0/0/0 v=0/0/0"},
+        {{Wma(0x0161, 44100, 128000)}},
+        {{Wma(0x0161, 48000, 320000)}},
+        {{Wma(0x0161, 49153, 128000)}},
+        {{Wma(0x0161, 49152, 128000)}},
+        {{Wma(0x0161, 44100, 192992)}},
+        {{Wma(0x0161, 44100, 193000)}},
+        {{Wma(0x0161, 44100, 394240)}},
+        {{Wma(0x0161, 44100, 394248)}},
+        {{Wma(0x0162, 44100, 128000)}},
+        {{Wma(0x0163, 44100, 128000)}},
         // The first codec stays; later streams overwrite the profile, an unknown tag's too.
-        {{Wma(0x0162, 44100, 128000, 1), Wma(0x0161, 48000, 320000, 2)}, "a=6002/6011/0 v=0/0/0"},
-        {{Wma(0x0161, 44100, 320000, 1), Wma(0x0001, 8000, 64000, 2)}, "a=6001/6010/0 v=0/0/0"},
-        {wmv3(0, 14, 96, false, 176, 144), "a=0/0/0 v=5003/5010/5020"},
-        {wmv3(0, 14, 96, false, 320, 240), "a=0/0/0 v=5003/5010/5021"},
-        {wmv3(1, 30, 2016, false, 1280, 720), "a=0/0/0 v=5003/5011/5022"},
-        {wmv3(1, 30, 2016, true, 1280, 720), "a=0/0/0 v=5003/5011/0"},
-        {wmv3(3, 30, 1000, false, 1920, 1080), "a=0/0/0 v=5003/5012/5027"},
-        {wmv3(3, 22, 1000, false, 1920, 1080), "a=0/0/0 v=5003/5012/5026"},
-        {wmv3(2, 14, 96, false, 176, 144), "a=0/0/0 v=5003/0/0"},
+        {{Wma(0x0162, 44100, 128000, 1), Wma(0x0161, 48000, 320000, 2)}},
+        {{Wma(0x0161, 44100, 320000, 1), Wma(0x0001, 8000, 64000, 2)}},
+        {wmv3(0, 14, 96, false, 176, 144)},
+        {wmv3(0, 14, 96, false, 320, 240)},
+        {wmv3(1, 30, 2016, false, 1280, 720)},
+        {wmv3(1, 30, 2016, true, 1280, 720)},
+        {wmv3(3, 30, 1000, false, 1920, 1080)},
+        {wmv3(3, 22, 1000, false, 1920, 1080)},
+        {wmv3(2, 14, 96, false, 176, 144)},
         // WMV1, MP42 and MP43 are recognised only without codec data, WMV2 only with it.
-        {{Wmv("WMV1", {})}, "a=0/0/0 v=5001/0/0"},
-        {{Wmv("WMV1", {0})}, "a=0/0/0 v=5001/0/0"},
-        {{Wmv("WMV1", {1, 2, 3, 4})}, "a=0/0/0 v=0/0/0"},
-        {{Wmv("WMV2", {})}, "a=0/0/0 v=ffff/0/0"},
-        {{Wmv("WMV2", {0x10, 0, 0, 0})}, "a=0/0/0 v=5002/0/0"},
-        {{Wmv("MP42", {})}, "a=0/0/0 v=4001/0/0"},
-        {{Wmv("MP43", {})}, "a=0/0/0 v=4001/0/0"},
-        {{Wmv("WVC1", {})}, "a=0/0/0 v=ffff/0/0"},
-        {{Wmv("WVC1", {0x25, 0, 0, 1, 0x0F})}, "a=0/0/0 v=0/0/0"},
+        {{Wmv("WMV1", {})}},
+        {{Wmv("WMV1", {0})}},
+        {{Wmv("WMV1", {1, 2, 3, 4})}},
+        {{Wmv("WMV2", {})}},
+        {{Wmv("WMV2", {0x10, 0, 0, 0})}},
+        {{Wmv("MP42", {})}},
+        {{Wmv("MP43", {})}},
+        {{Wmv("WVC1", {})}},
+        {{Wmv("WVC1", {0x25, 0, 0, 1, 0x0F})}},
         // The first WMV stream decides, but a later stream without data overwrites the codec.
-        {{Wmv("WMV3", SequenceHeader(0, 14, 96, false), 2), Wmv("WMV2", {0, 0, 0, 0}, 3, 640, 480)},
-         "a=0/0/0 v=5003/5010/5020"},
-        {{Wmv("WMV3", SequenceHeader(0, 14, 96, false), 2), Wmv("MP43", {}, 3, 640, 480)}, "a=0/0/0 v=4001/5010/5020"},
+        {{Wmv("WMV3", SequenceHeader(0, 14, 96, false), 2), Wmv("WMV2", {0, 0, 0, 0}, 3, 640, 480)}},
+        {{Wmv("WMV3", SequenceHeader(0, 14, 96, false), 2), Wmv("MP43", {}, 3, 640, 480)}},
         // Other stream types land the walk 38 bytes past their end: straight after a command
         // stream the audio stream is read from its middle, with 38 bytes between it is found.
-        {{command, Wma(0x0161, 44100, 128000)}, "a=0/0/0 v=0/0/0"},
-        {{command, filler, Wma(0x0161, 44100, 128000)}, "a=6001/6010/0 v=0/0/0"},
+        {{command, Wma(0x0161, 44100, 128000)}},
+        {{command, filler, Wma(0x0161, 44100, 128000)}},
     };
     TempDir dir;
+    Golden golden("asf", "codecs");
     for (const auto& c : cases) {
         _MM_CODECTYPE codec;
         std::memset(&codec, 0x5A, sizeof codec);
         EXPECT_EQ(ASF_GetCodecType(dir.Write("c.asf", AsfHeader(c.streams).data()).c_str(), &codec), 0);
-        EXPECT_EQ(CodecSummary(codec), c.codec) << &c - cases;
+        golden.Check(std::to_string(&c - cases), CodecSummary(codec));
     }
 }
 
@@ -359,11 +351,8 @@ TEST(AsfMeta, SourcesTheirOrderEncodingsAndRatings) {
     const struct {
         const char* name;
         std::vector<Bytes> objects;
-        std::string meta;
     } cases[] = {
-        {"content description",
-         {AsfContentDescription(std::string(100, 'x'), "Author", "(c)", "Words", "")},
-         "0 title=6~" + std::string(64, 'x') + " artist=6~Author\\x00 copyright=6~(c)\\x00 comment=6~Words\\x00"},
+        {"content description", {AsfContentDescription(std::string(100, 'x'), "Author", "(c)", "Words", "")}},
         {"descriptors",
          {AsfExtContentDescription({{"WM/AlbumTitle", kString, U16("Album")},
                                     {"WM/AlbumArtist", kString, U16("Band")},
@@ -373,10 +362,7 @@ TEST(AsfMeta, SourcesTheirOrderEncodingsAndRatings) {
                                     {"WM/Language", kString, U16("en")},
                                     {"WM/Unknown", kString, U16("skipped")},
                                     {"WM/OriginalArtist", kBytes, {1, 2, 3}},
-                                    {"WM/TrackNumber", kDword, {7, 0, 0, 0}}})},
-         "0 artist=2:\\x01\\x02\\x03 album=6~Album\\x00 genre=2:" + std::string(128, 'z') +
-             " year=6~2004\\x00 composer=6~Comp\\x00 track=0:\\x07\\x00\\x00\\x00 language=6~en\\x00 "
-             "albumartist=6~Band\\x00"},
+                                    {"WM/TrackNumber", kDword, {7, 0, 0, 0}}})}},
         {"first source wins",
          {AsfMetadata({{"WM/TrackNumber", kString, U16("99")}}),
           AsfHeaderExtension({AsfMetadata({{"WM/AlbumTitle", kString, U16("FromMetadata")},
@@ -386,27 +372,26 @@ TEST(AsfMeta, SourcesTheirOrderEncodingsAndRatings) {
           AsfExtContentDescription({{"WM/AlbumTitle", kString, U16("FromExtended")},
                                     {"WM/OriginalArtist", kString, U16("Original")},
                                     {"WM/AlbumTitle", kString, U16("Second")}}),
-          AsfContentDescription("T", "Author", "", "", "")},
-         "0 title=6~T\\x00 artist=6~Author\\x00 album=6~FromExtended\\x00 genre=6~Rock\\x00 track=6~12\\x00"},
+          AsfContentDescription("T", "Author", "", "", "")}},
         // A data type above six is corruption; what was read stays.
         {"data type 7",
          {AsfContentDescription("Kept", "", "", "", ""),
-          AsfExtContentDescription({{"WM/Year", kString, U16("1")}, {"WM/Genre", 7, {1, 2}}})},
-         "1 title=6~Kept\\x00 year=6~1\\x00"},
+          AsfExtContentDescription({{"WM/Year", kString, U16("1")}, {"WM/Genre", 7, {1, 2}}})}},
         // A name or a Header Extension that claims more than the file holds fails.
-        {"long name", {AsfObject(asf_guid::kExtContentDescription, Bytes().le16(1).le16(0xFFFF).str("W"))}, "1 "},
-        {"long extension", {AsfHeaderExtension({}, 1 << 20)}, "1 "},
-        {"empty extension", {AsfHeaderExtension({}, 0)}, "0 "},
+        {"long name", {AsfObject(asf_guid::kExtContentDescription, Bytes().le16(1).le16(0xFFFF).str("W"))}},
+        {"long extension", {AsfHeaderExtension({}, 1 << 20)}},
+        {"empty extension", {AsfHeaderExtension({}, 0)}},
         // Rating words are compared exactly.
-        {"high", {AsfContentDescription("t", "", "", "", "high")}, "0 title=6~t\\x00 rating=5"},
-        {"higher", {AsfContentDescription("t", "", "", "", "higher")}, "0 title=6~t\\x00 rating=4"},
-        {"middle", {AsfContentDescription("t", "", "", "", "middle")}, "0 title=6~t\\x00 rating=3"},
-        {"lower", {AsfContentDescription("t", "", "", "", "lower")}, "0 title=6~t\\x00 rating=2"},
-        {"low", {AsfContentDescription("t", "", "", "", "low")}, "0 title=6~t\\x00 rating=1"},
-        {"Higher", {AsfContentDescription("t", "", "", "", "Higher")}, "0 title=6~t\\x00"},
-        {"highest", {AsfContentDescription("t", "", "", "", "highest")}, "0 title=6~t\\x00"},
+        {"high", {AsfContentDescription("t", "", "", "", "high")}},
+        {"higher", {AsfContentDescription("t", "", "", "", "higher")}},
+        {"middle", {AsfContentDescription("t", "", "", "", "middle")}},
+        {"lower", {AsfContentDescription("t", "", "", "", "lower")}},
+        {"low", {AsfContentDescription("t", "", "", "", "low")}},
+        {"Higher", {AsfContentDescription("t", "", "", "", "Higher")}},
+        {"highest", {AsfContentDescription("t", "", "", "", "highest")}},
     };
-    for (const auto& c : cases) EXPECT_EQ(Meta(c.objects).Text(), c.meta) << c.name;
+    Golden golden("asf", "meta");
+    for (const auto& c : cases) golden.Check(c.name, Meta(c.objects).Text());
     const Meta picture({AsfHeaderExtension({brokenPicture})}, 0x7FFFFFFF);  // never allocated
     EXPECT_EQ(picture.Text(), "1 ");
     // A truncated object fails but keeps what was read.
@@ -431,46 +416,36 @@ TEST(AsfMeta, PicturesAndBanners) {
         const char* name;
         std::vector<Bytes> objects;
         int allowance;
-        const char* meta;
     } cases[] = {
-        {"small", {AsfExtContentDescription({small})}, 1, "0 picformat=6~image/jpeg\\x00cover\\x00 pic=1000"},
+        {"small", {AsfExtContentDescription({small})}, 1},
         {"just above the ceiling",
          {AsfHeaderExtension({AsfMetadata({{"WM/Picture", kBytes, PictureValue(0x80001)}}, true)})},
-         1,
-         "0 "},
-        {"large, allowance 1", {AsfHeaderExtension({AsfMetadata({large}, true)})}, 1, "0 "},
-        {"large, allowance below its size", {AsfHeaderExtension({AsfMetadata({large}, true)})}, 599999, "0 "},
-        {"large, allowance of its size",
-         {AsfHeaderExtension({AsfMetadata({large}, true)})},
-         600000,
-         "0 picformat=6~image/jpeg\\x00cover\\x00 pic=600000"},
+         1},
+        {"large, allowance 1", {AsfHeaderExtension({AsfMetadata({large}, true)})}, 1},
+        {"large, allowance below its size", {AsfHeaderExtension({AsfMetadata({large}, true)})}, 599999},
+        {"large, allowance of its size", {AsfHeaderExtension({AsfMetadata({large}, true)})}, 600000},
         {"claiming more",
          {AsfExtContentDescription({{"WM/Picture", kBytes, lying.data()}, {"WM/Year", kString, U16("7")}})},
-         1,
-         "0 year=6~7\\x00"},
-        {"shorter than its fields", {AsfExtContentDescription({{"WM/Picture", kBytes, {3, 1}}})}, 1, "0 "},
+         1},
+        {"shorter than its fields", {AsfExtContentDescription({{"WM/Picture", kBytes, {3, 1}}})}, 1},
         {"banner",
          {AsfContentBranding(2, Jpeg(300), "http://b", "http://c"),
           AsfExtContentDescription({{"WM/Picture", kBytes, PictureValue(10)}}),
           AsfContentDescription("After", "", "", "", "")},
-         1,
-         "0 title=6~After\\x00 picformat=2:image/jpeg\\x00 pic=300"},
+         1},
         {"banner, allowance 0",
          {AsfContentBranding(1, Jpeg(300)), AsfExtContentDescription({{"WM/Picture", kBytes, PictureValue(10)}}),
           AsfContentDescription("After", "", "", "", "")},
-         0,
-         "0 title=6~After\\x00 picformat=2:image/bmp\\x00 picsize=300"},
+         0},
         // Image type 0 leaves the walk inside the object.
-        {"image type 0", {AsfContentBranding(0, Bytes()), AsfContentDescription("Lost", "", "", "", "")}, 1, "0 "},
+        {"image type 0", {AsfContentBranding(0, Bytes()), AsfContentDescription("Lost", "", "", "", "")}, 1},
         // A second banner replaces the first picture: the size word never describes a buffer it does not match.
-        {"two banners",
-         {AsfContentBranding(2, Jpeg(300)), AsfContentBranding(3, Jpeg(600000))},
-         1,
-         "0 picformat=2:image/gif\\x00 picsize=600000"},
+        {"two banners", {AsfContentBranding(2, Jpeg(300)), AsfContentBranding(3, Jpeg(600000))}, 1},
     };
+    Golden golden("asf", "pictures");
     for (const auto& c : cases) {
         const Meta m(c.objects, c.allowance);
-        EXPECT_EQ(m.Text(), c.meta) << c.name;
+        golden.Check(c.name, m.Text());
         if (m.info.pPicture != nullptr) {
             EXPECT_EQ(std::vector<uint8_t>(m.info.pPicture, m.info.pPicture + m.info.nPictureSize),
                       Jpeg(m.info.nPictureSize).data())
@@ -485,28 +460,6 @@ TEST(AsfMeta, PicturesAndBanners) {
     EXPECT_NE(meta.pPicture, nullptr);
     EXPECT_EQ(meta.nPictureSize, 0x80000u);
     EXPECT_EQ(MM_MediaExtractor_FreeMetaInfo(&meta), 0);
-}
-
-TEST(AsfCorpus, EveryWmaIsAnsweredAndAgreesWithFfprobe) {
-    const std::string corpus = CorpusDir();
-    if (corpus.empty()) GTEST_SKIP() << testing_support::NoCorpusReason();
-    int files = 0;
-    for (const char* sub : {"/mutagen/", "/taglib/"}) {
-        for (const auto& entry : std::filesystem::directory_iterator(corpus + sub)) {
-            if (entry.path().extension() != ".wma") continue;
-            const std::string path = entry.path().string();
-            SCOPED_TRACE(path);
-            ++files;
-            const Answers a(path);
-            EXPECT_EQ(a.mask & TRACK_AUDIO, TRACK_AUDIO);
-            EXPECT_GE(a.clip.bHasAudio, 1u);
-            if (!HaveFfmpeg()) continue;
-            auto audio = Probe(path, "-select_streams a:0 -show_entries stream=sample_rate,channels");
-            EXPECT_EQ(a.clip.nSampleRate, Number(audio, "sample_rate"));
-            EXPECT_EQ(a.clip.nChannels, Number(audio, "channels"));
-        }
-    }
-    EXPECT_GT(files, 0);
 }
 
 // Audio alone and with WMV1 and WMV2 video: every query agrees with ffprobe;

@@ -7,7 +7,6 @@
 #include <algorithm>
 #include <cstdio>
 #include <cstring>
-#include <filesystem>
 #include <string>
 #include <tuple>
 
@@ -20,6 +19,7 @@
 #include "mp3/mp3_frame.h"
 #include "mp3/mp3_info.h"
 #include "support/bytes.h"
+#include "support/golden.h"
 #include "support/id3_builder.h"
 #include "support/mp3_builder.h"
 #include "support/summary.h"
@@ -302,54 +302,33 @@ TEST(Mp3Stream, KindDurationAndRatesOfEachStreamShape) {
     const struct {
         const char* name;
         Data file;
-        const char* clip;
-        const char* info;
     } cases[] = {
         // 1,600,000 audio bytes from the first frame, then an ID3v1 tag that is not audio.
-        {"cbr", Cat({Mp3Frames(3836), Data(1600000 - 3836 * 417, 0), Id3v1Titled("")}),
-         "mp3 size=1600128 dur=100 bps=128000 audio=1 abps=128000 hz=44100 ch=2 bits=16 spf=2304",
-         "kind=1 tag=128 avg=128000 dur=100 spf=1152 xing=0/0 frames=0 bytes=0 q=0 toc=-1 vbri=0/0"},
+        {"cbr", Cat({Mp3Frames(3836), Data(1600000 - 3836 * 417, 0), Id3v1Titled("")})},
         // The sampled rate drops the largest and smallest: kept, 32 and 320 kbit/s would raise it.
-        {"sampled", Cat({Mp3Frames(2), Mp3Frame(high), Mp3Frame(low), Mp3Frames(10)}),
-         "mp3 size=6152 bps=128000 audio=1 abps=128000 hz=44100 ch=2 bits=16 spf=2304",
-         "kind=1 tag=0 avg=128000 dur=0 spf=1152 xing=0/0 frames=0 bytes=0 q=0 toc=-1 vbri=0/0"},
+        {"sampled", Cat({Mp3Frames(2), Mp3Frame(high), Mp3Frame(low), Mp3Frames(10)})},
         // Duration from the frame count, 3828 * 1152 / 44100; with a table the sampled average stays.
-        {"xing", Then20Frames(XingFrame(xing)),
-         "mp3 size=8757 dur=99 bps=707 audio=1 abps=707 hz=44100 ch=2 bits=16 spf=2304",
-         "kind=2 tag=0 avg=128000 dur=99 spf=1152 xing=36/f frames=3828 bytes=1600000 q=57 toc=128 vbri=0/0"},
+        {"xing", Then20Frames(XingFrame(xing))},
         // No frame count: the clip request reads 0xFFFFFFFF frames; no table: the average is recomputed.
-        {"xing bytes only", Then20Frames(XingFrame(bytesOnly)),
-         "mp3 size=8757 dur=97391 audio=1 hz=44100 ch=2 bits=16 spf=2304",
-         "kind=2 tag=0 avg=0 dur=0 spf=1152 xing=36/2 frames=0 bytes=0 q=-1 toc=-1 vbri=0/0"},
-        {"xing of 0 frames", Then20Frames(XingFrame(zero)), "mp3 size=8757 audio=1 hz=44100 ch=2 bits=16 spf=2304",
-         "kind=2 tag=0 avg=0 dur=0 spf=1152 xing=36/1 frames=0 bytes=0 q=-1 toc=-1 vbri=0/0"},
+        {"xing bytes only", Then20Frames(XingFrame(bytesOnly))},
+        {"xing of 0 frames", Then20Frames(XingFrame(zero))},
         // Xing stands at 21 for MPEG-1 mono and MPEG-2 stereo, at 13 for MPEG-2 mono; "Info" is not read.
-        {"xing mono", Then20Frames(XingFrame({}, mono), mono), "mp3 size=8757 audio=1 hz=44100 ch=1 bits=16 spf=1152",
-         "kind=2 tag=0 avg=128000 dur=0 spf=1152 xing=21/f frames=0 bytes=0 q=57 toc=128 vbri=0/0"},
-        {"xing lsf", Then20Frames(XingFrame({}, lsf), lsf), "mp3 size=4368 audio=1 hz=22050 ch=2 bits=16 spf=2304",
-         "kind=2 tag=0 avg=64000 dur=0 spf=576 xing=21/f frames=0 bytes=0 q=57 toc=128 vbri=0/0"},
-        {"xing lsf mono", Then20Frames(XingFrame({}, lsfMono), lsfMono),
-         "mp3 size=4368 audio=1 hz=22050 ch=1 bits=16 spf=1152",
-         "kind=2 tag=0 avg=64000 dur=0 spf=576 xing=13/f frames=0 bytes=0 q=57 toc=128 vbri=0/0"},
-        {"info", Then20Frames(XingFrame(info)),
-         "mp3 size=8757 bps=128000 audio=1 abps=128000 hz=44100 ch=2 bits=16 spf=2304",
-         "kind=1 tag=0 avg=128000 dur=0 spf=1152 xing=0/0 frames=0 bytes=0 q=0 toc=-1 vbri=0/0"},
+        {"xing mono", Then20Frames(XingFrame({}, mono), mono)},
+        {"xing lsf", Then20Frames(XingFrame({}, lsf), lsf)},
+        {"xing lsf mono", Then20Frames(XingFrame({}, lsfMono), lsfMono)},
+        {"info", Then20Frames(XingFrame(info))},
         // VBRI: 16-bit fields little-endian, the scale word as quality, 1000 * 1152 / 44100.
-        {"vbri", Then20Frames(VbriFrame(vbri)),
-         "mp3 size=8757 dur=26 bps=2694 audio=1 abps=2694 hz=44100 ch=2 bits=16 spf=2304",
-         "kind=3 tag=0 avg=128000 dur=26 spf=1152 xing=0/0 frames=1000 bytes=400000 q=3 toc=-1 vbri=102/100"},
+        {"vbri", Then20Frames(VbriFrame(vbri))},
         // MPEG-2.5 halves the samples per frame for stereo only.
-        {"mpeg-2.5", Mp3Frames(12, mpeg25), "mp3 size=5004 bps=64000 audio=1 abps=64000 hz=11025 ch=2 bits=16 spf=288",
-         "kind=1 tag=0 avg=64000 dur=0 spf=576 xing=0/0 frames=0 bytes=0 q=0 toc=-1 vbri=0/0"},
-        {"mpeg-2.5 mono", Mp3Frames(12, mpeg25Mono),
-         "mp3 size=5004 bps=64000 audio=1 abps=64000 hz=11025 ch=1 bits=16 spf=576",
-         "kind=1 tag=0 avg=64000 dur=0 spf=576 xing=0/0 frames=0 bytes=0 q=0 toc=-1 vbri=0/0"},
-        {"15 bytes", Cat({Mp3Header({}), Data(11, 0)}), "-2147467259", "-2147467259"},
+        {"mpeg-2.5", Mp3Frames(12, mpeg25)},
+        {"mpeg-2.5 mono", Mp3Frames(12, mpeg25Mono)},
+        {"15 bytes", Cat({Mp3Header({}), Data(11, 0)})},
     };
+    Golden golden("mp3", "streams");
     for (const auto& c : cases) {
         const Probe p(c.file);
-        EXPECT_EQ(p.clipResult == MM_OK ? ClipSummary(p.clip) : std::to_string(p.clipResult), c.clip) << c.name;
-        EXPECT_EQ(InfoSummary(p), c.info) << c.name;
+        golden.Check(c.name, (p.clipResult == MM_OK ? ClipSummary(p.clip) : std::to_string(p.clipResult)) + " | " +
+                                 InfoSummary(p));
     }
 }
 
@@ -384,25 +363,8 @@ TEST(Mp3Stream, CodecFollowsTheLayerAndMimeReplacesTheOldString) {
     EXPECT_EQ(GetMediaInfo_MP3(nullptr, &mask, INFO_CLIPINFO), MM_E_INVALIDARG);
 }
 
-// Each frame of the table fills its item (TXXX none); the first frame wins; text is cut to 128 bytes.
-TEST(Id3Tags, FrameTableFillsItemsFirstFrameWinsAndTextIsCutTo128Bytes) {
-    Frames frames = {Text3("TIT2", std::string(300, 'x')),
-                     Text3("TIT2", "Second"),
-                     Text3("TXXX", "skipped"),
-                     Text3("TPE2", "Band"),
-                     Id3Frame(3, "PCNT", {0, 0, 1, 2}),
-                     Id3Frame(3, "POPM", {'a', '@', 'b', 0, 196, 0})};
-    for (const char* id :
-         {"TPE1", "TALB", "TYER", "TCOP", "TCOM", "TRCK", "TLAN", "TFLT", "TPE3", "TPUB", "TDAT", "TIME"})
-        frames.push_back(Text3(id, id));
-    EXPECT_EQ(Tags(Tagged(3, frames), 1),
-              "0 title=3:" + std::string(128, 'x') +
-                  " artist=3:TPE1 album=3:TALB year=3:TYER copyright=3:TCOP composer=3:TCOM track=3:TRCK "
-                  "language=3:TLAN filetype=3:TFLT conductor=3:TPE3 publisher=3:TPUB date=3:TDAT "
-                  "time=3:TIME rating=196 plays=258 albumartist=3:Band");
-}
-
 // One row per tag: the result and the items the reader fills, with the picture's first bytes.
+// Each frame of the table fills its item (TXXX none); the first frame wins; text is cut to 128 bytes.
 // A failed v2 parse keeps its items unless v1 replaces them whole; v2 wins over v1 (the
 // reader counts the header's ten bytes against the tag size: without padding the last frame
 // overruns the tag and the v2 parse fails). v2.4's encoding byte decides the code, v2.3
@@ -419,6 +381,15 @@ TEST(Id3Tags, FrameTableFillsItemsFirstFrameWinsAndTextIsCutTo128Bytes) {
 // is signed. Hostile sizes fail the tag; zero-size frames cost only their header and a
 // picture without a MIME terminator is dropped.
 TEST(Id3Tags, ItemsOfEachTag) {
+    Frames table = {Text3("TIT2", std::string(300, 'x')),
+                    Text3("TIT2", "Second"),
+                    Text3("TXXX", "skipped"),
+                    Text3("TPE2", "Band"),
+                    Id3Frame(3, "PCNT", {0, 0, 1, 2}),
+                    Id3Frame(3, "POPM", {'a', '@', 'b', 0, 196, 0})};
+    for (const char* id :
+         {"TPE1", "TALB", "TYER", "TCOP", "TCOM", "TRCK", "TLAN", "TFLT", "TPE3", "TPUB", "TDAT", "TIME"})
+        table.push_back(Text3(id, id));
     const auto broken = Id3Tag(3, {Text3("TCOM", "Composer"), Text3("TPE1", "Artist name")}, 0);
     const auto v1 = Id3v1Titled("V1 title");
     const auto frames = Mp3Frames(6);
@@ -441,69 +412,65 @@ TEST(Id3Tags, ItemsOfEachTag) {
         const char* name;
         Data file;
         int limit;
-        std::string tags;
     } cases[] = {
-        {"failed v2", Cat({broken, frames}), 1, "1 composer=3:Composer"},
-        {"replaced by v1", Cat({broken, frames, v1}), 1, "0 title=3:V1 title"},
-        {"v2 over v1", Cat({Tagged(3, {Text3("TIT2", "V2 title")}), v1}), 1, "0 title=3:V2 title"},
-        {"no tag", frames, 1, "1 "},
-        {"v2.4 utf-8", tit2(4, TextBody(3, "T\xC3\xA9")), 1, "0 title=5:T\\xC3\\xA9"},
-        {"v2.4 utf-16be", tit2(4, TextBytes(2, {0, 'A'})), 1, "0 title=4:\\x00A"},
-        {"v2.4 encoding 7", tit2(4, TextBody(7, "x")), 1, "0 title=3:x"},
-        {"v2.3 encoding 3", tit2(3, TextBody(3, "T\xC3\xA9")), 1, "0 title=3:T\\xC3\\xA9"},
-        {"v2.3 utf-16", tit2(3, TextBytes(1, {0xFF, 0xFE, 'H', 0, 'i', 0})), 1, "0 title=4:\\xFE\\xFF\\x00H\\x00i"},
-        {"v2.3 utf-16 odd", tit2(3, TextBytes(1, {0xFF, 0xFE, 'H', 0, 'i'})), 1, "0 "},
-        {"v2.3 utf-8 mark", tit2(3, TextBytes(1, {0xEF, 0xBB, 0xBF, 'U'})), 1, "0 title=5:\\xEF\\xBB\\xBFU"},
-        {"(17)Rock", tcon(TextBody(0, "(17)Rock")), 1, "0 genre=3:Rock"},
-        {"(17)", tcon(TextBody(0, "(17)")), 1, "0 genre=3:Rock"},
-        {"Rock", tcon(TextBody(0, "Rock")), 1, "0 genre=3:Rock"},
-        {"(255)", tcon(TextBody(0, "(255)")), 1, "0 genre=3:(255)"},
-        {"(-1)", tcon(TextBody(0, "(-1)")), 1, "0 genre=3:(-1)"},
-        {"(147)", tcon(TextBody(0, "(147)")), 1, "0 genre=3:Synthpop"},
-        {"(67)", tcon(TextBody(0, "(67)")), 1, "0 genre=3:Psychadelic"},
-        {"utf-16 (17)", tcon(TextBytes(1, {0xFF, 0xFE, '(', 0, '1', 0, '7', 0, ')', 0})), 1, "0 genre=3:Rock"},
-        {"utf-16be (8)", tcon(TextBytes(1, {0xFE, 0xFF, 0, '(', 0, '8', 0, ')'})), 1, "0 genre=3:Jazz"},
-        {"tdrc 9", Tagged(4, {Id3Frame(4, "TDRC", TextBody(0, "2004-05-0"))}), 1, "0 year=3:\\x00200 date=3:-05-0"},
-        {"tdrc 13", Tagged(4, {Id3Frame(4, "TDRC", Bytes().str("2004-05-06T12").data())}), 1,
-         "0 year=3:2004 date=3:05-06 time=3:12"},
-        {"tdrc 5", Tagged(4, {Id3Frame(4, "TDRC", TextBody(0, "2004"))}), 1, "0 "},
-        {"tyer first", Tagged(3, {Text3("TYER", "1999"), Id3Frame(3, "TDRC", {'2', '0', '0', '4'})}), 1,
-         "0 year=3:1999"},
-        {"comment", comm(0, Bytes().str("desc").u8(0).str("Comment").data()), 1, "0 comment=3:Comment"},
-        {"comment utf-16", comm(1, {0xFF, 0xFE, 0, 0, 0xFF, 0xFE, 'O', 0, 'K', 0}), 1,
-         "0 comment=4:\\xFE\\xFF\\x00O\\x00K"},
-        {"comment early end", comm(1, {0xFF, 0xFE, 'd', 0, 0, 0, 0xFF, 0xFE, 'O', 0}), 1,
-         "0 comment=4:\\x00\\xFF\\xFEO\\x00"},
-        {"picture", apic, 1, "0 picformat=3:image/jpeg pic=7 ff d8 ff e0 01 02 03"},
-        {"picture, limit 0", apic, 0, "0 "},
-        {"large picture", large, 1, "0 "},
-        {"large picture within the limit", large, 600000, "0 picformat=3:image/png pic=599987 00 00 00 00 00 00 00 00"},
+        {"frame table", Tagged(3, table), 1},
+        {"failed v2", Cat({broken, frames}), 1},
+        {"replaced by v1", Cat({broken, frames, v1}), 1},
+        {"v2 over v1", Cat({Tagged(3, {Text3("TIT2", "V2 title")}), v1}), 1},
+        {"no tag", frames, 1},
+        {"v2.4 utf-8", tit2(4, TextBody(3, "T\xC3\xA9")), 1},
+        {"v2.4 utf-16be", tit2(4, TextBytes(2, {0, 'A'})), 1},
+        {"v2.4 encoding 7", tit2(4, TextBody(7, "x")), 1},
+        {"v2.3 encoding 3", tit2(3, TextBody(3, "T\xC3\xA9")), 1},
+        {"v2.3 utf-16", tit2(3, TextBytes(1, {0xFF, 0xFE, 'H', 0, 'i', 0})), 1},
+        {"v2.3 utf-16 odd", tit2(3, TextBytes(1, {0xFF, 0xFE, 'H', 0, 'i'})), 1},
+        {"v2.3 utf-8 mark", tit2(3, TextBytes(1, {0xEF, 0xBB, 0xBF, 'U'})), 1},
+        {"(17)Rock", tcon(TextBody(0, "(17)Rock")), 1},
+        {"(17)", tcon(TextBody(0, "(17)")), 1},
+        {"Rock", tcon(TextBody(0, "Rock")), 1},
+        {"(255)", tcon(TextBody(0, "(255)")), 1},
+        {"(-1)", tcon(TextBody(0, "(-1)")), 1},
+        {"(147)", tcon(TextBody(0, "(147)")), 1},
+        {"(67)", tcon(TextBody(0, "(67)")), 1},
+        {"utf-16 (17)", tcon(TextBytes(1, {0xFF, 0xFE, '(', 0, '1', 0, '7', 0, ')', 0})), 1},
+        {"utf-16be (8)", tcon(TextBytes(1, {0xFE, 0xFF, 0, '(', 0, '8', 0, ')'})), 1},
+        {"tdrc 9", Tagged(4, {Id3Frame(4, "TDRC", TextBody(0, "2004-05-0"))}), 1},
+        {"tdrc 13", Tagged(4, {Id3Frame(4, "TDRC", Bytes().str("2004-05-06T12").data())}), 1},
+        {"tdrc 5", Tagged(4, {Id3Frame(4, "TDRC", TextBody(0, "2004"))}), 1},
+        {"tyer first", Tagged(3, {Text3("TYER", "1999"), Id3Frame(3, "TDRC", {'2', '0', '0', '4'})}), 1},
+        {"comment", comm(0, Bytes().str("desc").u8(0).str("Comment").data()), 1},
+        {"comment utf-16", comm(1, {0xFF, 0xFE, 0, 0, 0xFF, 0xFE, 'O', 0, 'K', 0}), 1},
+        {"comment early end", comm(1, {0xFF, 0xFE, 'd', 0, 0, 0, 0xFF, 0xFE, 'O', 0}), 1},
+        {"picture", apic, 1},
+        {"picture, limit 0", apic, 0},
+        {"large picture", large, 1},
+        {"large picture within the limit", large, 600000},
         {"v2.2",
          Tagged(2, {Id3Frame22("TT2", TextBody(0, "Two")), Id3Frame22("TCO", TextBody(0, "(0)")),
                     Id3Frame22("PIC", Bytes().u8(0).str("PNG").u8(0).str("d").u8(0).u8(9).data())}),
-         1, "0 title=3:Two genre=3:Blues picformat=3:PNG pic=1 09"},
+         1},
         {"unsynchronised",
          Tagged(3,
                 {Id3Frame(3, "TIT2", Unsynchronise(TextBytes(0, {'a', 0xFF, 'b'}))),
                  Id3Frame(3, "APIC", Unsynchronise(ApicBody("image/jpeg", unsyncPicture)))},
                 16, 0x80),
-         1, "0 title=3:a\\xFFb picformat=3:image/jpeg\\x00 pic=5 ff d8 ff 00 ff"},
-        {"v2.4 frame unsync", Tagged(4, {Id3Frame(4, "TIT2", unsync24, 0x03)}), 1, "0 title=3:x\\xFF\\x00y"},
-        {"extended header", Cat({Id3v2Tag(3, extended, 0x40), frames}), 1, "0 title=3:Ext"},
-        {"extended header, unsync", Cat({Id3v2Tag(3, extended, 0xC0), frames}), 1, "0 title=3:Ext"},
-        {"v1", Cat({frames, Id3v1({"Title  \t", "Artist", "Album", "2001", "Note", 200, 17})}), 1,
-         "0 title=3:Title artist=3:Artist album=3:Album genre=3:Rock year=3:2001 track=3:-56 comment=3:Note"},
-        {"v1 track 0, genre 148", Cat({frames, Id3v1({"T", "", "", "", "", 0, 148})}), 1, "0 title=3:T"},
-        {"truncated", truncated, 1, "1 "},
-        {"huge tag", Bytes().str("ID3").u8(3).zeros(2).syncsafe32(0x0FFFFFFF).raw(frames).data(), 1, "1 "},
-        {"frame beyond the tag", hugeFrame(0x7FFFFFF0u), 1, "1 "},
-        {"negative frame", hugeFrame(0x80000001u), 1, "1 "},
+         1},
+        {"v2.4 frame unsync", Tagged(4, {Id3Frame(4, "TIT2", unsync24, 0x03)}), 1},
+        {"extended header", Cat({Id3v2Tag(3, extended, 0x40), frames}), 1},
+        {"extended header, unsync", Cat({Id3v2Tag(3, extended, 0xC0), frames}), 1},
+        {"v1", Cat({frames, Id3v1({"Title  \t", "Artist", "Album", "2001", "Note", 200, 17})}), 1},
+        {"v1 track 0, genre 148", Cat({frames, Id3v1({"T", "", "", "", "", 0, 148})}), 1},
+        {"truncated", truncated, 1},
+        {"huge tag", Bytes().str("ID3").u8(3).zeros(2).syncsafe32(0x0FFFFFFF).raw(frames).data(), 1},
+        {"frame beyond the tag", hugeFrame(0x7FFFFFF0u), 1},
+        {"negative frame", hugeFrame(0x80000001u), 1},
         {"empty frames",
          Tagged(3, {Id3Frame(3, "TIT2", {}), Id3Frame(3, "APIC", {}), Id3Frame(3, "APIC", TextBody(0, "image/png")),
                     Text3("TIT2", "ok")}),
-         1, "0 title=3:ok picformat=3:image/png"},
+         1},
     };
-    for (const auto& c : cases) EXPECT_EQ(Tags(c.file, c.limit), c.tags) << c.name;
+    Golden golden("mp3", "tags");
+    for (const auto& c : cases) golden.Check(c.name, Tags(c.file, c.limit));
     uint8_t shortBody[] = {1, 2, 3};  // below four bytes there is no indicator to drop
     EXPECT_EQ(RemoveDataLengthIndicator(shortBody, 3), 3u);
 }
@@ -641,40 +608,6 @@ TEST(Mp3Extract, CutFilesDecodeForTheRequestedSpan) {
         ASSERT_EQ(MP3_GetAudioData2File((corpus + "/" + name).c_str(), 1, 2, out.c_str()), MM_OK) << name;
         EXPECT_GT(DecodedSeconds(out), 0.5) << name;
     }
-}
-
-TEST(Mp3Corpus, EveryFileIsAnsweredWithoutFaultAndKnownFilesAsByHand) {
-    const std::string corpus = CorpusDir();
-    if (corpus.empty()) GTEST_SKIP() << testing_support::NoCorpusReason();
-    TempDir dir;
-    for (const char* sub : {"/mutagen", "/taglib"}) {
-        for (const auto& entry : std::filesystem::directory_iterator(corpus + sub)) {
-            const std::string ext = entry.path().extension().string();
-            if (ext != ".mp3" && ext != ".id3") continue;
-            SCOPED_TRACE(entry.path().string());
-            EXPECT_NE(AskEverything(entry.path().string(), dir.PathOf("cut.mp3")), 0);
-        }
-    }
-    // silence-44-s.mp3: ID3v2.3 tag then 32 kbit/s MPEG-1 Layer III stereo.
-    const std::string silence = corpus + "/mutagen/silence-44-s.mp3";
-    _MMClipInfo clip;
-    ASSERT_EQ(MP3_GetClipInfo(silence.c_str(), &clip), MM_OK);
-    EXPECT_EQ(std::tie(clip.nSampleRate, clip.nChannels, clip.nBitrate, clip.nFileSize),
-              std::make_tuple(44100u, 2u, 32000u, 16384u));
-    _MMMetaInfo meta;
-    std::memset(&meta, 0, sizeof meta);
-    ASSERT_EQ(ID3_GetMetaInfo(silence.c_str(), &meta, 1), MM_OK);
-    EXPECT_EQ(
-        std::string(reinterpret_cast<const char*>(meta.aItems[META_TITLE].szData), meta.aItems[META_TITLE].nLength),
-        "Silence");
-    MM_MediaExtractor_FreeMetaInfo(&meta);
-    // silence-44-s-mpeg25.mp3: MPEG-2.5 stereo reports 1152 >> 2 samples per frame.
-    ASSERT_EQ(MP3_GetClipInfo((corpus + "/mutagen/silence-44-s-mpeg25.mp3").c_str(), &clip), MM_OK);
-    EXPECT_EQ(std::tie(clip.nSampleRate, clip.nSamplesPerFrame), std::make_tuple(12000u, 288u));
-    // vbri.mp3 carries a VBRI header; lame_vbr.mp3 (mono MPEG-1) has its Xing header at byte 21.
-    EXPECT_EQ(VbrHeaderOf(corpus + "/mutagen/vbri.mp3").first, 3u);
-    EXPECT_EQ(VbrHeaderOf(corpus + "/taglib/lame_vbr.mp3"), std::make_pair(2u, 21u));
-    EXPECT_NE(MP3_GetClipInfo((corpus + "/mutagen/emptyfile.mp3").c_str(), &clip), MM_OK);
 }
 
 TEST(Mp3Robustness, DamagedCopiesOfATaggedXingFileAreAnsweredWithoutFault) {

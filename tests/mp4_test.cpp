@@ -1,17 +1,13 @@
-// MP4 files built box by box (the walk and its size rules, the movie, media and track
-// headers, sample descriptions, user-data metadata and the maker box), the MP4 family
-// of the corpus (some of them hostile) and files written by ffmpeg, checked against
-// what ffprobe reports.
+// MP4 files built box by box: the walk and its size rules, the movie, media and track
+// headers, sample descriptions, user-data metadata and the maker box. Real files (some
+// of them hostile) are in the corpus test.
 #include <gtest/gtest.h>
 #include <fcntl.h>
 #include <unistd.h>
 
 #include <algorithm>
-#include <cctype>
-#include <cmath>
 #include <cstdio>
 #include <cstring>
-#include <filesystem>
 #include <string>
 #include <tuple>
 
@@ -23,7 +19,7 @@
 #include "mp4/mp4_internal.h"
 #include "support/aac_builder.h"
 #include "support/bytes.h"
-#include "support/ffprobe.h"
+#include "support/golden.h"
 #include "support/id3_builder.h"
 #include "support/mp4_builder.h"
 #include "support/summary.h"
@@ -136,29 +132,6 @@ protected:
     }
 };
 
-// Every query of the public interface, plus the maker box.
-struct Answers {
-    int type = 0, mask = 0;
-    int32_t clipResult = 0, codecResult = 0, metaResult = 0;
-    _MMClipInfo clip{};
-    _MM_CODECTYPE codec{};
-    _MMMetaInfo meta{};
-    explicit Answers(const std::string& path) {
-        const char* p = path.c_str();
-        MM_MediaExtractor_DetectMediaType(p, &type);
-        MM_MediaExtractor_GetTrackType(p, MEDIA_TYPE_MP4, &mask);
-        codecResult = MM_MediaExtractor_GetCodecType(p, MEDIA_TYPE_MP4, &codec);
-        clipResult = MM_MediaExtractor_GetClipInfo(p, MEDIA_TYPE_MP4, &clip);
-        metaResult = MM_MediaExtractor_GetMetaInfo(p, MEDIA_TYPE_MP4, &meta);
-        _MAKERINFO maker{};
-        MP4_GetMakerInfo(p, &maker);
-        MM_MediaExtractor_FreeBuffer(maker.pPhoneModel);
-        MM_MediaExtractor_FreeBuffer(maker.pThumbnail);
-        MM_MediaExtractor_FreeBuffer(maker.pSmartAlbum);
-    }
-    Answers(const Answers&) = delete;
-    ~Answers() { MM_MediaExtractor_FreeMetaInfo(&meta); }
-};
 }  // namespace
 
 TEST_F(Mp4, ClipOfEachFileShape) {
@@ -167,48 +140,42 @@ TEST_F(Mp4, ClipOfEachFileShape) {
         const char* name;
         ByteVec file;
         const char* path;
-        int32_t result;
-        const char* clip;
     } cases[] = {
         // The first box must be ftyp or mdat; a file starting with mdat is walked from offset 0.
-        {"free first", Join({Box("free", ByteVec(8, 0)), Box("moov", Mvhd(0, 1000, 5000))}), "clip.mp4", -2, ""},
-        {"mdat first", Join({Box("mdat", ByteVec(8, 0)), Box("moov", Mvhd(0, 1000, 5000)), Box("free")}), "clip.mp4",
-         MM_OK, "mp4 size=140 dur=5 bps=224"},
+        {"free first", Join({Box("free", ByteVec(8, 0)), Box("moov", Mvhd(0, 1000, 5000))}), "clip.mp4"},
+        {"mdat first", Join({Box("mdat", ByteVec(8, 0)), Box("moov", Mvhd(0, 1000, 5000)), Box("free")}), "clip.mp4"},
         // Box sizes stay below the file size: a box as long as the file, or of size 0, is refused;
         // a top-level box claiming more than the file ends the walk quietly.
-        {"as long as the file", Box("ftyp", ByteVec(24, 0)), "clip.mp4", MM_E_FAIL, ""},
-        {"size 0", Bytes().be32(0).str("ftyp").zeros(24), "clip.mp4", MM_E_FAIL, ""},
-        {"beyond the file", Movie(Mvhd(0, 1000, 7000), Bytes().be32(0x7FFFFFF0).str("mdat").zeros(8)), "clip.mp4",
-         MM_OK, "mp4 size=156 dur=7 bps=178"},
+        {"as long as the file", Box("ftyp", ByteVec(24, 0)), "clip.mp4"},
+        {"size 0", Bytes().be32(0).str("ftyp").zeros(24), "clip.mp4"},
+        {"beyond the file", Movie(Mvhd(0, 1000, 7000), Bytes().be32(0x7FFFFFF0).str("mdat").zeros(8)), "clip.mp4"},
         // Headers cut short: missing bytes read as 0 (a 64-bit size of 0 is refused); the walk
         // stops at a last header the file does not hold whole, rather than going back to it.
-        {"cut 64-bit size", Bytes().be32(1), "clip.mp4", MM_E_FAIL, ""},
-        {"cut last header", Join({Ftyp(), Bytes().be32(3).u8(0x80).data()}), "clip.m4a", MM_OK, "m4a size=29"},
+        {"cut 64-bit size", Bytes().be32(1), "clip.mp4"},
+        {"cut last header", Join({Ftyp(), Bytes().be32(3).u8(0x80).data()}), "clip.m4a"},
         // A 64-bit size's upper word of 1 is ignored: the box ends after its lower word.
         {"64-bit size",
          Join({Ftyp(), Bytes().be32(1).str("mdat").be32(1).be32(24).zeros(8).data(),
                Box("moov", Join({Mvhd(0, 1000, 6000), AudioTrak(6000)})), Box("free", ByteVec(8, 0))}),
-         "clip.mp4", MM_OK, "mp4 size=503 dur=6 bps=670 audio=1 abps=128000 hz=44100 ch=2 bits=16"},
+         "clip.mp4"},
         // Version 1 takes the upper words: below 2^32 units a duration is 0; c1 is the creation time.
-        {"version 1", Movie(Mvhd(1, 1, 0xFFFFFFFFull, 0x1234567800000000ull)), "clip.mp4", MM_OK,
-         "mp4 size=192 c1=305419896"},
+        {"version 1", Movie(Mvhd(1, 1, 0xFFFFFFFFull, 0x1234567800000000ull)), "clip.mp4"},
         // The largest of movie and media durations; the creation time of the last header read (the mdhd's).
-        {"media longer", Movie(Join({Mvhd(0, 1000, 4000, 11), AudioTrak(12500)})), "clip.mp4", MM_OK,
-         "mp4 size=503 dur=12 bps=335 audio=1 abps=128000 hz=44100 ch=2 bits=16"},
-        {"timescale 0 leaves the raw duration", Movie(Mvhd(0, 0, 17)), "clip.mp4", MM_OK, "mp4 size=180 dur=17 bps=84"},
+        {"media longer", Movie(Join({Mvhd(0, 1000, 4000, 11), AudioTrak(12500)})), "clip.mp4"},
+        {"timescale 0 leaves the raw duration", Movie(Mvhd(0, 0, 17)), "clip.mp4"},
         // Bit rate from the file size, format from the extension; the esds bit rate comes first and is kept.
-        {"format", song, "Song.M4A", MM_OK, "M4A size=503 dur=2 bps=2012 audio=1 abps=128000 hz=44100 ch=2 bits=16"},
-        {"no extension: the copied fields stay", song, "noextension", MM_E_FAIL,
-         "size=503 dur=2 bps=2012 audio=1 abps=128000 hz=44100 ch=2 bits=16"},
+        {"format", song, "Song.M4A"},
+        {"no extension: the copied fields stay", song, "noextension"},
         // The first track declaring a size sets it.
         {"sized tracks",
          Movie(Join({Mvhd(0, 1000, 1000), Trak("soun", 1000, 1000, {}), Trak("hint", 1000, 1000, {}, 176, 144),
                      Trak("hint", 1000, 1000, {}, 640, 480)})),
-         "clip.mp4", MM_OK, "mp4 size=816 dur=1 bps=6528 w=176 h=144"},
+         "clip.mp4"},
     };
+    Golden golden("mp4", "clips");
     for (const auto& c : cases) {
-        EXPECT_EQ(Clip(c.file, c.path), c.result) << c.name;
-        EXPECT_EQ(ClipSummary(clip), c.clip) << c.name;
+        const int32_t result = Clip(c.file, c.path);
+        golden.Check(c.name, std::to_string(result) + " " + ClipSummary(clip));
     }
 }
 
@@ -271,93 +238,71 @@ TEST_F(Mp4, SampleDescriptions) {
     const struct {
         const char* name;
         ByteVec file;
-        const char* summary;
     } cases[] = {
         // Only the first entry counts and is read (damr: frames per sample as bits).
         {"samr then mp4a",
          OneTrak(Trak(
              "soun", 1000, 10000,
              Stsd({AudioEntry("samr", 1, 16, 8000, Box("damr", Bytes().str("vndr").u8(0).be16(0x81FF).u8(0).u8(3))),
-                   AudioEntry("mp4a", 2, 16, 48000, Esds(0x40, 1, {0x11, 0x90}))}))),
-         "size=536 dur=10 bps=428 audio=1 hz=8000 ch=1 bits=3 | 1 4005/0 0"},
+                   AudioEntry("mp4a", 2, 16, 48000, Esds(0x40, 1, {0x11, 0x90}))})))},
         // Frame rate is samples per whole second; with a bit rate from the sample entry the
         // sizes are not summed.
-        {"frame rate 10 s", Video(mp4v, Stsz(500, 300)),
-         "size=553 dur=10 bps=442 video=1 vbps=64000 w=176 h=144 fps=30 | 16 4001/0 64000"},
-        {"frame rate 9.9 s", Video(mp4v, Stsz(500, 300), 9900),
-         "size=553 dur=9 bps=491 video=1 vbps=64000 w=176 h=144 fps=33 | 16 4001/0 64000"},
+        {"frame rate 10 s", Video(mp4v, Stsz(500, 300))},
+        {"frame rate 9.9 s", Video(mp4v, Stsz(500, 300), 9900)},
         // A zero sample size sums the entries; a count far beyond the table sums what the box holds.
         {"stsz entries",
-         Audio(AudioEntry("mp4a", 1, 16, 8000, Esds(0x40, 0, {0x15, 0x88})), Stsz(0, 3, {1000, 2000, 2000})),
-         "size=515 dur=10 bps=412 audio=1 abps=4000 hz=8000 ch=1 bits=16 | 1 4008/2102 4000"},
-        {"stsz hostile count", Audio(AudioEntry("mp4a", 1, 16, 8000), Stsz(0, 0xFFFFFFF0u, {800})),
-         "size=468 dur=10 bps=374 audio=1 abps=640 hz=8000 ch=1 bits=16 | 1 0/0 640"},
+         Audio(AudioEntry("mp4a", 1, 16, 8000, Esds(0x40, 0, {0x15, 0x88})), Stsz(0, 3, {1000, 2000, 2000}))},
+        {"stsz hostile count", Audio(AudioEntry("mp4a", 1, 16, 8000), Stsz(0, 0xFFFFFFF0u, {800}))},
         {"stsz of 40000 entries",
-         Audio(AudioEntry("mp4a", 1, 16, 8000), Stsz(0, 40000, std::vector<uint32_t>(40000, 25))),
-         "size=160464 dur=10 bps=128371 audio=1 abps=800000 hz=8000 ch=1 bits=16 | 1 0/0 800000"},
+         Audio(AudioEntry("mp4a", 1, 16, 8000), Stsz(0, 40000, std::vector<uint32_t>(40000, 25)))},
         // Speech entries have fixed values.
-        {"secw", Audio(AudioEntry("secw", 2, 8, 44100)),
-         "size=444 dur=10 bps=355 audio=1 hz=8000 ch=1 bits=16 | 1 8001/0 0"},
-        {"sevc", Audio(AudioEntry("sevc", 2, 8, 44100)),
-         "size=444 dur=10 bps=355 audio=1 hz=8000 ch=1 bits=16 | 1 8001/0 0"},
-        {"secb", Audio(AudioEntry("secb", 2, 8, 44100)),
-         "size=444 dur=10 bps=355 audio=1 hz=8000 ch=1 bits=16 | 1 8001/0 0"},
-        {"sqcp", Audio(AudioEntry("sqcp", 1, 16, 8000)),
-         "size=444 dur=10 bps=355 audio=1 hz=8000 ch=1 bits=16 | 1 7001/0 0"},
-        {"sawp", Audio(AudioEntry("sawp", 2, 16, 16000)), "size=444 dur=10 bps=355 audio=1 hz=16000 ch=1 | 1 4007/0 0"},
-        {"qcelp in esds", Audio(AudioEntry("mp4a", 1, 16, 44100, Esds(0xE1, 13000, qcp))),
-         "size=645 dur=10 bps=516 audio=1 abps=13300 hz=8000 ch=1 bits=16 | 1 7001/0 13300"},
+        {"secw", Audio(AudioEntry("secw", 2, 8, 44100))},
+        {"sevc", Audio(AudioEntry("sevc", 2, 8, 44100))},
+        {"secb", Audio(AudioEntry("secb", 2, 8, 44100))},
+        {"sqcp", Audio(AudioEntry("sqcp", 1, 16, 8000))},
+        {"sawp", Audio(AudioEntry("sawp", 2, 16, 16000))},
+        {"qcelp in esds", Audio(AudioEntry("mp4a", 1, 16, 44100, Esds(0xE1, 13000, qcp)))},
         // avc1 needs avcC for its codec but always gives the size; btrt's average bit rate.
-        {"avc1 bare", Video(VisualEntry("avc1", 640, 360)), "size=498 dur=10 bps=398 video=1 w=640 h=360 | 16 0/0 0"},
-        {"avc1 full",
-         Video(VisualEntry("avc1", 1280, 720,
-                           Join({Box("pasp", Bytes().be32(1).be32(1)), avcC,
-                                 Box("btrt", Bytes().be32(0).be32(900000).be32(750000))}))),
-         "size=559 dur=10 bps=447 video=1 vbps=750000 w=1280 h=720 | 16 4004/0 750000"},
+        {"avc1 bare", Video(VisualEntry("avc1", 640, 360))},
+        {"avc1 full", Video(VisualEntry("avc1", 1280, 720,
+                                        Join({Box("pasp", Bytes().be32(1).be32(1)), avcC,
+                                              Box("btrt", Bytes().be32(0).be32(900000).be32(750000))})))},
         {"avc1 wild lengths",
          Video(VisualEntry("avc1", 320, 240,
-                           Box("avcC", Bytes().u8(1).u8(66).u8(0).u8(30).u8(0xFF).u8(0xFF).be16(0xFFFF).zeros(4)))),
-         "size=518 dur=10 bps=414 video=1 w=320 h=240 | 16 4004/0 0"},
-        {"avc1 child of size 0", Video(VisualEntry("avc1", 320, 240, Bytes().be32(0).str("pasp").zeros(8))),
-         "size=514 dur=10 bps=411 video=1 w=320 h=240 | 16 0/0 0"},
-        {"s263 bitr",
-         Video(VisualEntry("s263", 176, 144,
-                           Box("d263", Join({Bytes().str("vndr").u8(0).u8(10).u8(0).data(),
-                                             Box("bitr", Bytes().be32(64000).be32(128000))})))),
-         "size=529 dur=10 bps=423 video=1 vbps=64000 w=176 h=144 | 16 4003/0 64000"},
+                           Box("avcC", Bytes().u8(1).u8(66).u8(0).u8(30).u8(0xFF).u8(0xFF).be16(0xFFFF).zeros(4))))},
+        {"avc1 child of size 0", Video(VisualEntry("avc1", 320, 240, Bytes().be32(0).str("pasp").zeros(8)))},
+        {"s263 bitr", Video(VisualEntry("s263", 176, 144,
+                                        Box("d263", Join({Bytes().str("vndr").u8(0).u8(10).u8(0).data(),
+                                                          Box("bitr", Bytes().be32(64000).be32(128000))}))))},
         // Malformed configurations leave no codec; unknown entries are neither read nor counted.
-        {"wave instead of esds", Audio(AudioEntry("mp4a", 2, 16, 44100, Box("wave", ByteVec(20, 0)))),
-         "size=472 dur=10 bps=377 audio=1 hz=44100 ch=2 bits=16 | 1 0/0 0"},
-        {"endless descriptor length", Audio(AudioEntry("mp4a", 2, 16, 44100, FullBox("esds", 0, 0, ByteVec(40, 0x80)))),
-         "size=496 dur=10 bps=396 audio=1 hz=44100 ch=2 bits=16 | 1 0/0 0"},
-        {"tx3g", OneTrak(Trak("text", 1000, 1000, Stsd({Box("tx3g", ByteVec(40, 0))}))),
-         "size=456 dur=10 bps=364 | 0 0/0 0"},
+        {"wave instead of esds", Audio(AudioEntry("mp4a", 2, 16, 44100, Box("wave", ByteVec(20, 0))))},
+        {"endless descriptor length",
+         Audio(AudioEntry("mp4a", 2, 16, 44100, FullBox("esds", 0, 0, ByteVec(40, 0x80))))},
+        {"tx3g", OneTrak(Trak("text", 1000, 1000, Stsd({Box("tx3g", ByteVec(40, 0))})))},
         // A handler after stbl still decides the kind; without one the sample table is not read.
         {"late handler",
-         OneTrak(Box("trak", Box("mdia", Join({Box("minf", stbl), Mdhd(0, 1000, 3000), Hdlr("soun")})))),
-         "size=375 dur=10 bps=300 audio=1 abps=128000 hz=44100 ch=2 bits=16 | 1 4008/2102 128000"},
-        {"no handler", OneTrak(Box("trak", Box("mdia", Join({Mdhd(0, 1000, 3000), Box("minf", stbl)})))),
-         "size=335 dur=10 bps=268 | 0 0/0 0"},
+         OneTrak(Box("trak", Box("mdia", Join({Box("minf", stbl), Mdhd(0, 1000, 3000), Hdlr("soun")}))))},
+        {"no handler", OneTrak(Box("trak", Box("mdia", Join({Mdhd(0, 1000, 3000), Box("minf", stbl)}))))},
     };
-    for (const auto& c : cases) EXPECT_EQ(Walk(c.file), c.summary) << c.name;
+    Golden golden("mp4", "sample descriptions");
+    for (const auto& c : cases) golden.Check(c.name, Walk(c.file));
     // AAC object types give codec and profile; only the sync extension with sbrPresentFlag 1
     // signals SBR (implicit SBR only doubles the rate); bad configurations still name AAC,
     // a program configuration whose long comment runs past the bytes given too.
     const struct {
         BitWriter config;
-        const char* node;
     } configs[] = {
-        {Asc(2, 3, 2).put(0, 3), "4008/2102"},
-        {Asc(1, 3, 2).put(0, 3), "4008/2101"},
-        {Asc(3, 3, 2).put(0, 3), "4008/2103"},
-        {Asc(4, 3, 2).put(0, 3), "4008/ffff"},
-        {Asc(17, 3, 2).put(0, 3), "4008/ffff"},
-        {Asc(5, 6, 2).put(3, 4).put(2, 5).put(0, 3), "4009/2102"},
-        {Asc(2, 7, 2).put(0, 3), "4008/2102"},
-        {Asc(2, 7, 2).put(0, 3).put(0x2B7, 11).put(5, 5).put(1, 1).put(3, 4), "4009/2102"},
-        {Asc(2, 7, 2).put(0, 3).put(0x2B7, 11).put(5, 5).put(0, 1), "4008/2102"},
-        {Asc(2, 13, 2), "4008/2102"},
-        {Asc(2, 4, 9), "4008/2102"},
+        {Asc(2, 3, 2).put(0, 3)},
+        {Asc(1, 3, 2).put(0, 3)},
+        {Asc(3, 3, 2).put(0, 3)},
+        {Asc(4, 3, 2).put(0, 3)},
+        {Asc(17, 3, 2).put(0, 3)},
+        {Asc(5, 6, 2).put(3, 4).put(2, 5).put(0, 3)},
+        {Asc(2, 7, 2).put(0, 3)},
+        {Asc(2, 7, 2).put(0, 3).put(0x2B7, 11).put(5, 5).put(1, 1).put(3, 4)},
+        {Asc(2, 7, 2).put(0, 3).put(0x2B7, 11).put(5, 5).put(0, 1)},
+        {Asc(2, 13, 2)},
+        {Asc(2, 4, 9)},
         {Asc(2, 4, 0)
              .put(0, 3)
              .put(0, 4)
@@ -370,14 +315,13 @@ TEST_F(Mp4, SampleDescriptions) {
              .put(7, 3)
              .put(15, 4)
              .put(1, 1)
-             .put(3, 4),
-         "4008/2102"},
+             .put(3, 4)},
     };
     for (const auto& c : configs) {
         const MP4TrackNode node = WalkClip(dir.Write("aac.mp4", AacWith(c.config))).nodes.at(0);
         char text[32];
         std::snprintf(text, sizeof text, "%x/%x", node.codec, node.codecDetail);
-        EXPECT_EQ(std::string(text), c.node) << &c - configs;
+        golden.Check("config " + std::to_string(&c - configs), text);
     }
     // Entries whose fixed fields lie past the end of the stsd box.
     for (const char* type : {"mp4a", "samr", "sawp", "mp4v", "s263", "avc1"}) {
@@ -462,32 +406,28 @@ TEST_F(Mp4, UserDataMetadata) {
     const struct {
         const char* name;
         ByteVec moov, topLevel;
-        std::string meta;
     } cases[] = {
         // The performer beats the author unless empty.
-        {"perf", Udta(Join({TextBox("auth", "Writer"), TextBox("perf", "Singer")})), {}, "artist=5:Singer"},
-        {"empty perf", Udta(Join({TextBox("perf", ""), TextBox("auth", "Writer")})), {}, "artist=5:Writer"},
+        {"perf", Udta(Join({TextBox("auth", "Writer"), TextBox("perf", "Singer")})), {}},
+        {"empty perf", Udta(Join({TextBox("perf", ""), TextBox("auth", "Writer")})), {}},
         // albm's last byte is its track number; yrrc is a 16-bit year read little-endian; dscp is dropped.
         {"text boxes",
          Udta(Join({TextBox("titl", "Name"), FullBox("albm", 0, 0, Bytes().be16(0x15C7).str("Record").u8(0).u8(4)),
                     TextBox("gnre", "Jazz"), FullBox("yrrc", 0, 0, Bytes().be16(2009)), TextBox("dscp", "dropped"),
                     FullBox("loci", 0, 0, ByteVec(20, 0))})),
-         {},
-         "title=5:Name album=5:Record\\x00 genre=5:Jazz year=5:\\xD9\\x07"},
+         {}},
         // Byte order marks choose the encoding and stay.
         {"marks",
          Udta(Join({FullBox("titl", 0, 0, Bytes().be16(0).u8(0xFE).u8(0xFF).be16('A')),
                     FullBox("cprt", 0, 0, Bytes().be16(0).u8(0xFF).u8(0xFE).le16('B'))})),
-         {},
-         "title=4:\\xFE\\xFF\\x00A copyright=6:\\xFF\\xFEB\\x00"},
+         {}},
         // Long texts are cut to 128 bytes.
-        {"long titl", Udta(TextBox("titl", std::string(200, 'x'))), {}, "title=5:" + std::string(128, 'x')},
+        {"long titl", Udta(TextBox("titl", std::string(200, 'x'))), {}},
         {"long nam",
          MetaBox(Ilst(Item("\xA9"
                            "nam",
                            std::string(300, 'y')))),
-         {},
-         "title=5:" + std::string(128, 'y')},
+         {}},
         // Artist, year, genre and a 4-byte binary track; cmt and covr are not read; a later
         // item replaces an earlier one whole.
         {"itunes",
@@ -508,41 +448,34 @@ TEST_F(Mp4, UserDataMetadata) {
                                  Item("\xA9"
                                       "nam",
                                       "Second")})))),
-         {},
-         "title=5:Second artist=5:Band genre=5:Blues year=5:2001-02-03 track=0:\\x07\\x00\\x00\\x00"},
+         {}},
         // Genre numbers count from 1: 0 and 148 stay raw, the last name is out of reach.
-        {"gnre 0", MetaBox(Ilst(IlstItem("gnre", 0, {0, 0}))), {}, "genre=5:\\x00\\x00"},
-        {"gnre 148", MetaBox(Ilst(IlstItem("gnre", 0, {0, 148}))), {}, "genre=5:\\x00\\x94"},
-        {"gnre 147", MetaBox(Ilst(IlstItem("gnre", 0, {0, 147}))), {}, "genre=5:JPop"},
+        {"gnre 0", MetaBox(Ilst(IlstItem("gnre", 0, {0, 0}))), {}},
+        {"gnre 148", MetaBox(Ilst(IlstItem("gnre", 0, {0, 148}))), {}},
+        {"gnre 147", MetaBox(Ilst(IlstItem("gnre", 0, {0, 147}))), {}},
         // User data overwrites items read before it, a top-level udta too.
-        {"ilst then udta", Join({ilst, titl}), {}, "title=5:From titl"},
-        {"udta then ilst", Join({titl, ilst}), {}, "title=5:From ilst"},
-        {"top-level udta", ilst, titl, "title=5:From titl"},
+        {"ilst then udta", Join({ilst, titl}), {}},
+        {"udta then ilst", Join({titl, ilst}), {}},
+        {"top-level udta", ilst, titl},
         // An embedded ID3 tag fills the items; an empty tag or box fails alone.
-        {"ID32",
-         MetaBox(FullBox("ID32", 0, 0, Join({Bytes().be16(0x15C7).data(), tag}))),
-         {},
-         "title=5:Embedded artist=3:Band"},
+        {"ID32", MetaBox(FullBox("ID32", 0, 0, Join({Bytes().be16(0x15C7).data(), tag}))), {}},
         {"empty ID32 tag",
          MetaBox(Join({FullBox("ID32", 0, 0, Bytes().be16(0x15C7).str("ID3").u8(4).u8(0).u8(0).syncsafe32(0)),
                        Ilst(Item("\xA9"
                                  "ART",
                                  "Kept"))})),
-         {},
-         "artist=5:Kept"},
+         {}},
         {"empty ID32 box",
          MetaBox(Join({FullBox("ID32", 0, 0, {}), Ilst(Item("\xA9"
                                                             "ART",
                                                             "Kept"))})),
-         {},
-         "artist=5:Kept"},
+         {}},
         // A child of size 0 ends the udta walk with a failure: nothing is copied.
-        {"udta child of size 0", Udta(Join({TextBox("titl", "Lost"), Bytes().be32(0).str("junk").data()})), {}, ""},
+        {"udta child of size 0", Udta(Join({TextBox("titl", "Lost"), Bytes().be32(0).str("junk").data()})), {}},
         // Boxes too short for their language field are skipped.
         {"short text boxes",
          Udta(Join({FullBox("titl", 0, 0, {}), FullBox("albm", 0, 0, {1}), TextBox("perf", "P")})),
-         {},
-         "artist=5:P"},
+         {}},
         // data shorter than its header, trkn without its bytes, data claiming more than the
         // file, an item of size 0.
         {"hostile items",
@@ -558,18 +491,17 @@ TEST_F(Mp4, UserDataMetadata) {
                                 .str("\xA9"
                                      "ART")
                                 .data()}))),
-         {},
-         ""},
+         {}},
         // A meta without its version word (QuickTime style) is misread, harmlessly.
         {"quicktime meta",
          Udta(Box("meta", Join({Hdlr("mdir"), Ilst(Item("\xA9"
                                                         "nam",
                                                         "x"))}))),
-         {},
-         ""},
+         {}},
     };
+    Golden golden("mp4", "user data");
     for (const auto& c : cases) {
-        EXPECT_EQ(Meta(c.moov, c.topLevel), c.meta) << c.name;
+        golden.Check(c.name, Meta(c.moov, c.topLevel));
         if (&c == cases + 6) {
             EXPECT_EQ(meta.aItems[META_TITLE].szData[6], 0) << "nothing of the earlier title is left";
         }
@@ -589,23 +521,21 @@ TEST_F(Mp4, MakerBox) {
         const char* name;
         ByteVec mkr;
         bool topLevel;
-        const char* maker;
     } cases[] = {
-        {"top-level user data", Mkr(Modl("M")), true, "valid=1 model=M thumb=0 album="},
-        {"no maker box", {}, false, "valid=0 model= thumb=0 album="},
+        {"top-level user data", Mkr(Modl("M")), true},
+        {"no maker box", {}, false},
         {"thumbnail larger than its box",
-         Join({Mkr(Join({Thub(kImage, 200), Modl("PX")})), Box("free", ByteVec(400, 0))}), false,
-         "valid=1 model=PX thumb=0 album="},
+         Join({Mkr(Join({Thub(kImage, 200), Modl("PX")})), Box("free", ByteVec(400, 0))}), false},
         {"short children",
          Mkr(Join({FullBox("salb", 0, 0, {0}), FullBox("thub", 0, 0, {1, 2}), FullBox("modl", 0, 0, {}), Salb("ok")})),
-         false, "valid=1 model= thumb=0 album=ok"},
+         false},
         // A child of size 0 ends the box with a failure: the record stays as it was.
-        {"child of size 0", Mkr(Join({Modl("PX"), Bytes().be32(0).str("salb").data()})), false,
-         "valid=0 model= thumb=0 album="},
+        {"child of size 0", Mkr(Join({Modl("PX"), Bytes().be32(0).str("salb").data()})), false},
     };
+    Golden golden("mp4", "maker");
     for (const auto& c : cases) {
-        ASSERT_EQ(Maker(c.mkr, c.topLevel), MM_OK) << c.name;
-        EXPECT_EQ(MakerText(), c.maker) << c.name;
+        const int32_t result = Maker(c.mkr, c.topLevel);
+        golden.Check(c.name, std::to_string(result) + " " + MakerText());
     }
     // Two maker boxes: the later one replaces the earlier, nothing leaks.
     FreeMaker();
@@ -626,97 +556,4 @@ TEST_F(Mp4, MakerBox) {
     s_mp4FileSize = static_cast<uint32_t>(raw.size());
     EXPECT_EQ(AnaMaker(h, &maker), -9);
     MEx_fclose(h);
-}
-
-TEST(Mp4Corpus, EveryMp4FamilyFileIsAnsweredWithoutAFault) {
-    const std::string root = CorpusDir();
-    if (root.empty()) GTEST_SKIP() << testing_support::NoCorpusReason();
-    size_t files = 0;
-    for (const char* sub : {"/taglib", "/mutagen"}) {
-        for (const auto& entry : std::filesystem::directory_iterator(root + sub)) {
-            std::string ext = entry.path().extension().string();
-            for (char& ch : ext) ch = static_cast<char>(std::tolower(static_cast<unsigned char>(ch)));
-            if (ext != ".m4a" && ext != ".mp4" && ext != ".m4b" && ext != ".m4v" && ext != ".3g2" && ext != ".3gp")
-                continue;
-            SCOPED_TRACE(entry.path().string());
-            ++files;
-            const Answers a(entry.path().string());
-            if (a.type == MEDIA_TYPE_MP4 && a.clipResult == MM_OK) {
-                EXPECT_GE(a.clip.nDuration, 1000u);
-                EXPECT_GT(a.clip.nFileSize, 0u);
-            }
-        }
-    }
-    EXPECT_GE(files, 20u);
-}
-
-// has-tags.m4a stores only \xA9too, \xA9ART, ---- and covr (covr is not an item MP4 reports);
-// 3.7 s are 3 whole seconds.
-TEST(Mp4Corpus, TaggedAndUntaggedM4aAsByHand) {
-    const std::string root = CorpusDir();
-    if (root.empty()) GTEST_SKIP() << testing_support::NoCorpusReason();
-    const struct {
-        const char* name;
-        const char* clip;
-        const char* codec;
-        const char* meta;
-    } cases[] = {
-        {"has-tags.m4a", "m4a size=5108 dur=3000 bps=13621 c1=3237234137 audio=1 abps=2914 hz=44100 ch=2 bits=16",
-         "a=4008/0/2102 v=0/0/0", "artist=5:Test Artist"},
-        {"no-tags.m4a", "m4a size=2898 dur=3000 bps=7728 c1=3237234137 audio=1 abps=2914 hz=44100 ch=2 bits=16",
-         "a=4008/0/2102 v=0/0/0", ""},
-        {"ilst-is-last.m4a",
-         "m4a size=32768 dur=65000 bps=4032 c1=3239522692 audio=1 abps=159622 hz=44100 ch=2 bits=16",
-         "a=4008/0/2102 v=0/0/0",
-         "title=5:Intro artist=5:Pearl Jam album=5:1995-03-22 Brisbane, Australia - Entertainment Centre year=5:1995 "
-         "track=0:\\x01\\x00\\x00\\x00"},
-        {"gnre.m4a", "m4a size=5026 dur=3000 bps=13402 c1=3237234137 audio=1 abps=2914 hz=44100 ch=2 bits=16",
-         "a=4008/0/2102 v=0/0/0", "genre=5:Ska"},
-    };
-    for (const auto& c : cases) {
-        const Answers a(root + "/taglib/" + c.name);
-        EXPECT_EQ(a.mask, TRACK_AUDIO) << c.name;
-        EXPECT_EQ(ClipSummary(a.clip), c.clip) << c.name;
-        EXPECT_EQ(CodecSummary(a.codec), c.codec) << c.name;
-        EXPECT_EQ(a.metaResult == MM_OK ? MetaSummary(a.meta) : "failed", c.meta) << c.name;
-    }
-}
-
-TEST(Mp4Ffmpeg, WrittenFilesMatchFfprobe) {
-    if (!HaveFfmpeg()) GTEST_SKIP() << "ffmpeg absent";
-    TempDir dir;
-    const std::string sources = "-f lavfi -i testsrc=d=2:s=176x144:r=15 -f lavfi -i sine=d=2:sample_rate=16000 ";
-    const struct {
-        const char* name;
-        const char* args;
-        uint32_t videoCodec;
-    } cases[] = {{"mpeg4.mp4", "-c:v mpeg4", 0x4001},
-                 {"h264.mp4", "-c:v libx264 -pix_fmt yuv420p", 0x4004},
-                 {"h263.3gp", "-c:v h263", 0x4003}};
-    int made = 0;
-    for (const auto& c : cases) {
-        SCOPED_TRACE(c.name);
-        const std::string path = dir.PathOf(c.name);
-        if (!FfmpegWrite(sources + c.args + " -c:a aac -ac 1 -shortest", path)) continue;  // encoder not built in
-        ++made;
-        const Answers a(path);
-        ASSERT_EQ(std::tie(a.type, a.clipResult, a.codecResult), std::make_tuple(MEDIA_TYPE_MP4, MM_OK, MM_OK));
-        EXPECT_NEAR(a.clip.nDuration / 1000.0, std::floor(std::atof(Probe(path, "format=duration").c_str())), 1.0);
-        EXPECT_EQ(std::tie(a.codec.nAudioCodec, a.codec.nVideoCodec), std::make_tuple(0x4008u, c.videoCodec));
-        EXPECT_EQ(a.clip.nWidth, std::stoul(Probe(path, "stream=width", "-select_streams v:0")));
-        EXPECT_EQ(a.clip.nHeight, std::stoul(Probe(path, "stream=height", "-select_streams v:0")));
-        EXPECT_EQ(a.clip.nSampleRate, std::stoul(Probe(path, "stream=sample_rate", "-select_streams a:0")));
-        EXPECT_EQ(a.mask, TRACK_AUDIO | TRACK_VIDEO);
-    }
-    EXPECT_GT(made, 0);
-    // Tags as iTunes items: text in UTF-8, the track a 4-byte binary number.
-    const std::string path = dir.PathOf("tagged.m4a");
-    ASSERT_TRUE(
-        FfmpegWrite("-f lavfi -i sine=d=1 -c:a aac -metadata title='My Title' -metadata artist='Some Artist' "
-                    "-metadata album='An Album' -metadata date=2020 -metadata track=3",
-                    path));
-    const Answers a(path);
-    ASSERT_EQ(a.metaResult, MM_OK);
-    EXPECT_EQ(MetaSummary(a.meta),
-              "title=5:My Title artist=5:Some Artist album=5:An Album year=5:2020 track=0:\\x03\\x00\\x00\\x00");
 }

@@ -12,6 +12,7 @@
 #include "metainfo/metainfo.h"
 #include "support/avi_builder.h"
 #include "support/bytes.h"
+#include "support/golden.h"
 #include "support/id3_builder.h"
 #include "support/mp3_builder.h"
 #include "support/mp4_builder.h"
@@ -131,21 +132,12 @@ TEST(SparseFiles, AnswersDoNotDependOnTheWidthOfPositions) {
     const struct {
         const char* shape;
         uint64_t gib;
-        const char* answers;
     } cases[] = {
-        {"cbr.mp3", 3,
-         "detect 0 type 1 clip 0 size 3221225472 ms 1000 bps 128000 meta 0 title Far End cut 0 bytes 16000"},
-        {"cbr.mp3", 5,
-         "detect 0 type 1 clip 0 size 4294967295 ms 1000 bps 128000 meta 0 title Far End cut 0 bytes 16000"},
-        {"co64.mp4", 3, "detect 0 type 3 clip 80004005 meta 80004005 cut 800700E7"},
-        {"co64.mp4", 5, "detect 0 type 3 clip 80004005 meta 80004005 cut 800700E7"},
-        {"long.wav", 3, "detect 0 type 7 clip 0 size 3221225472 ms 16777000 bps 1536000 meta 800700E7 cut 80070057"},
-        {"long.wav", 5,
-         "detect 0 type 7 clip 0 size 4294967295 ms 27962000 bps 1536000 meta 800700E7 cut 0 bytes 192000"},
-        {"hour.avi", 3, "detect 0 type 11 clip 0 size 3221225472 ms 3600000 bps 0 meta 800700E7 cut 800700E7"},
-        {"hour.avi", 5, "detect 0 type 11 clip 0 size 4294967295 ms 3600000 bps 1193046 meta 800700E7 cut 800700E7"},
+        {"cbr.mp3", 3},  {"cbr.mp3", 5},  {"co64.mp4", 3}, {"co64.mp4", 5},
+        {"long.wav", 3}, {"long.wav", 5}, {"hour.avi", 3}, {"hour.avi", 5},
     };
     const std::vector<SparseShape> shapes = Shapes();
+    Golden golden("sparse_files", "answers");
     for (const auto& c : cases) {
         const SparseShape* shape = nullptr;
         for (const SparseShape& s : shapes) {
@@ -154,7 +146,7 @@ TEST(SparseFiles, AnswersDoNotDependOnTheWidthOfPositions) {
         ASSERT_NE(nullptr, shape) << c.shape;
         const std::string path = folder + "/" + std::to_string(c.gib) + "g-" + c.shape;
         ASSERT_TRUE(WriteSparse(path, *shape, c.gib * kGiB)) << path;
-        EXPECT_EQ(c.answers, Answers(path)) << path;
+        golden.Check(std::to_string(c.gib) + "g-" + c.shape, Answers(path));
         if (keep == nullptr) std::remove(path.c_str());
     }
 }
