@@ -26,14 +26,14 @@ ByteVec AudioFile(const ByteVec& entry, const std::string& brand = "M4A ", const
     return Join({Ftyp(brand),
                  Box("moov", Join({Mvhd(0, 1000, 3300),
                                    TimedTrak("soun", 44100, 146554, entry, 144, 1024, 200, Edts(3300, 1024)), more})),
-                 Box("mdat", ByteVec(64, 0))});
+                 Box("mdat", ByteVec(144 * 200, 0))});
 }
 
 ByteVec VideoFile(const ByteVec& entry, uint32_t timescale, uint32_t delta, const std::string& brand = "isom") {
     return Join(
         {Ftyp(brand),
          Box("moov", Join({Mvhd(0, 1000, 2002), TimedTrak("vide", timescale, 60 * delta, entry, 60, delta, 500)})),
-         Box("mdat", ByteVec(64, 0))});
+         Box("mdat", ByteVec(60 * 500, 0))});
 }
 
 ByteVec Avc(uint8_t profile, uint8_t constraints, uint8_t level) {
