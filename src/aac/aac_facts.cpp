@@ -13,8 +13,8 @@ namespace {
 
 constexpr uint64_t kAdtsHeader = 7;
 constexpr uint64_t kId3Header = 10;
-constexpr uint64_t kSyncWindow = 64 * 1024;  // where the first frame must start
-constexpr uint64_t kCountLimit = 16 * 1024 * 1024;  // frames counted; past it the rest is estimated
+constexpr uint64_t kSyncWindow = uint64_t{64} << 10;  // where the first frame must start
+constexpr uint64_t kCountLimit = uint64_t{16} << 20;  // frames counted; past it the rest is estimated
 constexpr int kFramesToAccept = 3;
 constexpr uint64_t kMaxFrame = 8192;  // 13-bit frame length
 constexpr uint32_t kSamplesPerBlock = 1024;
@@ -130,42 +130,55 @@ void AddSbr(const char* path, const Quirks& quirks, StreamFacts* s) {
     if (ps) s->channels = 2;
 }
 
+// A file opened and its ADTS stream looked for.
+class AdtsFile {
+public:
+    explicit AdtsFile(const char* path) : h_(MEx_fopen(path, "rb")) {
+        found_ = h_ != 0 && OpenedFileSize(h_, path, &size_) && FindStream(h_, size_, &start_);
+    }
+    ~AdtsFile() {
+        if (h_ != 0) MEx_fclose(h_);
+    }
+    AdtsFile(const AdtsFile&) = delete;
+    AdtsFile& operator=(const AdtsFile&) = delete;
+
+    bool found() const { return found_; }
+    // Frames from the stream's start up to `limit` bytes into the file.
+    void WalkTo(uint64_t limit, Walk* w, const FrameVisitor& visit = nullptr) const {
+        WalkFrames(h_, size_, start_, limit, w, visit);
+    }
+    uint64_t size() const { return size_; }
+    uint64_t start() const { return start_; }
+
+private:
+    int h_;
+    bool found_ = false;
+    uint64_t size_ = 0, start_ = 0;
+};
+
 }  // namespace
 
 bool WalkAdtsFrames(const char* path, uint32_t* rate, const FrameVisitor& visit) {
-    const int h = MEx_fopen(path, "rb");
-    if (h == 0) return false;
-    FileCloser closer(h);
-    uint64_t size = 0;
-    uint64_t start = 0;
-    if (!OpenedFileSize(h, path, &size) || !FindStream(h, size, &start)) return false;
+    const AdtsFile file(path);
+    if (!file.found()) return false;
     Walk first;
-    WalkFrames(h, size, start, start + 1, &first);
+    file.WalkTo(file.start() + 1, &first);
     *rate = g_uSamplingFrequencyTable[first.first.rateIndex];
     Walk w;
-    WalkFrames(h, size, start, size, &w, visit);
+    file.WalkTo(file.size(), &w, visit);
     return *rate != 0;
 }
 
-bool LooksLikeAdts(const char* path) {
-    const int h = MEx_fopen(path, "rb");
-    if (h == 0) return false;
-    FileCloser closer(h);
-    uint64_t size = 0;
-    uint64_t start = 0;
-    return OpenedFileSize(h, path, &size) && FindStream(h, size, &start);
-}
+bool LooksLikeAdts(const char* path) { return AdtsFile(path).found(); }
 
 int32_t AacFacts(const char* path, const Quirks& quirks, MediaFacts* f) {
-    const int h = MEx_fopen(path, "rb");
-    if (h == 0) return MM_E_FAIL;
-    FileCloser closer(h);
-    uint64_t size = 0;
-    uint64_t start = 0;
-    if (!OpenedFileSize(h, path, &size) || !FindStream(h, size, &start)) return MM_E_UNSUPPORTED;
+    const AdtsFile file(path);
+    if (!file.found()) return MM_E_UNSUPPORTED;
+    const uint64_t size = file.size();
+    const uint64_t start = file.start();
     Walk w;
     w.start = start;
-    WalkFrames(h, size, start, start + kCountLimit, &w);
+    file.WalkTo(start + kCountLimit, &w);
     const uint32_t rate = g_uSamplingFrequencyTable[w.first.rateIndex];
     if (w.frames == 0 || rate == 0) return MM_E_UNSUPPORTED;
 

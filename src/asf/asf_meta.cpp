@@ -146,7 +146,7 @@ int32_t ASF_WalkContentDescription(int h, AsfAttributeSink* sink) {
     uint8_t b[8 + 10];
     if (!ReadExact(h, b, sizeof b)) return kBroken;
     for (uint32_t field = 0; field < 5; ++field) {
-        const int32_t result = sink->Description(h, field, ReadLE16(b + 8 + 2 * field));
+        const int32_t result = sink->Description(h, field, ReadLE16(b + 8 + size_t{2} * field));
         if (result != 0) return result;
     }
     return 0;

@@ -16,7 +16,7 @@ constexpr size_t kFrameWindow = 4096;
 constexpr size_t kVbriOffset = 36;
 constexpr uint64_t kV1TagSize = 128;
 constexpr uint64_t kApeFooterSize = 32;
-constexpr uint64_t kCountedBytes = 1024 * 1024;  // streams this short have their frames counted
+constexpr uint64_t kCountedBytes = uint64_t{1} << 20;  // streams this short have their frames counted
 
 // What the first frame's VBR header says; zeros where it says nothing.
 struct VbrHeader {

@@ -19,7 +19,7 @@
 namespace metainfo {
 namespace {
 
-constexpr size_t kCopyChunk = 64 * 1024;
+constexpr size_t kCopyChunk = size_t{64} << 10;
 
 // A byte range of the source to copy as it is.
 struct Span {
@@ -97,7 +97,7 @@ int WriteCut(const char* path, const char* outPath, const std::vector<uint8_t>& 
     ok = ok && WriteAll(out, trailer.data(), trailer.size());
     ok = ::close(out) == 0 && ok;
     ::close(in);
-    if (!ok) std::remove(outPath);
+    if (!ok) (void)std::remove(outPath);
     return ok ? MI_OK : MI_E_IO;
 }
 

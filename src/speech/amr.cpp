@@ -285,9 +285,9 @@ extern "C" int32_t AMR_GetAudioData2File(const char* path, int startSec, int end
 namespace metainfo {
 namespace {
 
-constexpr uint64_t kAmrCountLimit = 16 * 1024 * 1024;
-constexpr size_t kAmrMaxBlock = 61 * 16 + 16;  // the largest frame for each of 16 channels, and their headers  //
-                                               // frames counted; past it the rest is estimated
+constexpr uint64_t kAmrCountLimit = uint64_t{16} << 20;
+constexpr size_t kAmrMaxBlock = size_t{61} * 16 + 16;  // the largest frame of each of 16 channels
+                                                       // frames counted; past it the rest is estimated
 
 // Frames (blocks of every channel's frame) from the first frame to the end,
 // read in chunks; a block cut off by the end of the file does not count.
@@ -337,19 +337,23 @@ AmrCount CountBlocks(int h, uint64_t start, uint64_t fileSize, int kind, uint32_
     return c;
 }
 
+// The magic and first frame header of an opened file, and its size.
+bool ReadStart(int h, const char* path, _AMR_FrameInfo* frame, uint64_t* fileSize) {
+    uint8_t head[32];
+    const int got = MEx_fread(head, 1, sizeof head, h);
+    return got >= 16 && ParseAmrHead(head, static_cast<size_t>(got), frame) == MM_OK &&
+           OpenedFileSize(h, path, fileSize);
+}
+
 }  // namespace
 
 bool WalkAmrFrames(const char* path, uint32_t* rate, uint64_t* prefix, const FrameVisitor& visit) {
     const int h = MEx_fopen(path, "rb");
     if (h == 0) return false;
     FileCloser closer(h);
-    uint8_t head[32];
     uint64_t fileSize = 0;
-    const int got = MEx_fread(head, 1, sizeof head, h);
     _AMR_FrameInfo frame;
-    if (got < 16 || ParseAmrHead(head, static_cast<size_t>(got), &frame) != MM_OK ||
-        !OpenedFileSize(h, path, &fileSize))
-        return false;
+    if (!ReadStart(h, path, &frame, &fileSize)) return false;
     const bool wide = IsWideBand(frame.nFileType);
     *rate = wide ? 16000 : 8000;
     *prefix = kAmrKinds[frame.nFileType].firstFrame;
@@ -369,13 +373,9 @@ int32_t AmrFacts(const char* path, MediaFacts* f) {
     const int h = MEx_fopen(path, "rb");
     if (h == 0) return MM_E_FAIL;
     FileCloser closer(h);
-    uint8_t head[32];
     uint64_t fileSize = 0;
-    const int got = MEx_fread(head, 1, sizeof head, h);
     _AMR_FrameInfo frame;
-    if (got < 16 || ParseAmrHead(head, static_cast<size_t>(got), &frame) != MM_OK ||
-        !OpenedFileSize(h, path, &fileSize))
-        return MM_E_FAIL;
+    if (!ReadStart(h, path, &frame, &fileSize)) return MM_E_FAIL;
     const bool wide = IsWideBand(frame.nFileType);
     const uint64_t start = kAmrKinds[frame.nFileType].firstFrame;
     const AmrCount count = CountBlocks(h, start, fileSize, frame.nFileType, frame.nChannels);

@@ -14,7 +14,7 @@ namespace metainfo {
 namespace {
 
 constexpr size_t kMaxChunkBody = 64;  // of "fmt ", "ds64" and "fact": what is read of them
-constexpr uint64_t kMaxInfoList = 64 * 1024;
+constexpr uint64_t kMaxInfoList = uint64_t{64} << 10;
 constexpr int kMaxChunks = 4096;
 constexpr uint16_t kExtensible = 0xFFFE;
 
@@ -187,9 +187,9 @@ int64_t DurationUs(const WaveChunks& w, bool* exact) {
     return static_cast<int64_t>(samples * 1000000 / w.rate);
 }
 
-}  // namespace
-
-bool ReadWaveLayout(const char* path, WaveLayout* layout) {
+// Opens a RIFF or RF64 WAVE file and walks its chunks; false without a format
+// and a data chunk.
+bool WalkWave(const char* path, WaveChunks* w, TagFacts* t) {
     const int h = MEx_fopen(path, "rb");
     if (h == 0) return false;
     FileCloser closer(h);
@@ -199,10 +199,16 @@ bool ReadWaveLayout(const char* path, WaveLayout* layout) {
         return false;
     const bool rf64 = IsRf64Wave(head, sizeof head);
     if (!rf64 && !(BytesEqual(head, "RIFF", 4) && BytesEqual(head + 8, "WAVE", 4))) return false;
+    WalkChunks(h, size, rf64, w, t);
+    return w->haveFormat && w->haveData;
+}
+
+}  // namespace
+
+bool ReadWaveLayout(const char* path, WaveLayout* layout) {
     WaveChunks w;
     TagFacts unused;
-    WalkChunks(h, size, rf64, &w, &unused);
-    if (!w.haveFormat || !w.haveData || w.blockAlign == 0 || w.rate == 0) return false;
+    if (!WalkWave(path, &w, &unused) || w.blockAlign == 0 || w.rate == 0) return false;
     layout->format = w.format;
     layout->dataOffset = w.dataOffset;
     layout->dataSize = w.dataSize - w.dataSize % w.blockAlign;
@@ -219,18 +225,8 @@ bool IsRf64Wave(const uint8_t* head, size_t n) {
 }
 
 int32_t WaveFacts(const char* path, MediaFacts* f) {
-    const int h = MEx_fopen(path, "rb");
-    if (h == 0) return MM_E_FAIL;
-    FileCloser closer(h);
-    uint64_t size = 0;
-    uint8_t head[12];
-    if (!OpenedFileSize(h, path, &size) || MEx_fread(head, 1, sizeof head, h) != static_cast<int>(sizeof head))
-        return MM_E_FAIL;
-    const bool rf64 = IsRf64Wave(head, sizeof head);
-    if (!rf64 && !(BytesEqual(head, "RIFF", 4) && BytesEqual(head + 8, "WAVE", 4))) return MM_E_FAIL;
     WaveChunks w;
-    WalkChunks(h, size, rf64, &w, &f->tags);
-    if (!w.haveFormat || !w.haveData) return MM_E_FAIL;
+    if (!WalkWave(path, &w, &f->tags)) return MM_E_FAIL;
 
     // An ID3 tag in its own chunk says more than the INFO list, and wins.
     if (w.id3Offset != 0) {
