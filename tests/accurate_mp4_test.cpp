@@ -9,6 +9,7 @@
 #include "core/codes.h"
 #include "mp4/mp4_facts.h"
 #include "mp4/mp4_file.h"
+#include "support/aac_builder.h"
 #include "support/mp4_accurate_builder.h"
 
 using namespace testing_support;
@@ -27,6 +28,20 @@ ByteVec AudioFile(const ByteVec& entry, const std::string& brand = "M4A ", const
                  Box("moov", Join({Mvhd(0, 1000, 3300),
                                    TimedTrak("soun", 44100, 146554, entry, 144, 1024, 200, Edts(3300, 1024)), more})),
                  Box("mdat", ByteVec(144 * 200, 0))});
+}
+
+// 22.05 kHz LC whose first frame (where "stco" points) carries SBR data.
+ByteVec ImplicitSbrFile() {
+    const ByteVec entry = AacEntry(PackBits({{2, 5}, {7, 4}, {2, 4}, {0, 3}}));
+    const auto moov = [&](uint32_t chunk) {
+        const ByteVec stco = FullBox("stco", 0, 0, Bytes().be32(1).be32(chunk));
+        return Box("moov",
+                   Join({Mvhd(0, 1000, 3300), TimedTrak("soun", 44100, 146554, entry, 144, 1024, 200, {}, stco)}));
+    };
+    const ByteVec ftyp = Ftyp("M4A ");
+    ByteVec samples = AacBlock(true, 13);
+    samples.resize(144 * 200);
+    return Join({ftyp, moov(static_cast<uint32_t>(ftyp.size() + moov(0).size() + 8)), Box("mdat", samples)});
 }
 
 ByteVec VideoFile(const ByteVec& entry, uint32_t timescale, uint32_t delta, const std::string& brand = "isom") {
@@ -101,6 +116,8 @@ TEST_F(AccurateMp4Test, StreamsInFfprobeTerms) {
         // 22.05 kHz LC states no SBR: its own rate, not twice it.
         {"lc-22k", AudioFile(AacEntry(PackBits({{2, 5}, {7, 4}, {2, 4}, {0, 3}}))),
          "audio/mp4 3300000 | aac/LC/-1 22050Hz 2ch 0b " + aacRate},
+        // ... unless its first frame carries SBR (implicit signalling).
+        {"implicit-sbr", ImplicitSbrFile(), "audio/mp4 3300000 | aac/HE-AAC/-1 44100Hz 2ch 0b " + aacRate},
         {"mp3-in-esds", AudioFile(AudioEntry("mp4a", 2, 16, 44100, Esds(0x6B, 128000))),
          "audio/mp4 3300000 | mp3//-1 44100Hz 2ch 0b " + aacRate},
         {"quicktime-v1", AudioFile(QuickTimeAac(), "qt  "),

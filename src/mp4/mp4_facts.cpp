@@ -5,6 +5,9 @@
 #include <cstring>
 #include <new>
 
+#include "aac/aac_bits.h"
+#include "aac/aac_clip.h"
+#include "aac/aac_walker.h"
 #include "core/file_access.h"
 #include "core/thread_state.h"
 #include "metainfo/metainfo.h"
@@ -126,6 +129,31 @@ void Mp3Channels(const char* path, Mp4Truth* truth) {
     }
 }
 
+// An AAC configuration of 24 kHz or less that says nothing of SBR may still
+// carry it (implicit signalling): the first frame's fill elements tell, read
+// by the walker that finds SBR in ADTS streams.
+void ImplicitSbr(const char* path, Mp4Truth* truth) {
+    constexpr int kFirstFrameBytes = 2048;
+    for (Mp4TrackTruth& t : truth->tracks) {
+        StreamFacts& s = t.stream;
+        if (s.codec != "aac" || s.profile != "LC" || s.sampleRate > 24000 || t.firstChunk == 0) continue;
+        int index = 0;
+        while (index < 12 && g_uSamplingFrequencyTable[index] != s.sampleRate) ++index;
+        const int h = index < 12 ? MEx_fopen(path, "rb") : 0;
+        if (h == 0) continue;
+        FileCloser closer(h);
+        uint8_t frame[kFirstFrameBytes];
+        const int got = SeekToOffset(h, t.firstChunk) ? MEx_fread(frame, 1, sizeof frame, h) : 0;
+        if (got <= 0) continue;
+        AacBitReader r = MakeAacBitReader(frame, got, 0);
+        uint32_t state = kWalkPlain;
+        RawDataStream(&r, &state, index);
+        if (state != kWalkSbrFound) continue;
+        s.profile = "HE-AAC";
+        s.sampleRate *= 2;
+    }
+}
+
 void Assemble(const Mp4Truth& truth, uint64_t fileSize, MediaFacts* f) {
     f->format = "mp4";  // the MM_ name of every file of the family
     bool hasVideo = false;
@@ -161,7 +189,10 @@ int32_t Mp4Facts(const char* path, int /*type*/, MediaFacts* facts) {
         result = MP4_GetMediaInfo(path, kModeClip, &info);
         FreeTrackList(&info);
         const uint64_t fileSize = s_mp4FileSize;
-        if (result == MM_OK) Mp3Channels(path, &truth);
+        if (result == MM_OK) {
+            Mp3Channels(path, &truth);
+            ImplicitSbr(path, &truth);
+        }
         if (result == MM_OK) Assemble(truth, fileSize, facts);
     } catch (const std::bad_alloc&) {
         FreeTrackList(&info);

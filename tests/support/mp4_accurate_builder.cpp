@@ -9,10 +9,10 @@ ByteVec Edts(uint32_t segment, int32_t mediaTime) {
 }
 
 ByteVec TimedTrak(const std::string& handler, uint32_t timescale, uint64_t duration, const ByteVec& entry,
-                  uint32_t count, uint32_t delta, uint32_t size, const ByteVec& edts) {
-    const ByteVec stbl =
-        Box("stbl",
-            Join({Stsd({entry}), FullBox("stts", 0, 0, Bytes().be32(1).be32(count).be32(delta)), Stsz(size, count)}));
+                  uint32_t count, uint32_t delta, uint32_t size, const ByteVec& edts, const ByteVec& more) {
+    const ByteVec stbl = Box(
+        "stbl",
+        Join({Stsd({entry}), FullBox("stts", 0, 0, Bytes().be32(1).be32(count).be32(delta)), Stsz(size, count), more}));
     const ByteVec mdia = Box(
         "mdia", Join({Mdhd(duration > 0xFFFFFFFFu ? 1 : 0, timescale, duration), Hdlr(handler), Box("minf", stbl)}));
     const ByteVec tkhd = FullBox("tkhd", 0, 7, Bytes().zeros(20 + 52).be32(0).be32(0));
