@@ -53,7 +53,12 @@ public:
         rows_ = 0;
     }
     void Wrote() {
-        if (++rows_ >= kRowsPerCommit || std::chrono::steady_clock::now() - started_ >= kCommitEvery) Commit();
+        ++rows_;
+        CommitIfDue();
+    }
+    // Also while the walk or a slow file keeps rows from coming.
+    void CommitIfDue() {
+        if (open_ && (rows_ >= kRowsPerCommit || std::chrono::steady_clock::now() - started_ >= kCommitEvery)) Commit();
     }
     void Commit() {
         if (!open_) return;
@@ -91,6 +96,7 @@ public:
         events.file = [this](const FileStat& f) { Found(f); };
         events.folder = [this](const std::string& path) {
             folder_ = path;
+            batch_.CommitIfDue();
             progress_.Tick(counts_, folder_);
         };
         events.unreadable = [this](const std::string& path, const std::string& why) {
@@ -101,6 +107,7 @@ public:
         for (const std::string& root : roots_) Walk(root, {options_.follow, options_.crossFilesystems}, events);
         while (pool.Pending() != 0) {
             for (Probed& p : pool.Collect(true)) Write(p);
+            batch_.CommitIfDue();
             progress_.Tick(counts_, folder_);
         }
         RemoveGone();

@@ -44,9 +44,9 @@ bool Statement::Step() {
     const int rc = sqlite3_step(stmt_);
     if (rc == SQLITE_ROW) return true;
     if (rc == SQLITE_DONE) return false;
-    const std::string sql = sqlite3_sql(stmt_);
+    const std::string why = std::string(sqlite3_sql(stmt_)) + ": " + sqlite3_errmsg(db_);
     sqlite3_reset(stmt_);
-    Fail(db_, sql);
+    throw DbError(why);
 }
 
 void Statement::Run() {
