@@ -16,6 +16,8 @@
 #include "maker_command.h"
 #include "metainfo/metainfo.h"
 #include "probe_command.h"
+#include "scan/export_command.h"
+#include "scan/scan_command.h"
 #include "time_arg.h"
 
 namespace {
@@ -120,6 +122,37 @@ int main(int argc, char** argv) {
     coverCmd->add_flag("--all", coverAll, "write every picture, numbered");
     coverCmd->footer(kExitCodes);
 
+    scan::ScanOptions scanOpts;
+    CLI::App* scanCmd =
+        app.add_subcommand("scan", "Probe every file under folders into a SQLite database, again only what changed.");
+    scanCmd->add_option("paths", scanOpts.roots, "folders (or files) to scan")->required();
+    scanCmd->add_option("--db", scanOpts.db, "the database file (made when missing)")->required();
+    scanCmd->add_option("-j,--jobs", scanOpts.jobs, "threads probing files (default: one a core)")
+        ->check(CLI::Range(1, 256));
+    scanCmd->add_flag("--full", scanOpts.full, "probe every file again, changed or not");
+    scanCmd->add_flag("--follow", scanOpts.follow, "follow symbolic links (to folders too)");
+    scanCmd->add_flag("--pictures", scanOpts.pictures, "keep the embedded pictures' bytes");
+    scanCmd->add_flag("--json", scanOpts.json, "write each file probed as JSON Lines (the keys of probe --json)");
+    scanCmd->add_flag("--cross-filesystems", scanOpts.crossFilesystems, "enter folders of other file systems");
+    scanCmd->add_option("--wait", scanOpts.waitSeconds, "seconds to wait for another scan of the database (default 10)")
+        ->check(CLI::Range(0.0, 86400.0));
+    scanCmd->footer(
+        "Exit status: 0 when every folder was read (files that fail get a row with their error), 1 when "
+        "one was not or the database failed, 2 for a usage error.");
+
+    std::string exportDb;
+    bool exportJson = false, exportCsv = false;
+    CLI::App* exportCmd =
+        app.add_subcommand("export", "Write a scan's database out with the keys of probe --json or --csv.");
+    exportCmd->add_option("--db", exportDb, "the database file")->required();
+    auto* exportJsonOpt = exportCmd->add_flag("--json", exportJson, "JSON Lines: one object per file");
+    auto* exportCsvOpt =
+        exportCmd->add_flag("--csv", exportCsv, "CSV with a header row (RFC 4180)")->excludes(exportJsonOpt);
+    exportCmd->callback([&] {
+        if (exportJsonOpt->count() + exportCsvOpt->count() == 0) throw CLI::RequiredError("--json or --csv");
+    });
+    exportCmd->footer(kExitCodes);
+
     int64_t startMs = 0;
     int64_t endMs = 0;
     try {
@@ -151,6 +184,8 @@ int main(int argc, char** argv) {
         }
         return ok ? 0 : 1;
     }
+    if (scanCmd->parsed()) return scan::ScanCommand(scanOpts);
+    if (exportCmd->parsed()) return scan::ExportCommand(exportDb, exportJson);
     if (cutCmd->parsed()) return probe::CutCommand(cutFile, startMs, endMs, cutOut, cutExact);
     if (makerCmd->parsed()) return probe::MakerCommand(makerFile, thumbnail);
     if (framesCmd->parsed()) return probe::FramesCommand(framesFile, stream, seekOpt->count() > 0, seekMs);

@@ -11,7 +11,7 @@ cd "$(dirname "$0")/.."
 need=()
 have_pkg() { dpkg -s "$1" >/dev/null 2>&1; }
 if command -v dpkg >/dev/null 2>&1; then
-  for pkg in cmake g++ make clang clang-tidy clang-format libclang-rt-dev libgtest-dev ffmpeg pkg-config libcli11-dev nlohmann-json3-dev python3-pytest python3-mutagen lame sox; do
+  for pkg in cmake g++ make clang clang-tidy clang-format libclang-rt-dev libgtest-dev ffmpeg pkg-config libcli11-dev nlohmann-json3-dev python3-pytest python3-mutagen lame sox libsqlite3-dev; do
     have_pkg "$pkg" || need+=("$pkg")
   done
   # The Java binding is built and tested in a real JVM when a JDK is there.
