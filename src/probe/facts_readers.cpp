@@ -5,6 +5,7 @@
 #include "avi/avi_queries.h"
 #include "core/file_access.h"
 #include "core/quirks.h"
+#include "core/thread_state.h"
 #include "metainfo/metainfo.h"
 #include "mp3/mp3_stream_facts.h"
 #include "mp4/mp4_facts.h"
@@ -90,7 +91,14 @@ int32_t ReadFacts(const char* path, int type, MediaFacts* facts) {
         // A file its reader turns away gets what the MM_ answers make of it.
         *facts = MediaFacts();
     }
-    return ContractFacts(path, type, facts);
+    // The QCP reader keeps the last codec it saw for the next file on the
+    // thread; the accurate answer of a file depends on that file alone, and the
+    // thread's own sequence of MM_ calls is left as it was.
+    const uint32_t qcpCodec = s_codectype;
+    s_codectype = 0;
+    const int32_t read = ContractFacts(path, type, facts);
+    s_codectype = qcpCodec;
+    return read;
 }
 
 }  // namespace metainfo
