@@ -157,6 +157,8 @@ void Probe(const std::string& path, Report* r) {
     // whose type was recognised means its structure breaks off or is broken.
     if (r->clipResult == MM_E_FAIL)
         r->problem = "damaged or truncated (clip information " + ResultText(r->clipResult) + ")";
+    // What the accurate interface cannot read on its own is reported too.
+    if (r->problem.empty() && r->infoResult != MI_OK) r->problem = mi_result_text(r->infoResult);
 }
 
 void PrintText(const Report& r) {
