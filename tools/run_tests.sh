@@ -11,7 +11,8 @@ cd "$(dirname "$0")/.."
 need=()
 have_pkg() { dpkg -s "$1" >/dev/null 2>&1; }
 if command -v dpkg >/dev/null 2>&1; then
-  for pkg in cmake g++ make clang clang-tidy clang-format libclang-rt-dev libgtest-dev ffmpeg pkg-config libcli11-dev nlohmann-json3-dev python3-pytest python3-mutagen lame sox libsqlite3-dev; do
+  for pkg in cmake g++ make clang clang-tidy clang-format libclang-rt-dev libgtest-dev ffmpeg pkg-config libcli11-dev nlohmann-json3-dev python3-pytest python3-mutagen lame sox libsqlite3-dev \
+    pybind11-dev python3-dev python3-dask python3-distributed python3-pandas; do
     have_pkg "$pkg" || need+=("$pkg")
   done
   # The Java binding is built and tested in a real JVM when a JDK is there.
@@ -49,7 +50,7 @@ start=$(date +%s)
 echo "== plain build (gcc)"
 run_suite build gcc g++ "" -DCMAKE_EXPORT_COMPILE_COMMANDS=ON
 echo "== clang-format: the sources follow .clang-format"
-find src include tools tests fuzz bench -type f \( -name '*.cpp' -o -name '*.h' -o -name '*.inl' \) -print0 |
+find src include tools tests fuzz bench python/src -type f \( -name '*.cpp' -o -name '*.h' -o -name '*.inl' \) -print0 |
   xargs -0 clang-format --dry-run --Werror
 echo "== clang-tidy (bugprone, CERT) on src/"
 find src -name '*.cpp' -print0 | xargs -0 -P "$jobs" -n 8 clang-tidy -p build --quiet 2>/dev/null
