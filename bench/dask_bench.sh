@@ -3,7 +3,11 @@
 # worker processes (one thread each), against `metainfo scan` and one Python
 # process probing alone, over a generated tree.
 #
-#   bench/dask_bench.sh [--files N] [--dir DIR] [--build DIR]
+#   bench/dask_bench.sh [--files N] [--dir DIR] [--build DIR] [--tree DIR]
+#
+# --tree measures an existing tree instead; by default that is the tree of
+# bench/scan_bench.sh when it has made one (the scan's and Dask's figures
+# are then over the same 20,000 files).
 #
 # The tree: N copies (default 2000) of the repository's samples/ and, when
 # present, ../shared/corpus, in folders of 100; each MP3 and WAVE copy ends in
@@ -16,12 +20,16 @@ root=$(cd "$here/.." && pwd)
 files=2000
 dir=${TMPDIR:-/tmp}/metainfo-dask-bench
 build=$root/build
+tree=
+scan_tree=${TMPDIR:-/tmp}/metainfo-scan-bench/tree20000
+[ -f "$scan_tree/.done" ] && tree=$scan_tree
 while [ $# -gt 0 ]; do
   case $1 in
     --files) files=$2; shift 2 ;;
     --dir) dir=$2; shift 2 ;;
     --build) build=$2; shift 2 ;;
-    *) echo "usage: bench/dask_bench.sh [--files N] [--dir DIR] [--build DIR]" >&2; exit 2 ;;
+    --tree) tree=$2; shift 2 ;;
+    *) echo "usage: bench/dask_bench.sh [--files N] [--dir DIR] [--build DIR] [--tree DIR]" >&2; exit 2 ;;
   esac
 done
 python=/usr/bin/python3
@@ -30,8 +38,9 @@ if ! ls "$build"/python/metainfo/_core*.so >/dev/null 2>&1; then
   cmake --build "$build" -j2 --target metainfo_py metainfo_cli >/dev/null
 fi
 
-tree=$dir/tree$files
-if [ ! -f "$tree.done" ]; then
+mkdir -p "$dir"
+[ -n "$tree" ] || tree=$dir/tree$files
+if [ ! -f "$tree.done" ] && [ ! -f "$tree/.done" ]; then
   rm -rf "$tree"
   "$python" - "$root" "$tree" "$files" <<'PY'
 import os, sys
