@@ -18,6 +18,7 @@ std::vector<std::unique_ptr<Peer>> MakePeers(const std::vector<std::string>& wan
                                              const std::string& python) {
     std::vector<std::unique_ptr<Peer>> all;
     all.push_back(bench::MakeMetainfoPeer());
+    all.push_back(bench::MakeAccuratePeer());
     all.push_back(bench::MakeTaglibPeer(false));
     all.push_back(bench::MakeTaglibPeer(true));
     all.push_back(bench::MakeAvformatPeer(false));

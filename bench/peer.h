@@ -31,6 +31,7 @@ Sample Measure(Job&& job);
 int64_t ReadCharCount();
 
 std::unique_ptr<Peer> MakeMetainfoPeer();
+std::unique_ptr<Peer> MakeAccuratePeer();
 std::unique_ptr<Peer> MakeTaglibPeer(bool fast);
 std::unique_ptr<Peer> MakeAvformatPeer(bool streamInfo);
 std::unique_ptr<Peer> MakeMediainfoPeer();  // null when built without it
