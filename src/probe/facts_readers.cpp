@@ -59,6 +59,20 @@ const FactsReader kFactsReaders[MM_MEDIA_SLOTS] = {
     /* 15 */ nullptr,
 };
 
+// A format only the accurate interface reads: how its first bytes look, and
+// its reader. A row's test sees the file's first kHeadBytes bytes (fewer for a
+// shorter file) and may read more through the path.
+struct AccurateFormat {
+    AccurateType type;
+    bool (*looksLike)(const char* path, const uint8_t* head, size_t n);
+    FactsReader reader;
+};
+
+const AccurateFormat kAccurateFormats[] = {
+    // Filled in as the readers land: {kAccurateFlac, LooksLikeFlac, FlacFacts}, ...
+    {kAccurateFlac, nullptr, nullptr},
+};
+
 constexpr size_t kHeadBytes = 128;
 
 // The first bytes of a file, for the types the MM_ detection turns away.
@@ -79,10 +93,16 @@ int AccurateMediaType(const char* path) {
     const size_t n = ReadHead(path, head);
     if (IsRf64Wave(head, n)) return MEDIA_TYPE_WAVE;
     if (LooksLikeAdts(path)) return MEDIA_TYPE_AAC;
+    for (const AccurateFormat& f : kAccurateFormats) {
+        if (f.looksLike != nullptr && f.reader != nullptr && f.looksLike(path, head, n)) return f.type;
+    }
     return MEDIA_TYPE_UNKNOWN;
 }
 
 int32_t ReadFacts(const char* path, int type, MediaFacts* facts) {
+    for (const AccurateFormat& f : kAccurateFormats) {
+        if (f.type == type && f.reader != nullptr) return f.reader(path, type, facts);
+    }
     if (type <= 0 || type >= MM_MEDIA_SLOTS) return MM_E_UNSUPPORTED;
     const FactsReader reader = kFactsReaders[type];
     if (reader != nullptr) {
