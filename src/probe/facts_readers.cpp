@@ -6,6 +6,7 @@
 #include "core/file_access.h"
 #include "core/quirks.h"
 #include "core/thread_state.h"
+#include "matroska/matroska_facts.h"
 #include "metainfo/metainfo.h"
 #include "mp3/mp3_stream_facts.h"
 #include "mp4/mp4_facts.h"
@@ -71,6 +72,7 @@ struct AccurateFormat {
 const AccurateFormat kAccurateFormats[] = {
     // Filled in as the readers land: {kAccurateFlac, LooksLikeFlac, FlacFacts}, ...
     {kAccurateFlac, nullptr, nullptr},
+    {kAccurateMatroska, LooksLikeMatroska, MatroskaFacts},
 };
 
 constexpr size_t kHeadBytes = 128;

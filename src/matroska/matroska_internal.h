@@ -1,0 +1,29 @@
+// What the Matroska reader gathers from the elements before the first
+// Cluster, and the readers of the metadata elements into it.
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+
+#include "core/facts.h"
+
+namespace metainfo {
+
+// Level-1 element IDs of a Segment.
+constexpr uint32_t kMkvSeekHead = 0x114D9B74;
+constexpr uint32_t kMkvInfo = 0x1549A966;
+constexpr uint32_t kMkvTracks = 0x1654AE6B;
+constexpr uint32_t kMkvTags = 0x1254C367;
+constexpr uint32_t kMkvAttachments = 0x1941A469;
+constexpr uint32_t kMkvCues = 0x1C53BB6B;
+constexpr uint32_t kMkvCluster = 0x1F43B675;
+
+// The bodies of Tracks and Tags (in memory) into facts.
+void MkvTracksFacts(const uint8_t* body, size_t size, MediaFacts* facts);
+void MkvTagsFacts(const uint8_t* body, size_t size, TagFacts* tags);
+
+// The AttachedFile elements of the Attachments body at pos (size bytes):
+// pictures with where their bytes lie, read from the file one header at a time.
+void MkvAttachmentsFacts(int h, uint64_t pos, uint64_t size, std::vector<PictureFacts>* pictures);
+
+}  // namespace metainfo
