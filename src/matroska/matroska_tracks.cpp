@@ -69,7 +69,32 @@ const char* H264Profile(uint8_t idc, uint8_t constraints) {
     }
 }
 
-// avcC, hvcC and av1C records, as Matroska keeps them in CodecPrivate.
+const char* const kMpeg4Profiles[16] = {"Simple Profile",
+                                        "Simple Scalable Profile",
+                                        "Core Profile",
+                                        "Main Profile",
+                                        "N-bit Profile",
+                                        "Scalable Texture Profile",
+                                        "Simple Face Animation Profile",
+                                        "Basic Animated Texture Profile",
+                                        "Hybrid Profile",
+                                        "Advanced Real Time Simple Profile",
+                                        "Core Scalable Profile",
+                                        "Advanced Coding Efficiency Profile",
+                                        "Advanced Core Profile",
+                                        "Advanced Scalable Texture Profile",
+                                        "Simple Studio Profile",
+                                        "Advanced Simple Profile"};
+
+// VP9's CodecPrivate: one-byte ID, one-byte length, value; ID 1 the profile.
+void Vp9Profile(const uint8_t* p, size_t n, StreamFacts* s) {
+    for (size_t at = 0; at + 2 <= n && p[at + 1] <= n - at - 2; at += 2 + size_t{p[at + 1]}) {
+        if (p[at] == 1 && p[at + 1] == 1 && p[at + 2] < 4) s->profile = std::string("Profile ") + char('0' + p[at + 2]);
+    }
+}
+
+// avcC, hvcC and av1C records, as Matroska keeps them in CodecPrivate; for
+// MPEG-4 Visual, the headers that start its stream.
 void VideoProfile(const TrackEntry& t, StreamFacts* s) {
     static const char* const kHevc[5] = {nullptr, "Main", "Main 10", "Main Still Picture", "Rext"};
     static const char* const kAv1[3] = {"Main", "High", "Professional"};
@@ -86,6 +111,11 @@ void VideoProfile(const TrackEntry& t, StreamFacts* s) {
     } else if (s->codec == "av1" && n >= 2) {
         if ((p[1] >> 5) < 3) s->profile = kAv1[p[1] >> 5];
         s->level = p[1] & 0x1F;
+    } else if (s->codec == "vp9") {
+        Vp9Profile(p, n, s);
+    } else if (s->codec == "mpeg4" && n >= 5 && p[0] == 0 && p[1] == 0 && p[2] == 1 && p[3] == 0xB0) {
+        s->profile = kMpeg4Profiles[p[4] >> 4];
+        s->level = p[4] & 0x0F;
     }
 }
 
