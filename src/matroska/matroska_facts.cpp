@@ -21,7 +21,6 @@ constexpr uint64_t kMaxBody = uint64_t{64} << 10;  // of SeekHead, Info, Tracks
 constexpr uint64_t kMaxTags = uint64_t{1} << 20;  // of Tags and Cues
 constexpr int kMaxTopElements = 4096;
 constexpr int kMaxSeeks = 64;
-constexpr int kMaxTailBlocks = 16;  // 64 KiB each, looking for the last Cluster
 
 struct Walk {
     int h = 0;
@@ -35,6 +34,7 @@ struct Walk {
     std::string title;  // Info's own
     uint64_t lastTime = 0;  // timecode of the latest frame found without Duration
     bool haveLastTime = false;
+    uint64_t firstCluster = 0, cueCluster = 0;  // file positions, 0 when none
     std::string docType;
 };
 
@@ -89,7 +89,18 @@ void LatestTime(uint64_t t, Walk* w) {
     w->haveLastTime = true;
 }
 
-// The latest CueTime: a keyframe near the end.
+// The CueClusterPosition of a CueTrackPositions.
+uint64_t CueCluster(const uint8_t* body, size_t size) {
+    EbmlChildren children(body, size);
+    EbmlElement e;
+    const uint8_t* p = nullptr;
+    while (children.Next(&e, &p)) {
+        if (e.id == 0xF1) return EbmlUnsigned(p, e.size);
+    }
+    return UINT64_MAX;
+}
+
+// The latest CueTime (a keyframe near the end) and where its Cluster lies.
 void ReadCues(const std::vector<uint8_t>& b, Walk* w) {
     EbmlChildren points(b.data(), b.size());
     EbmlElement point;
@@ -98,9 +109,14 @@ void ReadCues(const std::vector<uint8_t>& b, Walk* w) {
         EbmlChildren children(body, static_cast<size_t>(point.size));
         EbmlElement e;
         const uint8_t* p = nullptr;
+        uint64_t time = 0, cluster = UINT64_MAX;
         while (point.id == 0xBB && children.Next(&e, &p)) {
-            if (e.id == 0xB3) LatestTime(EbmlUnsigned(p, e.size), w);
+            if (e.id == 0xB3) time = EbmlUnsigned(p, e.size);
+            if (e.id == 0xB7) cluster = CueCluster(p, static_cast<size_t>(e.size));
         }
+        if (point.id != 0xBB || (w->haveLastTime && time < w->lastTime)) continue;
+        LatestTime(time, w);
+        if (cluster < w->segmentEnd - w->segment) w->cueCluster = w->segment + cluster;
     }
 }
 
@@ -129,64 +145,12 @@ void ReadTopElement(const EbmlElement& e, uint64_t pos, Walk* w, MediaFacts* fac
     if (e.id == kMkvCues) ReadCues(b, w);
 }
 
-// The relative timecode of a Block or SimpleBlock: after its track number.
-bool BlockTime(const uint8_t* p, uint64_t n, int64_t* t) {
-    if (n == 0) return false;
-    size_t len = 1;
-    while (len <= 8 && (p[0] & (0x80u >> (len - 1))) == 0) ++len;
-    if (len > 8 || n < len + 2) return false;
-    *t = static_cast<int16_t>(static_cast<uint16_t>(p[len] << 8 | p[len + 1]));
-    return true;
-}
-
-// A Cluster whose bytes start b (as far as read): its Timecode and the latest
-// block in what was read.
-bool ClusterTime(const uint8_t* b, size_t n, Walk* w) {
-    EbmlElement cluster;
-    if (!ParseEbmlHeader(b, n, &cluster) || cluster.id != kMkvCluster) return false;
-    const size_t avail = n - cluster.headerSize;
-    EbmlChildren children(b + cluster.headerSize, cluster.unknownSize || cluster.size > avail ? avail : cluster.size);
-    EbmlElement e;
-    const uint8_t* p = nullptr;
-    bool haveTimecode = false;
-    uint64_t timecode = 0;
-    int64_t latest = 0;
-    while (children.Next(&e, &p)) {
-        int64_t t = 0;
-        if (e.id == 0xE7) {
-            timecode = EbmlUnsigned(p, e.size);
-            haveTimecode = true;
-        }
-        if (e.id == 0xA3 && BlockTime(p, e.size, &t) && t > latest) latest = t;
-        EbmlChildren group(p, static_cast<size_t>(e.size));
-        EbmlElement g;
-        const uint8_t* q = nullptr;
-        while (e.id == 0xA0 && group.Next(&g, &q)) {
-            if (g.id == 0xA1 && BlockTime(q, g.size, &t) && t > latest) latest = t;
-        }
-    }
-    if (!haveTimecode) return false;
-    LatestTime(timecode + static_cast<uint64_t>(latest), w);
-    return true;
-}
-
-// The last Cluster, looked for backwards from the end of the Segment.
-void LastClusterTime(Walk* w) {
-    const uint64_t end = w->segmentEnd < w->fileSize ? w->segmentEnd : w->fileSize;
-    std::vector<uint8_t> block, window;
-    uint64_t blockEnd = end;
-    for (int i = 0; i < kMaxTailBlocks && blockEnd > w->segment; ++i) {
-        const uint64_t start = blockEnd - w->segment > kMaxBody ? blockEnd - kMaxBody : w->segment;
-        if (!EbmlReadBody(w->h, start, blockEnd - start, kMaxBody, &block) || block.size() < 4) return;
-        for (size_t at = block.size() - 4 + 1; at-- > 0;) {
-            if (block[at] != 0x1F || block[at + 1] != 0x43 || block[at + 2] != 0xB6 || block[at + 3] != 0x75) continue;
-            if (EbmlReadBody(w->h, start + at, end - start - at, kMaxBody, &window) &&
-                ClusterTime(window.data(), window.size(), w))
-                return;
-        }
-        // Overlap by three bytes so an ID across two blocks is seen.
-        blockEnd = start + 3 < blockEnd && start > w->segment ? start + 3 : w->segment;
-    }
+// Without Duration: the latest frame of the last Cluster, walking on from
+// the Cluster of the latest cue (or the first Cluster).
+void LastFrameTime(Walk* w) {
+    const uint64_t from = w->cueCluster != 0 ? w->cueCluster : w->firstCluster;
+    uint64_t ticks = 0;
+    if (from != 0 && MkvLastFrameTime(w->h, from, w->segment, w->segmentEnd, &ticks)) LatestTime(ticks, w);
 }
 
 void Finish(const Walk& w, MediaFacts* facts) {
@@ -227,7 +191,10 @@ int32_t ReadMatroska(const char* path, MediaFacts* facts) {
     uint64_t pos = w.segment;
     EbmlElement e;
     for (int i = 0; i < kMaxTopElements && EbmlHeaderAt(w.h, pos, w.segmentEnd, &e); ++i) {
-        if (e.id == kMkvCluster) break;
+        if (e.id == kMkvCluster) {
+            w.firstCluster = pos;
+            break;
+        }
         ReadTopElement(e, pos, &w, facts);
         if (e.unknownSize) break;  // no telling where the next one starts
         pos += e.headerSize + e.size;
@@ -237,7 +204,7 @@ int32_t ReadMatroska(const char* path, MediaFacts* facts) {
         if (EbmlHeaderAt(w.h, at, w.segmentEnd, &e) && e.id != kMkvCluster) ReadTopElement(e, at, &w, facts);
     }
     if (!w.haveInfo && !w.haveTracks) return MM_E_FAIL;
-    if (w.duration < 0) LastClusterTime(&w);
+    if (w.duration < 0) LastFrameTime(&w);
     Finish(w, facts);
     return MM_OK;
 }

@@ -4,6 +4,7 @@
 
 #include <cstddef>
 #include <cstdint>
+#include <vector>
 
 #include "core/facts.h"
 
@@ -25,5 +26,9 @@ void MkvTagsFacts(const uint8_t* body, size_t size, TagFacts* tags);
 // The AttachedFile elements of the Attachments body at pos (size bytes):
 // pictures with where their bytes lie, read from the file one header at a time.
 void MkvAttachmentsFacts(int h, uint64_t pos, uint64_t size, std::vector<PictureFacts>* pictures);
+
+// The timecode (in TimecodeScale ticks) of the latest block of the last
+// Cluster, walking on from the element at from (a Cluster) to end.
+bool MkvLastFrameTime(int h, uint64_t from, uint64_t segment, uint64_t end, uint64_t* ticks);
 
 }  // namespace metainfo
