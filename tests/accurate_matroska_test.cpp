@@ -36,7 +36,8 @@ Bytes Video(const std::string& codec, const Bytes& priv, uint64_t ns, uint32_t w
 Bytes Audio(const std::string& codec, const Bytes& priv, double rate, uint32_t channels, uint32_t depth = 0) {
     Bytes audio = Bytes().raw(EbmlFloat(0xB5, rate)).raw(EbmlUint(0x9F, channels));
     if (depth != 0) audio.raw(EbmlUint(0x6264, depth));
-    return Ebml(0xAE, Bytes().raw(EbmlUint(0x83, 2)).raw(EbmlText(0x86, codec)).raw(Ebml(0x63A2, priv)).raw(Ebml(0xE1, audio)));
+    return Ebml(
+        0xAE, Bytes().raw(EbmlUint(0x83, 2)).raw(EbmlText(0x86, codec)).raw(Ebml(0x63A2, priv)).raw(Ebml(0xE1, audio)));
 }
 
 Bytes SimpleTag(const std::string& name, const std::string& value) {
@@ -90,9 +91,7 @@ Bytes Mkv(const std::string& doc, const std::vector<Bytes>& children, bool unkno
 Bytes WithCues() {
     const Bytes tracks = Ebml(kTracks, Audio("A_OPUS", kOpus, 48000, 2));
     const Bytes cluster = Cluster(0, 0), info = Info(-1);
-    const Bytes cues = Ebml(kCues, Bytes()
-                                       .raw(Ebml(0xBB, EbmlUint(0xB3, 0)))
-                                       .raw(Ebml(0xBB, EbmlUint(0xB3, 4000))));
+    const Bytes cues = Ebml(kCues, Bytes().raw(Ebml(0xBB, EbmlUint(0xB3, 0))).raw(Ebml(0xBB, EbmlUint(0xB3, 4000))));
     const uint64_t seekHeadSize = Ebml(kSeekHead, Bytes().raw(Seek(kCues, 0)).raw(Seek(kTags, 0))).size();
     const uint64_t cuesAt = seekHeadSize + info.size() + tracks.size() + cluster.size();
     const Bytes seekHead = Ebml(kSeekHead, Bytes().raw(Seek(kCues, cuesAt)).raw(Seek(kTags, cuesAt + cues.size())));
@@ -100,8 +99,8 @@ Bytes WithCues() {
 }
 
 std::string Summary(const mi_info& f) {
-    std::string s = std::string(f.format) + " " + f.mime + " " + std::to_string(f.duration_ms) +
-                    (f.duration_exact ? "" : "~");
+    std::string s =
+        std::string(f.format) + " " + f.mime + " " + std::to_string(f.duration_ms) + (f.duration_exact ? "" : "~");
     for (size_t i = 0; i < f.stream_count; ++i) {
         const mi_stream& t = f.streams[i];
         s += std::string(" | ") + t.codec + "/" + (t.profile ? t.profile : "") + "/" + std::to_string(t.level) + " ";
@@ -138,18 +137,22 @@ TEST(AccurateMatroska, FileFacts) {
     cut.data()[4] = static_cast<uint8_t>(0x80 | (cut.size() - 5 - 10));
     const Bytes badHeader = Bytes().u8(0x1A).u8(0x45).u8(0xDF).u8(0xA3).u8(0x00).fill(40, 0);
     const std::vector<Row> rows = {
-        {"h264 and AAC with tags and a cover", Mkv("matroska", {Info(2500), tracks, Tags(), Attachment("cover.png", "image/png"), Attachment("notes.txt", "text/plain"), Cluster(0, 0)}),
+        {"h264 and AAC with tags and a cover",
+         Mkv("matroska", {Info(2500), tracks, Tags(), Attachment("cover.png", "image/png"),
+                          Attachment("notes.txt", "text/plain"), Cluster(0, 0)}),
          MI_OK,
-         "matroska video/x-matroska 2500 | h264/High/31 640x360@30000/1001 | aac/LC/-1 44100x2x0 | Song;Band;2021-05-01;2021;3/12 ENCODER=Lavf | image/png 3 cover.png 20"},
+         "matroska video/x-matroska 2500 | h264/High/31 640x360@30000/1001 | aac/LC/-1 44100x2x0 | "
+         "Song;Band;2021-05-01;2021;3/12 ENCODER=Lavf | image/png 3 cover.png 20"},
         {"WebM VP9 and Opus, Duration in 4 bytes",
-         Mkv("webm", {Info(1234.5, true), Ebml(kTracks, Bytes().raw(vp9).raw(Audio("A_OPUS", kOpus, 48000, 6))), Cluster(0, 0)}), MI_OK,
-         "webm video/webm 1235 | vp9//-1 320x240@25/1 | opus//-1 48000x6x0 | Segment title;;;0;0/0"},
+         Mkv("webm", {Info(1234.5, true), Ebml(kTracks, Bytes().raw(vp9).raw(Audio("A_OPUS", kOpus, 48000, 6))),
+                      Cluster(0, 0)}),
+         MI_OK, "webm video/webm 1235 | vp9//-1 320x240@25/1 | opus//-1 48000x6x0 | Segment title;;;0;0/0"},
         {"unknown-size Segment and Cluster", Mkv("matroska", {Info(1000), flac, Cluster(0, 0, true)}, true), MI_OK,
          "matroska audio/x-matroska 1000 | flac//-1 96000x2x24 | Segment title;;;0;0/0"},
         {"no Duration: the Cues past the Cluster", WithCues(), MI_OK,
          "matroska audio/x-matroska 4000~ | opus//-1 48000x2x0 | Song;Band;2021-05-01;2021;3/12 ENCODER=Lavf"},
-        {"no Duration nor Cues: the last Cluster", Mkv("webm", {Info(-1), flac, Cluster(0, 0), Cluster(5000, 20)}), MI_OK,
-         "webm audio/webm 5020~ | flac//-1 96000x2x24 | Segment title;;;0;0/0"},
+        {"no Duration nor Cues: the last Cluster", Mkv("webm", {Info(-1), flac, Cluster(0, 0), Cluster(5000, 20)}),
+         MI_OK, "webm audio/webm 5020~ | flac//-1 96000x2x24 | Segment title;;;0;0/0"},
         {"a TrackEntry past its parent", Mkv("matroska", {Info(10), cut}), MI_OK,
          "matroska audio/x-matroska 10 | pcm_s16le//-1 8000x1x16 | Segment title;;;0;0/0"},
         {"an EBML size of no length", badHeader, MI_E_NOT_MEDIA, ""},

@@ -73,7 +73,8 @@ bool TailClusterTime(int h, uint64_t segment, uint64_t end, uint64_t* ticks) {
         const uint64_t start = blockEnd - segment > kTailBlock ? blockEnd - kTailBlock : segment;
         if (!EbmlReadBody(h, start, blockEnd - start, kTailBlock, &block) || block.size() < 4) return false;
         for (size_t at = block.size() - 3; at-- > 0;) {
-            const bool id = block[at] == 0x1F && block[at + 1] == 0x43 && block[at + 2] == 0xB6 && block[at + 3] == 0x75;
+            const bool id =
+                block[at] == 0x1F && block[at + 1] == 0x43 && block[at + 2] == 0xB6 && block[at + 3] == 0x75;
             if (id && LastBlockTime(h, start + at, end, ticks)) return true;
         }
         // Three bytes of overlap, so an ID across two blocks is seen.

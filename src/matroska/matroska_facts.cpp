@@ -168,7 +168,8 @@ void Finish(const Walk& w, MediaFacts* facts) {
     }
     if (us >= 0 && us < 9.2e18) facts->durationUs = std::llround(us);
     if (facts->durationUs > 0) {
-        facts->bitRate = static_cast<uint64_t>(static_cast<double>(w.fileSize) * 8e6 / static_cast<double>(facts->durationUs));
+        facts->bitRate =
+            static_cast<uint64_t>(static_cast<double>(w.fileSize) * 8e6 / static_cast<double>(facts->durationUs));
     }
     if (facts->tags.title.empty()) facts->tags.title = w.title;
 }

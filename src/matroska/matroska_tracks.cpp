@@ -30,13 +30,33 @@ struct CodecName {
 };
 
 constexpr CodecName kCodecs[] = {
-    {"V_MPEG4/ISO/AVC", "h264"}, {"V_MPEGH/ISO/HEVC", "hevc"}, {"V_VP8", "vp8"},         {"V_VP9", "vp9"},
-    {"V_AV1", "av1"},            {"V_MPEG4/ISO/", "mpeg4"},    {"V_MPEG1", "mpeg1video"}, {"V_MPEG2", "mpeg2video"},
-    {"V_THEORA", "theora"},      {"V_MJPEG", "mjpeg"},         {"V_PRORES", "prores"},    {"V_FFV1", "ffv1"},
-    {"A_AAC", "aac"},            {"A_AAC/", "aac"},            {"A_OPUS", "opus"},        {"A_VORBIS", "vorbis"},
-    {"A_FLAC", "flac"},          {"A_AC3", "ac3"},             {"A_EAC3", "eac3"},        {"A_DTS", "dts"},
-    {"A_MPEG/L3", "mp3"},        {"A_MPEG/L2", "mp2"},         {"A_MPEG/L1", "mp1"},      {"A_TRUEHD", "truehd"},
-    {"A_ALAC", "alac"},          {"A_TTA1", "tta"},            {"A_WAVPACK4", "wavpack"},
+    {"V_MPEG4/ISO/AVC", "h264"},
+    {"V_MPEGH/ISO/HEVC", "hevc"},
+    {"V_VP8", "vp8"},
+    {"V_VP9", "vp9"},
+    {"V_AV1", "av1"},
+    {"V_MPEG4/ISO/", "mpeg4"},
+    {"V_MPEG1", "mpeg1video"},
+    {"V_MPEG2", "mpeg2video"},
+    {"V_THEORA", "theora"},
+    {"V_MJPEG", "mjpeg"},
+    {"V_PRORES", "prores"},
+    {"V_FFV1", "ffv1"},
+    {"A_AAC", "aac"},
+    {"A_AAC/", "aac"},
+    {"A_OPUS", "opus"},
+    {"A_VORBIS", "vorbis"},
+    {"A_FLAC", "flac"},
+    {"A_AC3", "ac3"},
+    {"A_EAC3", "eac3"},
+    {"A_DTS", "dts"},
+    {"A_MPEG/L3", "mp3"},
+    {"A_MPEG/L2", "mp2"},
+    {"A_MPEG/L1", "mp1"},
+    {"A_TRUEHD", "truehd"},
+    {"A_ALAC", "alac"},
+    {"A_TTA1", "tta"},
+    {"A_WAVPACK4", "wavpack"},
 };
 
 std::string CodecFor(const TrackEntry& t) {
@@ -141,8 +161,8 @@ void AacProfile(const TrackEntry& t, StreamFacts* s) {
 // Frames per second from nanoseconds per frame: the usual rate within 0.01
 // of it (29.97 is stored as 33366667 ns), else 1e9/ns reduced.
 void FrameRate(uint64_t ns, StreamFacts* s) {
-    static const uint32_t kCommon[][2] = {{24000, 1001}, {24, 1}, {25, 1},  {30000, 1001}, {30, 1},  {48, 1},
-                                          {50, 1},       {60000, 1001}, {60, 1}, {100, 1},  {120, 1}, {15, 1}};
+    static const uint32_t kCommon[][2] = {{24000, 1001}, {24, 1},       {25, 1}, {30000, 1001}, {30, 1},  {48, 1},
+                                          {50, 1},       {60000, 1001}, {60, 1}, {100, 1},      {120, 1}, {15, 1}};
     if (ns == 0) return;
     const double fps = 1e9 / static_cast<double>(ns);
     for (const auto& c : kCommon) {
