@@ -25,6 +25,15 @@ bool BlockTime(const uint8_t* p, size_t n, int64_t* t) {
     return true;
 }
 
+// The time of a SimpleBlock, or of a BlockGroup's Block (its first child),
+// from the first bytes of the element's body.
+bool FrameTime(uint32_t id, const std::vector<uint8_t>& b, int64_t* t) {
+    if (id == 0xA3) return BlockTime(b.data(), b.size(), t);
+    EbmlElement block;
+    return ParseEbmlHeader(b.data(), b.size(), &block) && block.id == 0xA1 &&
+           BlockTime(b.data() + block.headerSize, b.size() - block.headerSize, t);
+}
+
 // The latest block time of the Cluster at pos; where a Cluster of unknown
 // size runs into the next one, that one is read on. False when pos holds no
 // Cluster with a Timecode.
@@ -49,14 +58,10 @@ bool LastBlockTime(int h, uint64_t pos, uint64_t end, uint64_t* ticks) {
         if (e.id != 0xE7 && e.id != 0xA3 && e.id != 0xA0) continue;
         if (!EbmlReadBody(h, body, e.size, kBlockHead, &b)) break;
         int64_t t = 0;
-        EbmlElement block;
         if (e.id == 0xE7) {
             timecode = EbmlUnsigned(b.data(), b.size());
             haveTimecode = true;
-        } else if (e.id == 0xA3 && BlockTime(b.data(), b.size(), &t) && t > latest) {
-            latest = t;
-        } else if (e.id == 0xA0 && ParseEbmlHeader(b.data(), b.size(), &block) && block.id == 0xA1 &&
-                   BlockTime(b.data() + block.headerSize, b.size() - block.headerSize, &t) && t > latest) {
+        } else if (FrameTime(e.id, b, &t) && t > latest) {
             latest = t;
         }
     }
