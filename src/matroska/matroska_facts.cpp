@@ -122,6 +122,9 @@ void ReadCues(const std::vector<uint8_t>& b, Walk* w) {
 
 // One level-1 element, once however often the walk and the SeekHead name it.
 void ReadTopElement(const EbmlElement& e, uint64_t pos, Walk* w, MediaFacts* facts) {
+    const bool known = e.id == kMkvSeekHead || e.id == kMkvInfo || e.id == kMkvTracks || e.id == kMkvTags ||
+                       e.id == kMkvAttachments || e.id == kMkvCues;
+    if (!known) return;
     for (uint64_t s : w->seen) {
         if (s == pos) return;
     }
