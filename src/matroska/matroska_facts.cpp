@@ -35,6 +35,7 @@ struct Walk {
     uint64_t lastTime = 0;  // timecode of the latest frame found without Duration
     bool haveLastTime = false;
     uint64_t firstCluster = 0, cueCluster = 0;  // file positions, 0 when none
+    std::vector<uint64_t> trackNumbers;  // of facts->streams, in order
     std::string docType;
 };
 
@@ -142,7 +143,7 @@ void ReadTopElement(const EbmlElement& e, uint64_t pos, Walk* w, MediaFacts* fac
     if (e.id == kMkvInfo) ReadInfo(b, w);
     if (e.id == kMkvTracks) {
         w->haveTracks = true;
-        MkvTracksFacts(b.data(), b.size(), facts);
+        MkvTracksFacts(b.data(), b.size(), facts, &w->trackNumbers);
     }
     if (e.id == kMkvTags) MkvTagsFacts(b.data(), b.size(), &facts->tags);
     if (e.id == kMkvCues) ReadCues(b, w);
@@ -209,6 +210,7 @@ int32_t ReadMatroska(const char* path, MediaFacts* facts) {
     }
     if (!w.haveInfo && !w.haveTracks) return MM_E_FAIL;
     if (w.duration < 0) LastFrameTime(&w);
+    if (w.firstCluster != 0) MkvFrameProfiles(w.h, w.firstCluster, w.segmentEnd, w.trackNumbers, facts);
     Finish(w, facts);
     return MM_OK;
 }

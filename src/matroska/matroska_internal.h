@@ -19,8 +19,9 @@ constexpr uint32_t kMkvAttachments = 0x1941A469;
 constexpr uint32_t kMkvCues = 0x1C53BB6B;
 constexpr uint32_t kMkvCluster = 0x1F43B675;
 
-// The bodies of Tracks and Tags (in memory) into facts.
-void MkvTracksFacts(const uint8_t* body, size_t size, MediaFacts* facts);
+// The bodies of Tracks and Tags (in memory) into facts; numbers gets the
+// TrackNumber of each stream added.
+void MkvTracksFacts(const uint8_t* body, size_t size, MediaFacts* facts, std::vector<uint64_t>* numbers);
 void MkvTagsFacts(const uint8_t* body, size_t size, TagFacts* tags);
 
 // The AttachedFile elements of the Attachments body at pos (size bytes):
@@ -30,5 +31,9 @@ void MkvAttachmentsFacts(int h, uint64_t pos, uint64_t size, std::vector<Picture
 // The timecode (in TimecodeScale ticks) of the latest block of the last
 // Cluster, walking on from the element at from (a Cluster) to end.
 bool MkvLastFrameTime(int h, uint64_t from, uint64_t segment, uint64_t end, uint64_t* ticks);
+
+// VP8 and VP9 state their profile in each frame only: the first frame of
+// each such stream without one, among the first blocks of the Cluster at pos.
+void MkvFrameProfiles(int h, uint64_t pos, uint64_t end, const std::vector<uint64_t>& numbers, MediaFacts* facts);
 
 }  // namespace metainfo

@@ -3,6 +3,7 @@
 #include <cmath>
 #include <cstring>
 #include <string>
+#include <vector>
 
 #include "core/quirks.h"
 #include "matroska/ebml.h"
@@ -14,7 +15,7 @@ namespace metainfo {
 namespace {
 
 struct TrackEntry {
-    uint64_t type = 0;
+    uint64_t type = 0, number = 0;
     std::string codecId;
     const uint8_t* priv = nullptr;
     size_t privSize = 0;
@@ -208,8 +209,9 @@ void ReadAudio(const uint8_t* body, size_t size, TrackEntry* t) {
     }
 }
 
-void AddTrack(const TrackEntry& t, MediaFacts* facts) {
+void AddTrack(const TrackEntry& t, MediaFacts* facts, std::vector<uint64_t>* numbers) {
     if (t.type != 1 && t.type != 2) return;  // subtitles, buttons, ...
+    numbers->push_back(t.number);
     StreamFacts s;
     s.kind = t.type == 1 ? StreamFacts::kVideo : StreamFacts::kAudio;
     s.codec = CodecFor(t);
@@ -230,7 +232,7 @@ void AddTrack(const TrackEntry& t, MediaFacts* facts) {
 
 }  // namespace
 
-void MkvTracksFacts(const uint8_t* body, size_t size, MediaFacts* facts) {
+void MkvTracksFacts(const uint8_t* body, size_t size, MediaFacts* facts, std::vector<uint64_t>* numbers) {
     EbmlChildren entries(body, size);
     EbmlElement entry;
     const uint8_t* entryBody = nullptr;
@@ -243,6 +245,7 @@ void MkvTracksFacts(const uint8_t* body, size_t size, MediaFacts* facts) {
         while (children.Next(&e, &p)) {
             const size_t n = static_cast<size_t>(e.size);
             if (e.id == 0x83) t.type = EbmlUnsigned(p, n);
+            if (e.id == 0xD7) t.number = EbmlUnsigned(p, n);
             if (e.id == 0x86) t.codecId = std::string(reinterpret_cast<const char*>(p), n).c_str();
             if (e.id == 0x63A2) {
                 t.priv = p;
@@ -252,7 +255,7 @@ void MkvTracksFacts(const uint8_t* body, size_t size, MediaFacts* facts) {
             if (e.id == 0xE0) ReadVideo(p, n, &t);
             if (e.id == 0xE1) ReadAudio(p, n, &t);
         }
-        AddTrack(t, facts);
+        AddTrack(t, facts, numbers);
     }
 }
 
