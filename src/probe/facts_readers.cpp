@@ -6,6 +6,8 @@
 #include "core/file_access.h"
 #include "core/quirks.h"
 #include "core/thread_state.h"
+#include "flac/flac_facts.h"
+#include "aiff/aiff_facts.h"
 #include "metainfo/metainfo.h"
 #include "mp3/mp3_stream_facts.h"
 #include "mp4/mp4_facts.h"
@@ -69,8 +71,8 @@ struct AccurateFormat {
 };
 
 const AccurateFormat kAccurateFormats[] = {
-    // Filled in as the readers land: {kAccurateFlac, LooksLikeFlac, FlacFacts}, ...
-    {kAccurateFlac, nullptr, nullptr},
+    {kAccurateFlac, LooksLikeFlac, FlacFacts},
+    {kAccurateAiff, LooksLikeAiff, AiffFacts},
 };
 
 constexpr size_t kHeadBytes = 128;
