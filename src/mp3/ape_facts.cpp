@@ -59,7 +59,7 @@ void TakeText(const std::string& key, const std::string& value, TagFacts* t) {
 
 const char* ImageMime(const uint8_t* p, size_t n) {
     if (n >= 3 && BytesEqual(p, "\xFF\xD8\xFF", 3)) return "image/jpeg";
-    if (n >= 8 && BytesEqual(p, "\x89PNG", 4)) return "image/png";
+    if (n >= 4 && BytesEqual(p, "\x89PNG", 4)) return "image/png";
     if (n >= 4 && BytesEqual(p, "GIF8", 4)) return "image/gif";
     return "";
 }
