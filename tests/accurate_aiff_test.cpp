@@ -23,8 +23,9 @@ struct Row {
 };
 
 Bytes Aifc(const std::string& compression, uint16_t bits, uint32_t frames = 16000) {
-    return AiffForm("AIFC", {AiffChunk("FVER", Bytes().be32(0xA2805140)),
-                             AiffChunk("COMM", AiffComm(1, frames, bits, 16000, compression)), AiffChunk("SSND", kSound)});
+    return AiffForm("AIFC",
+                    {AiffChunk("FVER", Bytes().be32(0xA2805140)),
+                     AiffChunk("COMM", AiffComm(1, frames, bits, 16000, compression)), AiffChunk("SSND", kSound)});
 }
 
 TEST(AccurateAiff, FactsOfBuiltChunks) {
@@ -52,7 +53,8 @@ TEST(AccurateAiff, FactsOfBuiltChunks) {
         {"AIFC ima4 counts packets of 64", Aifc("ima4", 0, 250),
          "aiff audio/aiff 1000 | adpcm_ima_qt 16000x1x4 68000 | ;;;;;;0;0/0;0/0;;"},
         {"no COMM", AiffForm("AIFF", {AiffChunk("SSND", kSound)}), "error 8"},
-        {"a chunk past the end", AiffForm("AIFF", {AiffChunk("COMM", AiffComm(1, 8, 8, 8000)), Bytes().str("SSND").be32(999)}),
+        {"a chunk past the end",
+         AiffForm("AIFF", {AiffChunk("COMM", AiffComm(1, 8, 8, 8000)), Bytes().str("SSND").be32(999)}),
          "aiff audio/aiff 1 | pcm_s8 8000x1x8 64000 | ;;;;;;0;0/0;0/0;;"},
     };
     for (const Row& row : rows) {

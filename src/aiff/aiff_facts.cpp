@@ -96,9 +96,9 @@ struct Codec {
     uint32_t bits;  // per sample as ffprobe counts them; 0: the COMM's
 };
 
-const Codec kCodecs[] = {{"sowt", "pcm_s16le", 16}, {"fl32", "pcm_f32be", 32}, {"FL32", "pcm_f32be", 32},
-                         {"fl64", "pcm_f64be", 64}, {"FL64", "pcm_f64be", 64}, {"ulaw", "pcm_mulaw", 8},
-                         {"ULAW", "pcm_mulaw", 8},  {"alaw", "pcm_alaw", 8},   {"ALAW", "pcm_alaw", 8},
+const Codec kCodecs[] = {{"sowt", "pcm_s16le", 16},  {"fl32", "pcm_f32be", 32}, {"FL32", "pcm_f32be", 32},
+                         {"fl64", "pcm_f64be", 64},  {"FL64", "pcm_f64be", 64}, {"ulaw", "pcm_mulaw", 8},
+                         {"ULAW", "pcm_mulaw", 8},   {"alaw", "pcm_alaw", 8},   {"ALAW", "pcm_alaw", 8},
                          {"ima4", "adpcm_ima_qt", 4}};
 
 const char* PcmName(uint16_t bits) {
@@ -139,7 +139,8 @@ void FillStream(const Aiff& a, MediaFacts* f) {
 }  // namespace
 
 bool LooksLikeAiff(const char* /*path*/, const uint8_t* head, size_t n) {
-    return n >= 12 && BytesEqual(head, "FORM", 4) && (BytesEqual(head + 8, "AIFF", 4) || BytesEqual(head + 8, "AIFC", 4));
+    return n >= 12 && BytesEqual(head, "FORM", 4) &&
+           (BytesEqual(head + 8, "AIFF", 4) || BytesEqual(head + 8, "AIFC", 4));
 }
 
 int32_t AiffFacts(const char* path, int /*type*/, MediaFacts* f) {

@@ -35,11 +35,16 @@ void TakeEntry(const std::string& key, const std::string& value, TagFacts* t) {
     static const struct {
         const char* key;
         std::string TagFacts::*field;
-    } kNamed[] = {{"TITLE", &TagFacts::title},       {"ARTIST", &TagFacts::artist},
-                  {"ALBUM", &TagFacts::album},       {"ALBUMARTIST", &TagFacts::albumArtist},
-                  {"ALBUM ARTIST", &TagFacts::albumArtist}, {"GENRE", &TagFacts::genre},
-                  {"DATE", &TagFacts::date},         {"COMMENT", &TagFacts::comment},
-                  {"DESCRIPTION", &TagFacts::comment}, {"COMPOSER", &TagFacts::composer}};
+    } kNamed[] = {{"TITLE", &TagFacts::title},
+                  {"ARTIST", &TagFacts::artist},
+                  {"ALBUM", &TagFacts::album},
+                  {"ALBUMARTIST", &TagFacts::albumArtist},
+                  {"ALBUM ARTIST", &TagFacts::albumArtist},
+                  {"GENRE", &TagFacts::genre},
+                  {"DATE", &TagFacts::date},
+                  {"COMMENT", &TagFacts::comment},
+                  {"DESCRIPTION", &TagFacts::comment},
+                  {"COMPOSER", &TagFacts::composer}};
     for (const auto& k : kNamed) {
         if (key == k.key) return Append(&(t->*k.field), value);
     }

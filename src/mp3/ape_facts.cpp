@@ -36,10 +36,14 @@ void TakeText(const std::string& key, const std::string& value, TagFacts* t) {
     static const struct {
         const char* key;
         std::string TagFacts::*field;
-    } kNamed[] = {{"title", &TagFacts::title},   {"artist", &TagFacts::artist},
-                  {"album", &TagFacts::album},   {"album artist", &TagFacts::albumArtist},
-                  {"albumartist", &TagFacts::albumArtist}, {"genre", &TagFacts::genre},
-                  {"year", &TagFacts::date},     {"comment", &TagFacts::comment},
+    } kNamed[] = {{"title", &TagFacts::title},
+                  {"artist", &TagFacts::artist},
+                  {"album", &TagFacts::album},
+                  {"album artist", &TagFacts::albumArtist},
+                  {"albumartist", &TagFacts::albumArtist},
+                  {"genre", &TagFacts::genre},
+                  {"year", &TagFacts::date},
+                  {"comment", &TagFacts::comment},
                   {"composer", &TagFacts::composer}};
     const std::string lower = Lower(key);
     for (const auto& k : kNamed) {

@@ -29,8 +29,7 @@ int32_t WithId3Tags(int32_t read, const char* path, MediaFacts* facts) {
     if (read != MM_OK) return read;
     uint64_t tagEnd = 0;
     TagFacts ape;
-    if (!ReadId3Facts(path, &facts->tags, &facts->pictures, &tagEnd) ||
-        !ReadApeFacts(path, &ape, &facts->pictures))
+    if (!ReadId3Facts(path, &facts->tags, &facts->pictures, &tagEnd) || !ReadApeFacts(path, &ape, &facts->pictures))
         return MM_E_OUTOFMEMORY;
     facts->tags.FillFrom(ape);
     return MM_OK;
