@@ -127,7 +127,7 @@ void FillStream(const Aiff& a, MediaFacts* f) {
     const bool ima4 = std::memcmp(a.compression, "ima4", 4) == 0;
     s.bitRate = ima4 ? uint64_t{34} * 8 * s.channels * s.sampleRate / 64
                      : uint64_t{s.bitsPerSample} * s.channels * s.sampleRate;
-    if (a.rate > 0) {
+    if (s.sampleRate != 0) {  // a rate below 1 Hz would put the length past what a count holds
         const double samples = static_cast<double>(a.frames) * (ima4 ? 64 : 1);
         f->durationUs = static_cast<int64_t>(std::floor(samples * 1e6 / a.rate));
         f->durationExact = true;
