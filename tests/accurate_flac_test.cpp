@@ -49,10 +49,10 @@ TEST(AccurateFlac, FactsOfBuiltStreams) {
     const std::vector<Row> rows = {
         {"every comment, a picture, padding",
          Flac({FlacBlock(kInfo, FlacStreamInfo(44100, 2, 16, 132300)),
-               FlacBlock(kComments,
-                         VorbisComments({"TITLE=T", "artist=A", "ALBUM=Al", "ALBUMARTIST=AA", "GENRE=Rock",
-                                         "DATE=2019-05-02", "TRACKNUMBER=3", "TRACKTOTAL=11", "DISCNUMBER=1/2",
-                                         "DESCRIPTION=D", "COMPOSER=C", "foo=bar", "ARTIST=B", "novalue"})),
+               FlacBlock(kComments, VorbisComments({"TITLE=T", "artist=A", "ALBUM=Al", "ALBUMARTIST=AA", "GENRE=Rock",
+                                                    "DATE=2019-05-02", "TRACKNUMBER=3", "TRACKTOTAL=11",
+                                                    "DISCNUMBER=1/2", "DESCRIPTION=D", "COMPOSER=C", "foo=bar",
+                                                    "ARTIST=B", "METADATA_BLOCK_PICTURE=AAAA", "novalue"})),
                FlacBlock(kPicture, FlacPicture(3, "image/png", "front", kPng)),
                FlacBlock(kPadding, Bytes().zeros(9), true)}),
          "flac audio/flac 3000 | flac 44100x2x16 0 | T;A;B;Al;AA;Rock;2019-05-02;2019;3/11;1/2;D;C FOO=bar | "

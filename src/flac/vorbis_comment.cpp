@@ -60,7 +60,8 @@ void TakeEntry(const std::string& key, const std::string& value, TagFacts* t) {
         if (total != 0) t->discTotal = total;
     } else if (key == "DISCTOTAL" || key == "TOTALDISCS") {
         t->discTotal = Number(value);
-    } else if (!value.empty()) {
+    } else if (!value.empty() && key != "METADATA_BLOCK_PICTURE") {
+        // A picture in base64 has no bytes to point at in the file: not a tag.
         t->extra.emplace_back(key, value);
     }
 }
