@@ -7,9 +7,12 @@
 #include "core/quirks.h"
 #include "core/thread_state.h"
 #include "matroska/matroska_facts.h"
+#include "flac/flac_facts.h"
+#include "aiff/aiff_facts.h"
 #include "metainfo/metainfo.h"
 #include "mp3/mp3_stream_facts.h"
 #include "mp4/mp4_facts.h"
+#include "mp3/ape_facts.h"
 #include "mp3/id3_facts.h"
 #include "probe/contract_facts.h"
 #include "speech/amr.h"
@@ -21,11 +24,16 @@ namespace {
 using FactsReader = int32_t (*)(const char* path, int type, MediaFacts* facts);
 
 int32_t ReadWave(const char* path, int /*type*/, MediaFacts* facts) { return WaveFacts(path, facts); }
-// ADTS and MPEG audio carry ID3 tags: before the stream, and ID3v1 at its end.
+// ADTS and MPEG audio carry ID3 tags: before the stream, and ID3v1 at its end;
+// an APE tag at the end fills what the ID3 tags lack.
 int32_t WithId3Tags(int32_t read, const char* path, MediaFacts* facts) {
     if (read != MM_OK) return read;
     uint64_t tagEnd = 0;
-    return ReadId3Facts(path, &facts->tags, &facts->pictures, &tagEnd) ? MM_OK : MM_E_OUTOFMEMORY;
+    TagFacts ape;
+    if (!ReadId3Facts(path, &facts->tags, &facts->pictures, &tagEnd) || !ReadApeFacts(path, &ape, &facts->pictures))
+        return MM_E_OUTOFMEMORY;
+    facts->tags.FillFrom(ape);
+    return MM_OK;
 }
 
 int32_t ReadAac(const char* path, int /*type*/, MediaFacts* facts) {
@@ -70,9 +78,9 @@ struct AccurateFormat {
 };
 
 const AccurateFormat kAccurateFormats[] = {
-    // Filled in as the readers land: {kAccurateFlac, LooksLikeFlac, FlacFacts}, ...
-    {kAccurateFlac, nullptr, nullptr},
     {kAccurateMatroska, LooksLikeMatroska, MatroskaFacts},
+    {kAccurateFlac, LooksLikeFlac, FlacFacts},
+    {kAccurateAiff, LooksLikeAiff, AiffFacts},
 };
 
 constexpr size_t kHeadBytes = 128;
