@@ -10,6 +10,7 @@
 #include "mp3/mp3_stream_facts.h"
 #include "mp4/mp4_facts.h"
 #include "mp3/id3_facts.h"
+#include "ogg/ogg_facts.h"
 #include "probe/contract_facts.h"
 #include "speech/amr.h"
 #include "speech/wave_facts.h"
@@ -71,6 +72,7 @@ struct AccurateFormat {
 const AccurateFormat kAccurateFormats[] = {
     // Filled in as the readers land: {kAccurateFlac, LooksLikeFlac, FlacFacts}, ...
     {kAccurateFlac, nullptr, nullptr},
+    {kAccurateOgg, LooksLikeOgg, OggFacts},
 };
 
 constexpr size_t kHeadBytes = 128;

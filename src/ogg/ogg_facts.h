@@ -1,0 +1,17 @@
+// The accurate interface's reader of Ogg files (Vorbis, Opus, FLAC, Theora).
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+
+#include "core/facts.h"
+
+namespace metainfo {
+
+// An Ogg page capture at the start of the file.
+bool LooksLikeOgg(const char* path, const uint8_t* head, size_t n);
+
+// MM_OK, MM_E_FAIL when no stream's headers can be read, MM_E_OUTOFMEMORY.
+int32_t OggFacts(const char* path, int type, MediaFacts* facts);
+
+}  // namespace metainfo
