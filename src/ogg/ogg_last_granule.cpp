@@ -7,7 +7,10 @@
 namespace metainfo {
 namespace {
 
-constexpr uint64_t kBlock = 64 * 1024;
+// The last page usually lies in the last few KiB: blocks start small and
+// grow to the largest a page can be.
+constexpr uint64_t kFirstBlock = 8 * 1024;
+constexpr uint64_t kLastBlock = 64 * 1024;
 // How far back the search goes: far enough for a stream interleaved with
 // others, never the whole of a large file.
 constexpr int kMaxBlocks = 16;
@@ -31,8 +34,9 @@ bool LastPageIn(const std::vector<uint8_t>& buf, size_t starts, uint32_t serial,
 bool FindLastGranule(int h, uint64_t fileSize, uint32_t serial, uint64_t* granule) {
     std::vector<uint8_t> buf;
     uint64_t end = fileSize;
-    for (int block = 0; block < kMaxBlocks && end > 0; ++block) {
-        const uint64_t start = end > kBlock ? end - kBlock : 0;
+    uint64_t size = kFirstBlock;
+    for (int block = 0; block < kMaxBlocks && end > 0; ++block, size = size < kLastBlock ? size * 2 : size) {
+        const uint64_t start = end > size ? end - size : 0;
         // Past the block: the rest of a page that starts inside it.
         const uint64_t stop = fileSize - end > kOggMaxPage ? end + kOggMaxPage : fileSize;
         buf.resize(static_cast<size_t>(stop - start));
