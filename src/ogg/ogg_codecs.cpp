@@ -8,44 +8,62 @@ namespace {
 
 uint32_t ReadBE24(const uint8_t* p) { return uint32_t(p[0]) << 16 | uint32_t(p[1]) << 8 | p[2]; }
 
-bool Identify(const uint8_t* p, size_t n, OggStream* s) {
+void IdentifyVorbis(const uint8_t* p, OggStream* s) {
     StreamFacts& f = s->facts;
+    s->codec = OggStream::kVorbis;
+    f.codec = "vorbis";
+    f.channels = p[11];
+    f.sampleRate = ReadLE32(p + 12);
+    const uint32_t nominal = ReadLE32(p + 20);
+    // A signed field: negative or zero when the encoder did not say.
+    f.bitRate = nominal > 0 && nominal < 0x80000000u ? nominal : 0;
+    s->granuleRate = f.sampleRate;
+}
+
+void IdentifyOpus(const uint8_t* p, OggStream* s) {
+    s->codec = OggStream::kOpus;
+    s->facts.codec = "opus";
+    s->facts.channels = p[9];
+    s->preSkip = ReadLE16(p + 10);
+    // Opus always decodes at 48 kHz; the input rate is only a hint.
+    s->facts.sampleRate = 48000;
+    s->granuleRate = 48000;
+}
+
+void IdentifyFlac(const uint8_t* p, OggStream* s) {
+    StreamFacts& f = s->facts;
+    s->codec = OggStream::kFlac;
+    f.codec = "flac";
+    const uint8_t* info = p + 17;  // STREAMINFO past its block header
+    f.sampleRate = ReadBE24(info + 10) >> 4;
+    f.channels = ((info[12] >> 1) & 0x07u) + 1;
+    f.bitsPerSample = ((uint32_t(info[12] & 1u) << 4) | (info[13] >> 4)) + 1;
+    s->granuleRate = f.sampleRate;
+    s->done = (p[13] & 0x80) != 0;  // STREAMINFO is the last block
+}
+
+void IdentifyTheora(const uint8_t* p, OggStream* s) {
+    StreamFacts& f = s->facts;
+    s->codec = OggStream::kTheora;
+    f.kind = StreamFacts::kVideo;
+    f.codec = "theora";
+    f.width = ReadBE24(p + 14);
+    f.height = ReadBE24(p + 17);
+    f.frameRateNum = ReadBE32(p + 22);
+    f.frameRateDen = ReadBE32(p + 26);
+    s->done = true;  // its comments repeat what the audio says, if anything
+}
+
+bool Identify(const uint8_t* p, size_t n, OggStream* s) {
     if (n >= 30 && BytesEqual(p, "\x01vorbis", 7)) {
-        s->codec = OggStream::kVorbis;
-        f.codec = "vorbis";
-        f.channels = p[11];
-        f.sampleRate = ReadLE32(p + 12);
-        const uint32_t nominal = ReadLE32(p + 20);
-        // A signed field: negative or zero when the encoder did not say.
-        f.bitRate = nominal > 0 && nominal < 0x80000000u ? nominal : 0;
-        s->granuleRate = f.sampleRate;
+        IdentifyVorbis(p, s);
     } else if (n >= 19 && BytesEqual(p, "OpusHead", 8)) {
-        s->codec = OggStream::kOpus;
-        f.codec = "opus";
-        f.channels = p[9];
-        s->preSkip = ReadLE16(p + 10);
-        // Opus always decodes at 48 kHz; the input rate is only a hint.
-        f.sampleRate = 48000;
-        s->granuleRate = 48000;
+        IdentifyOpus(p, s);
     } else if (n >= 51 && p[0] == 0x7F && BytesEqual(p + 1, "FLAC", 4) && BytesEqual(p + 9, "fLaC", 4) &&
                (p[13] & 0x7F) == 0) {
-        s->codec = OggStream::kFlac;
-        f.codec = "flac";
-        const uint8_t* info = p + 17;  // STREAMINFO past its block header
-        f.sampleRate = ReadBE24(info + 10) >> 4;
-        f.channels = ((info[12] >> 1) & 0x07u) + 1;
-        f.bitsPerSample = ((uint32_t(info[12] & 1u) << 4) | (info[13] >> 4)) + 1;
-        s->granuleRate = f.sampleRate;
-        s->done = (p[13] & 0x80) != 0;  // STREAMINFO is the last block
+        IdentifyFlac(p, s);
     } else if (n >= 42 && BytesEqual(p, "\x80theora", 7)) {
-        s->codec = OggStream::kTheora;
-        f.kind = StreamFacts::kVideo;
-        f.codec = "theora";
-        f.width = ReadBE24(p + 14);
-        f.height = ReadBE24(p + 17);
-        f.frameRateNum = ReadBE32(p + 22);
-        f.frameRateDen = ReadBE32(p + 26);
-        s->done = true;  // its comments repeat what the audio says, if anything
+        IdentifyTheora(p, s);
     } else {
         return false;
     }

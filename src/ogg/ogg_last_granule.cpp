@@ -9,8 +9,8 @@ namespace {
 
 // The last page usually lies in the last few KiB: blocks start small and
 // grow to the largest a page can be.
-constexpr uint64_t kFirstBlock = 8 * 1024;
-constexpr uint64_t kLastBlock = 64 * 1024;
+constexpr uint64_t kFirstBlock = uint64_t{8} * 1024;
+constexpr uint64_t kLastBlock = uint64_t{64} * 1024;
 // How far back the search goes: far enough for a stream interleaved with
 // others, never the whole of a large file.
 constexpr int kMaxBlocks = 16;

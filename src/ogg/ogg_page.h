@@ -10,7 +10,7 @@ namespace metainfo {
 
 constexpr size_t kOggHeaderSize = 27;
 // Header, a full segment table and 255 segments of 255 bytes.
-constexpr size_t kOggMaxPage = kOggHeaderSize + 255 + 255 * 255;
+constexpr size_t kOggMaxPage = kOggHeaderSize + 255 + size_t{255} * 255;
 constexpr uint64_t kOggNoGranule = ~uint64_t(0);  // no packet ends on the page
 
 struct OggPage {
