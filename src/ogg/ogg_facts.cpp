@@ -16,6 +16,9 @@ namespace {
 // Header packets larger than this (pictures in comments) end the walk.
 constexpr size_t kMaxHeaderBytes = 64u << 20;
 constexpr size_t kMaxStreams = 16;
+// Pages in a row that carry no header bytes before the walk gives up on a
+// stream whose headers never come.
+constexpr int kMaxIdlePages = 64;
 
 struct Walk {
     std::vector<OggStream> streams;
@@ -60,6 +63,7 @@ void WalkHeaders(int h, uint64_t fileSize, Walk* w) {
     std::vector<uint8_t> page(kOggMaxPage);
     uint64_t pos = 0;
     bool pastFirstPages = false;
+    int idle = 0;
     while (pos < fileSize && w->headerBytes <= kMaxHeaderBytes) {
         // The header and segment table first, so that only the page's own bytes are read.
         const size_t got = ReadAt(h, pos, page.data(), kOggHeaderSize + 255);
@@ -76,7 +80,12 @@ void WalkHeaders(int h, uint64_t fileSize, Walk* w) {
         } else if ((p.flags & 2) == 0) {
             pastFirstPages = true;
         }
-        if (s != nullptr && !s->done) TakePackets(p, page.data() + p.headerSize, s, w);
+        if (s != nullptr && !s->done) {
+            TakePackets(p, page.data() + p.headerSize, s, w);
+            idle = 0;
+        } else if (++idle > kMaxIdlePages) {
+            return;
+        }
         if (pastFirstPages && AllDone(*w)) return;
     }
 }
