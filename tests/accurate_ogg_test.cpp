@@ -101,6 +101,25 @@ TEST(AccurateOgg, FactsOfBuiltPages) {
     }
 }
 
+// The picture's bytes lie in base64 over four pages: the copy decodes them again.
+TEST(AccurateOgg, PictureCopiedFromComments) {
+    std::vector<uint8_t> png(600, 0x42);
+    png[0] = 0x89;
+    const Bytes comments = VorbisCommentBody({"METADATA_BLOCK_PICTURE=" + Base64Picture(3, "image/png", "", png)});
+    TempDir dir;
+    const std::string path = dir.Write(
+        "f.opus", OggStreamPages(9, {OpusHeadPacket(1, 0, 48000), Prefixed("OpusTags", comments)}, 1, 0).data());
+    mi_info* info = nullptr;
+    ASSERT_EQ(mi_probe(path.c_str(), &info), MI_OK);
+    std::vector<uint8_t> out(1000);
+    size_t size = 0;
+    ASSERT_EQ(info->picture_count, 1u);
+    EXPECT_EQ(mi_picture_copy(path.c_str(), info, 0, out.data(), out.size(), &size), MI_OK);
+    out.resize(size);
+    EXPECT_EQ(out, png);
+    mi_info_free(info);
+}
+
 TEST(AccurateOgg, ContractAnswersUnchanged) {
     TempDir dir;
     const std::string path = dir.Write("f.ogg", Vorbis(255, kTags, 44100).data());

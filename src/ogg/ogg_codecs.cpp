@@ -71,7 +71,7 @@ bool Identify(const uint8_t* p, size_t n, OggStream* s) {
 }
 
 // A FLAC metadata block after the mapping header: comments and pictures.
-bool ReadFlacBlock(const uint8_t* p, size_t n, OggStream* s, TagFacts* tags, std::vector<PictureFacts>* pictures) {
+bool ReadFlacBlock(const uint8_t* p, size_t n, OggStream* s, TagFacts* tags, PictureSink* pictures) {
     if (n < 4) return false;
     const uint8_t type = p[0] & 0x7F;
     const size_t size = ReadBE24(p + 1);
@@ -81,18 +81,14 @@ bool ReadFlacBlock(const uint8_t* p, size_t n, OggStream* s, TagFacts* tags, std
     if (type == 6) {
         PictureFacts picture;
         size_t dataOffset = 0;
-        if (ReadPictureBlock(p + 4, size, &picture, &dataOffset)) {
-            // Packets may span pages: the bytes have no single place in the file.
-            picture.viaContract = true;
-            pictures->push_back(picture);
-        }
+        if (ReadPictureBlock(p + 4, size, &picture, &dataOffset)) pictures->Add(picture, p + 4 + dataOffset);
     }
     return true;
 }
 
 }  // namespace
 
-bool ReadHeaderPacket(const uint8_t* p, size_t n, OggStream* s, TagFacts* tags, std::vector<PictureFacts>* pictures) {
+bool ReadHeaderPacket(const uint8_t* p, size_t n, OggStream* s, TagFacts* tags, PictureSink* pictures) {
     const uint32_t index = s->packets++;
     if (index == 0) {
         if (!Identify(p, n, s)) s->done = true;

@@ -7,6 +7,7 @@
 #include <vector>
 
 #include "core/facts.h"
+#include "ogg/vorbis_comment.h"
 
 namespace metainfo {
 
@@ -25,6 +26,6 @@ struct OggStream {
 // Reads the stream's next header packet into the stream (and its comments
 // into tags and pictures). False when the packet is not what the codec
 // requires there, which ends the stream's headers.
-bool ReadHeaderPacket(const uint8_t* p, size_t n, OggStream* s, TagFacts* tags, std::vector<PictureFacts>* pictures);
+bool ReadHeaderPacket(const uint8_t* p, size_t n, OggStream* s, TagFacts* tags, PictureSink* pictures);
 
 }  // namespace metainfo

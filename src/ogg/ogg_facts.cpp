@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <new>
+#include <utility>
 #include <vector>
 
 #include "core/file_access.h"
@@ -23,7 +24,7 @@ constexpr int kMaxIdlePages = 64;
 struct Walk {
     std::vector<OggStream> streams;
     TagFacts tags;
-    std::vector<PictureFacts> pictures;
+    PictureSink pictures;
     size_t headerBytes = 0;
 };
 
@@ -101,7 +102,7 @@ void FillFacts(int h, uint64_t fileSize, Walk* w, MediaFacts* facts) {
         facts->streams.push_back(s.facts);
     }
     facts->tags = w->tags;
-    facts->pictures = w->pictures;
+    facts->pictures = w->pictures.list;
     uint64_t granule = 0;
     if (timed != nullptr && FindLastGranule(h, fileSize, timed->serial, &granule) && granule < (uint64_t(1) << 62)) {
         const uint64_t samples = granule > timed->preSkip ? granule - timed->preSkip : 0;
@@ -126,6 +127,24 @@ int32_t ReadOgg(const char* path, MediaFacts* facts) {
 }
 
 }  // namespace
+
+bool OggPictureBytes(const char* path, uint32_t ordinal, std::vector<uint8_t>* bytes) {
+    try {
+        const int h = MEx_fopen(path, "rb");
+        if (h == 0) return false;
+        FileCloser closer(h);
+        uint64_t fileSize = 0;
+        if (!OpenedFileSize(h, path, &fileSize)) return false;
+        Walk w;
+        w.pictures.want = ordinal;
+        WalkHeaders(h, fileSize, &w);
+        if (ordinal >= w.pictures.list.size()) return false;
+        *bytes = std::move(w.pictures.bytes);
+        return true;
+    } catch (const std::bad_alloc&) {
+        return false;
+    }
+}
 
 bool LooksLikeOgg(const char* /*path*/, const uint8_t* head, size_t n) {
     OggPage page;

@@ -90,18 +90,23 @@ bool Assign(const std::string& key, const std::string& value, TagFacts* t) {
     return true;
 }
 
-void AddPicture(const std::string& base64, std::vector<PictureFacts>* pictures) {
+void AddPicture(const std::string& base64, PictureSink* pictures) {
     const std::vector<uint8_t> block = Base64Decode(base64);
     PictureFacts picture;
     size_t dataOffset = 0;
-    if (!ReadPictureBlock(block.data(), block.size(), &picture, &dataOffset)) return;
-    // Its bytes lie encoded in the file: there is no place to copy them from.
-    picture.offset = 0;
-    picture.viaContract = true;
-    pictures->push_back(picture);
+    if (ReadPictureBlock(block.data(), block.size(), &picture, &dataOffset)) {
+        pictures->Add(picture, block.data() + dataOffset);
+    }
 }
 
 }  // namespace
+
+void PictureSink::Add(PictureFacts picture, const uint8_t* data) {
+    picture.inOggHeaders = true;
+    picture.ordinal = static_cast<uint32_t>(list.size());
+    if (want == static_cast<int64_t>(list.size())) bytes.assign(data, data + picture.size);
+    list.push_back(picture);
+}
 
 bool ReadPictureBlock(const uint8_t* p, size_t n, PictureFacts* picture, size_t* dataOffset) {
     ByteReader r(p, n);
@@ -119,7 +124,7 @@ bool ReadPictureBlock(const uint8_t* p, size_t n, PictureFacts* picture, size_t*
     return true;
 }
 
-bool ReadVorbisComments(const uint8_t* p, size_t n, TagFacts* tags, std::vector<PictureFacts>* pictures) {
+bool ReadVorbisComments(const uint8_t* p, size_t n, TagFacts* tags, PictureSink* pictures) {
     ByteReader r(p, n);
     uint32_t vendorSize = 0, count = 0;
     if (!r.LE32(&vendorSize) || !r.Skip(vendorSize) || !r.LE32(&count)) return false;
