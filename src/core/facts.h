@@ -35,6 +35,11 @@ struct PictureFacts {
     bool unsynchronised = false;  // stored with ID3 unsynchronisation: storedSize bytes at offset
     uint64_t storedSize = 0;
     bool viaContract = false;  // no offset known: its bytes come through the MM_ meta query
+    // Inside Ogg header packets (base64 in a comment, or split over pages): no
+    // single offset holds the bytes, so the copy reads the headers again for
+    // the picture at this place among the file's pictures.
+    bool inOggHeaders = false;
+    uint32_t ordinal = 0;
 };
 
 struct TagFacts {

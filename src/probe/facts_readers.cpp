@@ -14,6 +14,7 @@
 #include "mp4/mp4_facts.h"
 #include "mp3/ape_facts.h"
 #include "mp3/id3_facts.h"
+#include "ogg/ogg_facts.h"
 #include "probe/contract_facts.h"
 #include "speech/amr.h"
 #include "speech/wave_facts.h"
@@ -81,6 +82,7 @@ const AccurateFormat kAccurateFormats[] = {
     {kAccurateMatroska, LooksLikeMatroska, MatroskaFacts},
     {kAccurateFlac, LooksLikeFlac, FlacFacts},
     {kAccurateAiff, LooksLikeAiff, AiffFacts},
+    {kAccurateOgg, LooksLikeOgg, OggFacts},
 };
 
 constexpr size_t kHeadBytes = 128;

@@ -9,6 +9,7 @@
 #include "core/unsync.h"
 #include "metainfo/metainfo.h"
 #include "metainfo/probe.h"
+#include "ogg/ogg_facts.h"
 
 namespace metainfo {
 namespace {
@@ -43,6 +44,13 @@ int CopyThroughMetaQuery(const char* path, int type, const PictureFacts& picture
     return result;
 }
 
+int CopyFromOggHeaders(const char* path, const PictureFacts& picture, unsigned char* out) {
+    std::vector<uint8_t> bytes;
+    if (!OggPictureBytes(path, picture.ordinal, &bytes) || bytes.size() != picture.size) return MI_E_DAMAGED;
+    if (!bytes.empty()) std::memcpy(out, bytes.data(), bytes.size());
+    return MI_OK;
+}
+
 int CopyFromFile(int fd, const PictureFacts& picture, unsigned char* out) {
     if (!picture.unsynchronised) return ReadWhole(fd, picture.offset, out, picture.size) ? MI_OK : MI_E_IO;
     if (picture.storedSize > 0x7FFFFFFFu) return MI_E_DAMAGED;
@@ -73,7 +81,9 @@ int CopyPicture(const char* path, int type, const FileStamp& stamp, const Pictur
     int result = MI_E_IO;
     if (::fstat(fd, &st) == 0 && SameStamp(StampOf(st), stamp)) {
         const uint64_t stored = picture.unsynchronised ? picture.storedSize : picture.size;
-        if (picture.viaContract) {
+        if (picture.inOggHeaders) {
+            result = CopyFromOggHeaders(path, picture, out);
+        } else if (picture.viaContract) {
             result = CopyThroughMetaQuery(path, type, picture, out);
         } else if (picture.offset > stamp.size || stored > stamp.size - picture.offset) {
             result = MI_E_DAMAGED;

@@ -1,0 +1,162 @@
+#include "ogg/ogg_facts.h"
+
+#include <algorithm>
+#include <new>
+#include <utility>
+#include <vector>
+
+#include "core/file_access.h"
+#include "metainfo/metainfo.h"
+#include "ogg/ogg_codecs.h"
+#include "ogg/ogg_last_granule.h"
+#include "ogg/ogg_page.h"
+
+namespace metainfo {
+namespace {
+
+// Header packets larger than this (pictures in comments) end the walk.
+constexpr size_t kMaxHeaderBytes = 64u << 20;
+constexpr size_t kMaxStreams = 16;
+// Pages in a row that carry no header bytes before the walk gives up on a
+// stream whose headers never come.
+constexpr int kMaxIdlePages = 64;
+
+struct Walk {
+    std::vector<OggStream> streams;
+    TagFacts tags;
+    PictureSink pictures;
+    size_t headerBytes = 0;
+};
+
+OggStream* StreamOf(Walk* w, uint32_t serial) {
+    for (OggStream& s : w->streams) {
+        if (s.serial == serial) return &s;
+    }
+    return nullptr;
+}
+
+bool AllDone(const Walk& w) {
+    for (const OggStream& s : w.streams) {
+        if (!s.done) return false;
+    }
+    return true;
+}
+
+// Splits the page's body into packets of its stream by the lacing values; a
+// packet that runs on past the page waits in the stream's partial bytes.
+void TakePackets(const OggPage& page, const uint8_t* body, OggStream* s, Walk* w) {
+    if ((page.flags & 1) == 0) s->partial.clear();
+    size_t at = 0;
+    for (size_t i = 0; i < page.segmentCount && !s->done; ++i) {
+        const size_t lace = page.lacing[i];
+        s->partial.insert(s->partial.end(), body + at, body + at + lace);
+        at += lace;
+        w->headerBytes += lace;
+        if (lace == 255) continue;
+        ReadHeaderPacket(s->partial.data(), s->partial.size(), s, &w->tags, &w->pictures);
+        s->partial.clear();
+    }
+    if (s->done) s->partial = std::vector<uint8_t>();
+}
+
+// Reads pages from the start until every stream's headers are in.
+void WalkHeaders(int h, uint64_t fileSize, Walk* w) {
+    std::vector<uint8_t> page(kOggMaxPage);
+    uint64_t pos = 0;
+    bool pastFirstPages = false;
+    int idle = 0;
+    while (pos < fileSize && w->headerBytes <= kMaxHeaderBytes) {
+        // The header and segment table first, so that only the page's own bytes are read.
+        const size_t got = ReadAt(h, pos, page.data(), kOggHeaderSize + 255);
+        OggPage p;
+        if (!ParseOggPage(page.data(), got, &p)) return;
+        const size_t rest = p.headerSize + p.bodySize - std::min(got, p.headerSize + p.bodySize);
+        if (rest > 0 && ReadAt(h, pos + got, page.data() + got, rest) != rest) return;
+        pos += p.headerSize + p.bodySize;
+        OggStream* s = StreamOf(w, p.serial);
+        if ((p.flags & 2) != 0 && s == nullptr && !pastFirstPages && w->streams.size() < kMaxStreams) {
+            w->streams.emplace_back();
+            s = &w->streams.back();
+            s->serial = p.serial;
+        } else if ((p.flags & 2) == 0) {
+            pastFirstPages = true;
+        }
+        if (s != nullptr && !s->done) {
+            TakePackets(p, page.data() + p.headerSize, s, w);
+            idle = 0;
+        } else if (++idle > kMaxIdlePages) {
+            return;
+        }
+        if (pastFirstPages && AllDone(*w)) return;
+    }
+}
+
+void FillFacts(int h, uint64_t fileSize, Walk* w, MediaFacts* facts) {
+    facts->format = "ogg";
+    facts->mime = "audio/ogg";
+    const OggStream* timed = nullptr;
+    for (OggStream& s : w->streams) {
+        if (s.codec == OggStream::kUnknown) continue;
+        if (s.facts.kind == StreamFacts::kVideo) facts->mime = "video/ogg";
+        if (timed == nullptr && s.granuleRate != 0) timed = &s;
+        facts->streams.push_back(s.facts);
+    }
+    facts->tags = w->tags;
+    facts->pictures = w->pictures.list;
+    uint64_t granule = 0;
+    if (timed != nullptr && FindLastGranule(h, fileSize, timed->serial, &granule) && granule < (uint64_t(1) << 62)) {
+        const uint64_t samples = granule > timed->preSkip ? granule - timed->preSkip : 0;
+        facts->durationUs = static_cast<int64_t>(static_cast<long double>(samples) * 1e6L / timed->granuleRate + 0.5L);
+        facts->durationExact = true;
+    }
+}
+
+int32_t ReadOgg(const char* path, MediaFacts* facts) {
+    const int h = MEx_fopen(path, "rb");
+    if (h == 0) return MM_E_FAIL;
+    FileCloser closer(h);
+    uint64_t fileSize = 0;
+    if (!OpenedFileSize(h, path, &fileSize)) return MM_E_FAIL;
+    Walk w;
+    WalkHeaders(h, fileSize, &w);
+    bool any = false;
+    for (const OggStream& s : w.streams) any = any || s.codec != OggStream::kUnknown;
+    if (!any) return MM_E_FAIL;
+    FillFacts(h, fileSize, &w, facts);
+    return MM_OK;
+}
+
+}  // namespace
+
+bool OggPictureBytes(const char* path, uint32_t ordinal, std::vector<uint8_t>* bytes) {
+    try {
+        const int h = MEx_fopen(path, "rb");
+        if (h == 0) return false;
+        FileCloser closer(h);
+        uint64_t fileSize = 0;
+        if (!OpenedFileSize(h, path, &fileSize)) return false;
+        Walk w;
+        w.pictures.want = ordinal;
+        WalkHeaders(h, fileSize, &w);
+        if (ordinal >= w.pictures.list.size()) return false;
+        *bytes = std::move(w.pictures.bytes);
+        return true;
+    } catch (const std::bad_alloc&) {
+        return false;
+    }
+}
+
+bool LooksLikeOgg(const char* /*path*/, const uint8_t* head, size_t n) {
+    OggPage page;
+    return ParseOggPage(head, n, &page) && (page.flags & 2) != 0;
+}
+
+int32_t OggFacts(const char* path, int /*type*/, MediaFacts* facts) {
+    try {
+        return ReadOgg(path, facts);
+    } catch (const std::bad_alloc&) {
+        return MM_E_OUTOFMEMORY;
+    }
+}
+
+}  // namespace metainfo
