@@ -9,6 +9,7 @@
 #include "metainfo/metainfo.h"
 #include "metainfo/probe.h"
 #include "support/bytes.h"
+#include "support/flac_builder.h"
 #include "support/ogg_builder.h"
 
 using namespace testing_support;
@@ -17,9 +18,6 @@ namespace {
 
 Bytes Prefixed(const std::string& prefix, const Bytes& body) { return Bytes().str(prefix).raw(body); }
 Bytes Audio(size_t n) { return Bytes().fill(n, 0x55); }
-Bytes FlacBlock(uint8_t header, const Bytes& body) {
-    return Bytes().u8(header).be24(static_cast<uint32_t>(body.size())).raw(body);
-}
 
 const std::vector<std::string> kTags = {"TITLE=T",     "ARTIST=Ar",       "album=Al",         "ALBUMARTIST=AA",
                                         "GENRE=Rock",  "DATE=2019-02-03", "TRACKNUMBER=3/11", "DISCNUMBER=1",
@@ -28,7 +26,7 @@ const std::string kTagSummary = " | T;Ar;Al;AA;Rock;2019-02-03;2019;3/11;1/2;D;C
 
 Bytes Vorbis(size_t segmentsPerPage, const std::vector<std::string>& tags, uint64_t granule) {
     return OggStreamPages(7,
-                          {VorbisIdPacket(2, 44100, 128000), Prefixed("\x03vorbis", VorbisCommentBody(tags)),
+                          {VorbisIdPacket(2, 44100, 128000), Prefixed("\x03vorbis", VorbisComments(tags)),
                            Prefixed("\x05vorbis", Audio(40)), Audio(300), Audio(20)},
                           segmentsPerPage, granule);
 }
@@ -73,18 +71,18 @@ TEST(AccurateOgg, FactsOfBuiltPages) {
         {"comment packet over pages of two segments", Vorbis(2, {"TITLE=" + std::string(700, 'x')}, 44100),
          "ogg audio/ogg 1000 | vorbis 44100x2x0 128000 | " + std::string(700, 'x') + ";;;;;;0;0/0;0/0;;"},
         {"opus: the pre-skip comes off the last granule",
-         OggStreamPages(9, {OpusHeadPacket(2, 312, 44100), Prefixed("OpusTags", VorbisCommentBody(kTags)), Audio(90)},
-                        255, 96312),
+         OggStreamPages(9, {OpusHeadPacket(2, 312, 44100), Prefixed("OpusTags", VorbisComments(kTags)), Audio(90)}, 255,
+                        96312),
          "ogg audio/ogg 2000 | opus 48000x2x0 0" + kTagSummary},
         {"opus with a picture in its comments",
          OggStreamPages(9,
                         {OpusHeadPacket(1, 0, 48000),
-                         Prefixed("OpusTags", VorbisCommentBody({"TITLE=P", "METADATA_BLOCK_PICTURE=" + picture}))},
+                         Prefixed("OpusTags", VorbisComments({"TITLE=P", "METADATA_BLOCK_PICTURE=" + picture}))},
                         255, 24000),
          "ogg audio/ogg 500 | opus 48000x1x0 0 | P;;;;;;0;0/0;0/0;; | image/png 3 front 6"},
         {"flac mapping, then its comment block",
          OggStreamPages(
-             3, {FlacMappingPacket(32000, 1, 24), FlacBlock(0x84, VorbisCommentBody(kTags)), Bytes{0xFF, 0xF8, 0}}, 255,
+             3, {FlacMappingPacket(32000, 1, 24), FlacBlock(4, VorbisComments(kTags), true), Bytes{0xFF, 0xF8, 0}}, 255,
              48000),
          "ogg audio/ogg 1500 | flac 32000x1x24 0" + kTagSummary},
         {"a last page cut short: the page before it counts", truncated,
@@ -105,7 +103,7 @@ TEST(AccurateOgg, FactsOfBuiltPages) {
 TEST(AccurateOgg, PictureCopiedFromComments) {
     std::vector<uint8_t> png(600, 0x42);
     png[0] = 0x89;
-    const Bytes comments = VorbisCommentBody({"METADATA_BLOCK_PICTURE=" + Base64Picture(3, "image/png", "", png)});
+    const Bytes comments = VorbisComments({"METADATA_BLOCK_PICTURE=" + Base64Picture(3, "image/png", "", png)});
     TempDir dir;
     const std::string path = dir.Write(
         "f.opus", OggStreamPages(9, {OpusHeadPacket(1, 0, 48000), Prefixed("OpusTags", comments)}, 1, 0).data());

@@ -28,13 +28,6 @@ struct Aiff {
     uint64_t id3Offset = 0;  // of an "ID3 " chunk's tag; 0 when none
 };
 
-bool ReadAt(int h, uint64_t at, size_t want, std::vector<uint8_t>* out) {
-    out->resize(want);
-    if (!SeekToOffset(h, at)) return false;
-    const int got = want == 0 ? 0 : MEx_fread(out->data(), 1, static_cast<unsigned>(want), h);
-    return got >= 0 && static_cast<size_t>(got) == want;
-}
-
 // The 80-bit extended float of the sample rate: sign and 15-bit exponent,
 // then a 64-bit mantissa with its integer bit stated.
 double Extended(const uint8_t* p) {
@@ -70,19 +63,21 @@ bool IsText(const char* id) {
 void WalkChunks(int h, uint64_t end, Aiff* a, TagFacts* t) {
     uint64_t at = 12;
     std::vector<uint8_t> b;
-    for (int i = 0; i < kMaxChunks && at + 8 <= end && ReadAt(h, at, 8, &b); ++i) {
+    for (int i = 0; i < kMaxChunks && at + 8 <= end && ReadExactAt(h, at, 8, &b); ++i) {
         char id[4];
         std::memcpy(id, b.data(), 4);
         const uint64_t size = ReadBE32(b.data() + 4);
         const uint64_t body = at + 8;
         const uint64_t inFile = size < end - body ? size : end - body;
         if (std::memcmp(id, "COMM", 4) == 0 && !a->haveComm) {
-            if (ReadAt(h, body, inFile < kCommBytes ? static_cast<size_t>(inFile) : kCommBytes, &b)) ReadComm(b, a);
+            if (ReadExactAt(h, body, inFile < kCommBytes ? static_cast<size_t>(inFile) : kCommBytes, &b))
+                ReadComm(b, a);
         } else if (std::memcmp(id, "SSND", 4) == 0) {
             a->haveData = true;
         } else if ((std::memcmp(id, "ID3 ", 4) == 0 || std::memcmp(id, "id3 ", 4) == 0) && a->id3Offset == 0) {
             a->id3Offset = body;
-        } else if (IsText(id) && size <= kMaxText && size == inFile && ReadAt(h, body, static_cast<size_t>(size), &b)) {
+        } else if (IsText(id) && size <= kMaxText && size == inFile &&
+                   ReadExactAt(h, body, static_cast<size_t>(size), &b)) {
             ReadText(id, b, t);
         }
         if (size > end - body) break;
@@ -151,7 +146,7 @@ int32_t AiffFacts(const char* path, int /*type*/, MediaFacts* f) {
         FileCloser closer(h);
         uint64_t size = 0;
         std::vector<uint8_t> b;
-        if (!OpenedFileSize(h, path, &size) || !ReadAt(h, 0, 12, &b) || !LooksLikeAiff(path, b.data(), b.size()))
+        if (!OpenedFileSize(h, path, &size) || !ReadExactAt(h, 0, 12, &b) || !LooksLikeAiff(path, b.data(), b.size()))
             return MM_E_FAIL;
         a.aifc = BytesEqual(b.data() + 8, "AIFC", 4);
         // The FORM size bounds the walk; a short file ends it sooner.

@@ -4,6 +4,7 @@
 #include <unistd.h>
 
 #include <atomic>
+#include <climits>
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
@@ -394,6 +395,17 @@ bool HandleIdentity(int h, FileIdentity* id) {
 
 bool SeekToOffset(int h, uint64_t pos) {
     return pos <= static_cast<uint64_t>(INT64_MAX) && MEx_fseek(h, static_cast<int64_t>(pos), SEEK_SET) == 0;
+}
+
+size_t ReadSomeAt(int h, uint64_t pos, uint8_t* out, size_t n) {
+    if (n == 0 || n > UINT_MAX || !SeekToOffset(h, pos)) return 0;
+    const int got = MEx_fread(out, 1, static_cast<unsigned>(n), h);
+    return got > 0 ? static_cast<size_t>(got) : 0;
+}
+
+bool ReadExactAt(int h, uint64_t pos, size_t n, std::vector<uint8_t>* out) {
+    out->resize(n);
+    return n == 0 ? SeekToOffset(h, pos) : ReadSomeAt(h, pos, out->data(), n) == n;
 }
 
 bool MEx_fsize(const char* path, uint64_t* size) {

@@ -8,7 +8,9 @@
 
 #include <sys/stat.h>
 
+#include <cstddef>
 #include <cstdint>
+#include <vector>
 
 namespace metainfo {
 
@@ -38,6 +40,14 @@ bool HandleIdentity(int h, FileIdentity* id);
 // Moves to an absolute offset; false when it cannot be a file position or
 // the seek fails.
 bool SeekToOffset(int h, uint64_t pos);
+
+// Reads up to n bytes at an absolute offset into out; how many it read (0 on
+// a failed seek or read).
+size_t ReadSomeAt(int h, uint64_t pos, uint8_t* out, size_t n);
+
+// Reads exactly n bytes at an absolute offset into out (resized to n); false
+// when fewer are there.
+bool ReadExactAt(int h, uint64_t pos, size_t n, std::vector<uint8_t>* out);
 
 // Size in bytes of the file at path, as MEx_stat reports it; false when the
 // path cannot be looked at.

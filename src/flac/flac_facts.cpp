@@ -16,20 +16,13 @@ namespace {
 constexpr int kMaxId3Tags = 16;
 constexpr int kMaxBlocks = 1024;
 constexpr uint8_t kStreamInfo = 0, kVorbisComment = 4, kPicture = 6;
-constexpr size_t kPictureHead = 32;  // type, MIME, description, four numbers, size: their fixed part
-
-bool ReadAt(int h, uint64_t at, size_t want, std::vector<uint8_t>* out) {
-    out->resize(want);
-    if (!SeekToOffset(h, at)) return false;
-    const int got = want == 0 ? 0 : MEx_fread(out->data(), 1, static_cast<unsigned>(want), h);
-    return got >= 0 && static_cast<size_t>(got) == want;
-}
+constexpr uint64_t kPictureHeadRead = 4096;
 
 // Where the stream starts: after the ID3v2 tags some writers put first.
 uint64_t SkipId3Tags(int h, uint64_t fileSize) {
     uint64_t at = 0;
     std::vector<uint8_t> b;
-    for (int i = 0; i < kMaxId3Tags && at + 10 <= fileSize && ReadAt(h, at, 10, &b); ++i) {
+    for (int i = 0; i < kMaxId3Tags && at + 10 <= fileSize && ReadExactAt(h, at, 10, &b); ++i) {
         if (!BytesEqual(b.data(), "ID3", 3)) break;
         at += 10 + uint64_t{ReadSyncsafe32(b.data() + 6) & 0x0FFFFFFFu} + ((b[5] & 0x10) != 0 ? 10 : 0);
     }
@@ -55,23 +48,20 @@ void ReadStreamInfo(const std::vector<uint8_t>& b, Flac* f) {
     f->haveInfo = true;
 }
 
-// A PICTURE block's header; its image bytes stay in the file.
+// A PICTURE block's header; its image bytes stay in the file. Headers are
+// small: the block is read whole only when its description runs past 4 KiB.
 bool ReadPicture(int h, uint64_t body, uint64_t size, std::vector<PictureFacts>* pictures) {
     std::vector<uint8_t> b;
-    if (size < kPictureHead || !ReadAt(h, body, 8, &b)) return true;
     PictureFacts p;
-    p.type = static_cast<int32_t>(ReadBE32(b.data()));
-    const uint64_t mimeLen = ReadBE32(b.data() + 4);
-    if (mimeLen > size - kPictureHead || !ReadAt(h, body + 8, static_cast<size_t>(mimeLen) + 4, &b)) return true;
-    p.mime = TrimText(Latin1ToUtf8(b.data(), static_cast<size_t>(mimeLen)));
-    const uint64_t descLen = ReadBE32(b.data() + mimeLen);
-    const uint64_t descAt = body + 12 + mimeLen;
-    if (descLen > size - kPictureHead - mimeLen || !ReadAt(h, descAt, static_cast<size_t>(descLen) + 20, &b))
-        return true;
-    p.description = TrimText(Utf8ToUtf8(b.data(), static_cast<size_t>(descLen)));
-    p.size = ReadBE32(b.data() + descLen + 16);
-    p.offset = descAt + descLen + 20;
-    if (p.size > body + size - p.offset) return true;
+    size_t dataAt = 0;
+    const size_t head = static_cast<size_t>(size < kPictureHeadRead ? size : kPictureHeadRead);
+    if (!ReadExactAt(h, body, head, &b)) return true;
+    if (!ReadPictureHead(b.data(), b.size(), &p, &dataAt)) {
+        if (head == size || !ReadExactAt(h, body, static_cast<size_t>(size), &b)) return true;
+        if (!ReadPictureHead(b.data(), b.size(), &p, &dataAt)) return true;
+    }
+    if (p.size > size - dataAt) return true;
+    p.offset = body + dataAt;
     try {
         pictures->push_back(p);
     } catch (const std::bad_alloc&) {
@@ -84,15 +74,15 @@ bool ReadPicture(int h, uint64_t body, uint64_t size, std::vector<PictureFacts>*
 // has no STREAMINFO or memory runs out.
 bool WalkBlocks(int h, uint64_t at, uint64_t fileSize, Flac* f, MediaFacts* facts, bool* oom) {
     std::vector<uint8_t> b;
-    for (int i = 0; i < kMaxBlocks && at + 4 <= fileSize && ReadAt(h, at, 4, &b); ++i) {
+    for (int i = 0; i < kMaxBlocks && at + 4 <= fileSize && ReadExactAt(h, at, 4, &b); ++i) {
         const bool last = (b[0] & 0x80) != 0;
         const uint8_t type = b[0] & 0x7F;
         const uint64_t size = ReadBE32(b.data()) & 0xFFFFFFu;
         const uint64_t body = at + 4;
         if (size > fileSize - body) return false;
-        if (type == kStreamInfo && ReadAt(h, body, size < 34 ? static_cast<size_t>(size) : 34, &b)) {
+        if (type == kStreamInfo && ReadExactAt(h, body, size < 34 ? static_cast<size_t>(size) : 34, &b)) {
             ReadStreamInfo(b, f);
-        } else if (type == kVorbisComment && ReadAt(h, body, static_cast<size_t>(size), &b)) {
+        } else if (type == kVorbisComment && ReadExactAt(h, body, static_cast<size_t>(size), &b)) {
             ReadVorbisComments(b.data(), b.size(), &facts->tags);
         } else if (type == kPicture && !ReadPicture(h, body, size, &facts->pictures)) {
             *oom = true;
@@ -117,7 +107,7 @@ bool LooksLikeFlac(const char* path, const uint8_t* head, size_t n) {
     std::vector<uint8_t> b;
     if (!OpenedFileSize(h, path, &size)) return false;
     const uint64_t at = SkipId3Tags(h, size);
-    return at + 4 <= size && ReadAt(h, at, 4, &b) && BytesEqual(b.data(), "fLaC", 4);
+    return at + 4 <= size && ReadExactAt(h, at, 4, &b) && BytesEqual(b.data(), "fLaC", 4);
 }
 
 int32_t FlacFacts(const char* path, int /*type*/, MediaFacts* facts) {
@@ -128,7 +118,7 @@ int32_t FlacFacts(const char* path, int /*type*/, MediaFacts* facts) {
     std::vector<uint8_t> b;
     if (!OpenedFileSize(h, path, &size)) return MM_E_FAIL;
     const uint64_t start = SkipId3Tags(h, size);
-    if (start + 4 > size || !ReadAt(h, start, 4, &b) || !BytesEqual(b.data(), "fLaC", 4)) return MM_E_FAIL;
+    if (start + 4 > size || !ReadExactAt(h, start, 4, &b) || !BytesEqual(b.data(), "fLaC", 4)) return MM_E_FAIL;
     Flac f;
     bool oom = false;
     try {

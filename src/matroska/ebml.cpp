@@ -81,11 +81,11 @@ bool EbmlFloat(const uint8_t* p, uint64_t n, double* v) {
 std::string EbmlText(const uint8_t* p, uint64_t n) { return TrimText(Utf8ToUtf8(p, static_cast<size_t>(n))); }
 
 bool EbmlHeaderAt(int h, uint64_t pos, uint64_t end, EbmlElement* e) {
-    if (pos >= end || !SeekToOffset(h, pos)) return false;
+    if (pos >= end) return false;
     uint8_t head[kEbmlMaxHeader];
     const uint64_t want = end - pos < kEbmlMaxHeader ? end - pos : kEbmlMaxHeader;
-    const int got = MEx_fread(head, 1, static_cast<unsigned>(want), h);
-    if (got <= 0 || !ParseEbmlHeader(head, static_cast<size_t>(got), e)) return false;
+    const size_t got = ReadSomeAt(h, pos, head, static_cast<size_t>(want));
+    if (got == 0 || !ParseEbmlHeader(head, got, e)) return false;
     if (e->headerSize > end - pos) return false;
     const uint64_t room = end - pos - e->headerSize;
     if (e->unknownSize) e->size = room;
@@ -96,8 +96,7 @@ bool EbmlReadBody(int h, uint64_t pos, uint64_t size, uint64_t cap, std::vector<
     const uint64_t want = size < cap ? size : cap;
     if (!SeekToOffset(h, pos)) return false;
     out->resize(static_cast<size_t>(want));
-    const int got = want == 0 ? 0 : MEx_fread(out->data(), 1, static_cast<unsigned>(want), h);
-    out->resize(got > 0 ? static_cast<size_t>(got) : 0);
+    out->resize(ReadSomeAt(h, pos, out->data(), out->size()));
     return true;
 }
 

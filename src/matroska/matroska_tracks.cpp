@@ -9,6 +9,7 @@
 #include "matroska/ebml.h"
 #include "matroska/matroska_internal.h"
 #include "metainfo/metainfo.h"
+#include "mp4/codec_records.h"
 #include "mp4/mp4_internal.h"
 
 namespace metainfo {
@@ -76,37 +77,6 @@ std::string CodecFor(const TrackEntry& t) {
     return std::string();
 }
 
-const char* H264Profile(uint8_t idc, uint8_t constraints) {
-    const bool set1 = (constraints & 0x40) != 0, set3 = (constraints & 0x10) != 0;
-    switch (idc) {
-        case 66: return set1 ? "Constrained Baseline" : "Baseline";
-        case 77: return "Main";
-        case 88: return "Extended";
-        case 100: return "High";
-        case 110: return set3 ? "High 10 Intra" : "High 10";
-        case 122: return set3 ? "High 4:2:2 Intra" : "High 4:2:2";
-        case 244: return set3 ? "High 4:4:4 Intra" : "High 4:4:4 Predictive";
-        default: return nullptr;
-    }
-}
-
-const char* const kMpeg4Profiles[16] = {"Simple Profile",
-                                        "Simple Scalable Profile",
-                                        "Core Profile",
-                                        "Main Profile",
-                                        "N-bit Profile",
-                                        "Scalable Texture Profile",
-                                        "Simple Face Animation Profile",
-                                        "Basic Animated Texture Profile",
-                                        "Hybrid Profile",
-                                        "Advanced Real Time Simple Profile",
-                                        "Core Scalable Profile",
-                                        "Advanced Coding Efficiency Profile",
-                                        "Advanced Core Profile",
-                                        "Advanced Scalable Texture Profile",
-                                        "Simple Studio Profile",
-                                        "Advanced Simple Profile"};
-
 // VP9's CodecPrivate: one-byte ID, one-byte length, value; ID 1 the profile.
 void Vp9Profile(const uint8_t* p, size_t n, StreamFacts* s) {
     for (size_t at = 0; at + 2 <= n && p[at + 1] <= n - at - 2; at += 2 + size_t{p[at + 1]}) {
@@ -117,26 +87,18 @@ void Vp9Profile(const uint8_t* p, size_t n, StreamFacts* s) {
 // avcC, hvcC and av1C records, as Matroska keeps them in CodecPrivate; for
 // MPEG-4 Visual, the headers that start its stream.
 void VideoProfile(const TrackEntry& t, StreamFacts* s) {
-    static const char* const kHevc[5] = {nullptr, "Main", "Main 10", "Main Still Picture", "Rext"};
-    static const char* const kAv1[3] = {"Main", "High", "Professional"};
     const uint8_t* p = t.priv;
     const size_t n = t.privSize;
-    if (s->codec == "h264" && n >= 4) {
-        const char* profile = H264Profile(p[1], p[2]);
-        if (profile != nullptr) s->profile = profile;
-        s->level = p[3];
-    } else if (s->codec == "hevc" && n >= 13) {
-        const uint8_t idc = p[1] & 0x1F;
-        if (idc < 5 && kHevc[idc] != nullptr) s->profile = kHevc[idc];
-        s->level = p[12];
-    } else if (s->codec == "av1" && n >= 2) {
-        if ((p[1] >> 5) < 3) s->profile = kAv1[p[1] >> 5];
-        s->level = p[1] & 0x1F;
+    if (s->codec == "h264") {
+        AvcRecordFacts(p, n, s);
+    } else if (s->codec == "hevc") {
+        HevcRecordFacts(p, n, s);
+    } else if (s->codec == "av1") {
+        Av1RecordFacts(p, n, s);
     } else if (s->codec == "vp9") {
         Vp9Profile(p, n, s);
-    } else if (s->codec == "mpeg4" && n >= 5 && p[0] == 0 && p[1] == 0 && p[2] == 1 && p[3] == 0xB0) {
-        s->profile = kMpeg4Profiles[p[4] >> 4];
-        s->level = p[4] & 0x0F;
+    } else if (s->codec == "mpeg4") {
+        Mpeg4VisualFacts(p, n, s);
     }
 }
 
@@ -148,14 +110,7 @@ void AacProfile(const TrackEntry& t, StreamFacts* s) {
     mp4AudioSpecificConfig asc;
     std::memset(&asc, 0, sizeof asc);
     if (AudioSpecificConfig(bits, &asc, kAccurate) != MM_OK && asc.samplingFrequency == 0) return;
-    const char* profile = asc.audioObjectType == 1   ? "Main"
-                          : asc.audioObjectType == 2 ? "LC"
-                          : asc.audioObjectType == 3 ? "SSR"
-                          : asc.audioObjectType == 4 ? "LTP"
-                          : asc.audioObjectType == 5 ? "LC"
-                                                     : nullptr;
-    if (asc.sbrPresentFlag == 1) profile = "HE-AAC";
-    if (asc.psPresentFlag == 1) profile = "HE-AACv2";
+    const char* profile = AacProfileName(asc);
     if (profile != nullptr) s->profile = profile;
 }
 

@@ -20,13 +20,6 @@ constexpr uint64_t kMaxTag = uint64_t{16} << 20;  // items read whole; pictures 
 constexpr uint32_t kMaxItems = 65536;
 constexpr uint32_t kBinary = 1;
 
-bool ReadAt(int h, uint64_t at, size_t want, std::vector<uint8_t>* out) {
-    out->resize(want);
-    if (!SeekToOffset(h, at)) return false;
-    const int got = want == 0 ? 0 : MEx_fread(out->data(), 1, static_cast<unsigned>(want), h);
-    return got >= 0 && static_cast<size_t>(got) == want;
-}
-
 std::string Lower(std::string s) {
     std::transform(s.begin(), s.end(), s.begin(), [](char c) { return static_cast<char>(std::tolower(c & 0xFF)); });
     return s;
@@ -117,7 +110,7 @@ void ReadItems(const std::vector<uint8_t>& b, uint32_t count, uint64_t base, Tag
 bool FindTag(int h, uint64_t fileSize, uint64_t* itemsAt, uint64_t* itemsSize, uint32_t* count) {
     std::vector<uint8_t> b;
     for (uint64_t back : {uint64_t{0}, kId3v1}) {
-        if (fileSize < back + kFooter || !ReadAt(h, fileSize - back - kFooter, kFooter, &b)) continue;
+        if (fileSize < back + kFooter || !ReadExactAt(h, fileSize - back - kFooter, kFooter, &b)) continue;
         if (!BytesEqual(b.data(), "APETAGEX", 8)) continue;
         const uint64_t size = ReadLE32(b.data() + 12);  // items and footer
         const uint64_t footerAt = fileSize - back - kFooter;
@@ -141,7 +134,7 @@ bool ReadApeFacts(const char* path, TagFacts* tags, std::vector<PictureFacts>* p
     if (!OpenedFileSize(h, path, &size) || !FindTag(h, size, &itemsAt, &itemsSize, &count)) return true;
     try {
         std::vector<uint8_t> b;
-        if (!ReadAt(h, itemsAt, static_cast<size_t>(itemsSize), &b)) return true;
+        if (!ReadExactAt(h, itemsAt, static_cast<size_t>(itemsSize), &b)) return true;
         ReadItems(b, count, itemsAt, tags, pictures);
     } catch (const std::bad_alloc&) {
         return false;

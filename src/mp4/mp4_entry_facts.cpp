@@ -5,6 +5,7 @@
 #include <cstring>
 
 #include "core/byte_reader.h"
+#include "mp4/codec_records.h"
 #include "mp4/mp4_internal.h"
 #include "mp4/mp4_truth.h"
 
@@ -76,25 +77,6 @@ constexpr Named kObjectTypes[] = {
     {0xAD, "opus"},       {0xDD, "vorbis"},     {0xE1, "qcelp"},
 };
 
-constexpr Named kAacProfiles[] = {{1, "Main"}, {2, "LC"}, {3, "SSR"}, {4, "LTP"}, {23, "LD"}, {39, "ELD"}};
-
-const char* const kMpeg4Profiles[16] = {"Simple Profile",
-                                        "Simple Scalable Profile",
-                                        "Core Profile",
-                                        "Main Profile",
-                                        "N-bit Profile",
-                                        "Scalable Texture Profile",
-                                        "Simple Face Animation Profile",
-                                        "Basic Animated Texture Profile",
-                                        "Hybrid Profile",
-                                        "Advanced Real Time Simple Profile",
-                                        "Core Scalable Profile",
-                                        "Advanced Coding Efficiency Profile",
-                                        "Advanced Core Profile",
-                                        "Advanced Scalable Texture Profile",
-                                        "Simple Studio Profile",
-                                        "Advanced Simple Profile"};
-
 const uint32_t kAacChannels[8] = {0, 1, 2, 3, 4, 5, 6, 8};
 
 void AacFacts(const EsdsFields& esds, StreamFacts* s) {
@@ -107,14 +89,8 @@ void AacFacts(const EsdsFields& esds, StreamFacts* s) {
     // configuration's own rate is what it states.
     s->sampleRate = asc.implicitSbr != 0 ? asc.samplingFrequency / 2 : asc.samplingFrequency;
     if (asc.channelConfiguration != 0) s->channels = kAacChannels[asc.channelConfiguration];
-    // An extension that signals no SBR leaves object type 5 over an LC core.
-    const char* profile = Lookup(kAacProfiles, sizeof kAacProfiles / sizeof *kAacProfiles, asc.audioObjectType);
-    if (asc.audioObjectType == 5) profile = "LC";
-    if (asc.sbrPresentFlag == 1) profile = "HE-AAC";
-    if (asc.psPresentFlag == 1) {
-        profile = "HE-AACv2";
-        s->channels = 2;  // parametric stereo decodes to two channels
-    }
+    if (asc.psPresentFlag == 1) s->channels = 2;  // parametric stereo decodes to two channels
+    const char* profile = AacProfileName(asc);
     if (profile != nullptr) s->profile = profile;
 }
 
@@ -125,47 +101,17 @@ void EsdsFacts(const View& esdsBox, StreamFacts* s, uint64_t* declared) {
     if (codec != nullptr) s->codec = codec;
     *declared = esds.avgBitrate;
     if (s->codec == "aac") AacFacts(esds, s);
-    // A visual object sequence start code carries the profile and level.
-    if (s->codec == "mpeg4" && esds.dsi != nullptr && esds.dsiAvail >= 5 && ReadBE32(esds.dsi) == 0x1B0) {
-        s->profile = kMpeg4Profiles[esds.dsi[4] >> 4];
-        s->level = esds.dsi[4] & 0x0F;
-    }
+    if (s->codec == "mpeg4" && esds.dsi != nullptr) Mpeg4VisualFacts(esds.dsi, esds.dsiAvail, s);
 }
-
-const char* H264Profile(uint8_t idc, uint8_t constraints) {
-    const bool set1 = (constraints & 0x40) != 0, set3 = (constraints & 0x10) != 0;
-    switch (idc) {
-        case 66: return set1 ? "Constrained Baseline" : "Baseline";
-        case 77: return "Main";
-        case 88: return "Extended";
-        case 100: return "High";
-        case 110: return set3 ? "High 10 Intra" : "High 10";
-        case 122: return set3 ? "High 4:2:2 Intra" : "High 4:2:2";
-        case 244: return set3 ? "High 4:4:4 Intra" : "High 4:4:4 Predictive";
-        case 44: return "CAVLC 4:4:4";
-        case 118: return "Multiview High";
-        case 128: return "Stereo High";
-        default: return nullptr;
-    }
-}
-
-const char* const kHevcProfiles[5] = {nullptr, "Main", "Main 10", "Main Still Picture", "Rext"};
-const char* const kAv1Profiles[3] = {"Main", "High", "Professional"};
 
 void VideoCodecBox(const View& v, uint64_t children, StreamFacts* s, uint64_t* declared) {
     View box{nullptr, 0};
-    if (FindChild(v, children, FourCC("avcC"), &box) && box.Has(0, 4)) {
-        const char* profile = H264Profile(box.U8(1), box.U8(2));
-        if (profile != nullptr) s->profile = profile;
-        s->level = box.U8(3);
-    } else if (FindChild(v, children, FourCC("hvcC"), &box) && box.Has(0, 13)) {
-        const uint8_t idc = box.U8(1) & 0x1F;
-        if (idc < 5 && kHevcProfiles[idc] != nullptr) s->profile = kHevcProfiles[idc];
-        s->level = box.U8(12);
-    } else if (FindChild(v, children, FourCC("av1C"), &box) && box.Has(0, 2)) {
-        const uint8_t profile = box.U8(1) >> 5;
-        if (profile < 3) s->profile = kAv1Profiles[profile];
-        s->level = box.U8(1) & 0x1F;
+    if (FindChild(v, children, FourCC("avcC"), &box)) {
+        AvcRecordFacts(box.data, box.size, s);
+    } else if (FindChild(v, children, FourCC("hvcC"), &box)) {
+        HevcRecordFacts(box.data, box.size, s);
+    } else if (FindChild(v, children, FourCC("av1C"), &box)) {
+        Av1RecordFacts(box.data, box.size, s);
     } else if (FindChild(v, children, FourCC("vpcC"), &box) && box.Has(0, 6)) {
         s->profile = std::string("Profile ") + char('0' + (box.U8(4) & 7));
     } else if (FindChild(v, children, FourCC("esds"), &box)) {

@@ -1,7 +1,7 @@
 #include "ogg/ogg_codecs.h"
 
 #include "core/byte_reader.h"
-#include "ogg/vorbis_comment.h"
+#include "flac/vorbis_comment.h"
 
 namespace metainfo {
 namespace {

@@ -7,7 +7,7 @@
 #include <vector>
 
 #include "core/facts.h"
-#include "ogg/vorbis_comment.h"
+#include "flac/vorbis_comment.h"
 
 namespace metainfo {
 

@@ -67,11 +67,11 @@ void WalkHeaders(int h, uint64_t fileSize, Walk* w) {
     int idle = 0;
     while (pos < fileSize && w->headerBytes <= kMaxHeaderBytes) {
         // The header and segment table first, so that only the page's own bytes are read.
-        const size_t got = ReadAt(h, pos, page.data(), kOggHeaderSize + 255);
+        const size_t got = ReadSomeAt(h, pos, page.data(), kOggHeaderSize + 255);
         OggPage p;
         if (!ParseOggPage(page.data(), got, &p)) return;
         const size_t rest = p.headerSize + p.bodySize - std::min(got, p.headerSize + p.bodySize);
-        if (rest > 0 && ReadAt(h, pos + got, page.data() + got, rest) != rest) return;
+        if (rest > 0 && ReadSomeAt(h, pos + got, page.data() + got, rest) != rest) return;
         pos += p.headerSize + p.bodySize;
         OggStream* s = StreamOf(w, p.serial);
         if ((p.flags & 2) != 0 && s == nullptr && !pastFirstPages && w->streams.size() < kMaxStreams) {

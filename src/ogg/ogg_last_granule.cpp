@@ -2,6 +2,7 @@
 
 #include <vector>
 
+#include "core/file_access.h"
 #include "ogg/ogg_page.h"
 
 namespace metainfo {
@@ -40,7 +41,7 @@ bool FindLastGranule(int h, uint64_t fileSize, uint32_t serial, uint64_t* granul
         // Past the block: the rest of a page that starts inside it.
         const uint64_t stop = fileSize - end > kOggMaxPage ? end + kOggMaxPage : fileSize;
         buf.resize(static_cast<size_t>(stop - start));
-        buf.resize(ReadAt(h, start, buf.data(), buf.size()));
+        buf.resize(ReadSomeAt(h, start, buf.data(), buf.size()));
         const size_t starts = static_cast<size_t>(end - start);
         if (buf.size() >= starts && LastPageIn(buf, starts, serial, granule)) return true;
         end = start;

@@ -3,7 +3,6 @@
 #include <array>
 
 #include "core/byte_reader.h"
-#include "core/file_access.h"
 
 namespace metainfo {
 namespace {
@@ -46,12 +45,6 @@ bool OggCrcMatches(const uint8_t* p, size_t n, uint32_t crc) {
         r = (r << 8) ^ table[((r >> 24) ^ byte) & 0xFFu];
     }
     return r == crc;
-}
-
-size_t ReadAt(int h, uint64_t pos, uint8_t* out, size_t n) {
-    if (n == 0 || !SeekToOffset(h, pos)) return 0;
-    const int got = MEx_fread(out, 1, static_cast<unsigned>(n), h);
-    return got > 0 ? static_cast<size_t>(got) : 0;
 }
 
 }  // namespace metainfo

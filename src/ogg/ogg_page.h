@@ -32,7 +32,4 @@ bool ParseOggPage(const uint8_t* p, size_t n, OggPage* page);
 // True when the page's n = headerSize + bodySize bytes at p carry its checksum.
 bool OggCrcMatches(const uint8_t* p, size_t n, uint32_t crc);
 
-// Reads up to n bytes at pos; the count read.
-size_t ReadAt(int h, uint64_t pos, uint8_t* out, size_t n);
-
 }  // namespace metainfo

@@ -13,7 +13,8 @@ namespace testing_support {
 // A metadata block: last flag and type, 24-bit size, body.
 Bytes FlacBlock(uint8_t type, const Bytes& body, bool last = false);
 Bytes FlacStreamInfo(uint32_t rate, uint32_t channels, uint32_t bits, uint64_t samples);
-// A VORBIS_COMMENT body of "KEY=value" entries.
+// A VORBIS_COMMENT body of "KEY=value" entries (also what follows
+// "\x03vorbis" and "OpusTags").
 Bytes VorbisComments(const std::vector<std::string>& entries);
 Bytes FlacPicture(uint32_t type, const std::string& mime, const std::string& description, const Bytes& image);
 

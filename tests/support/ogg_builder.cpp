@@ -2,6 +2,8 @@
 
 #include <algorithm>
 
+#include "support/flac_builder.h"
+
 namespace testing_support {
 namespace {
 
@@ -81,25 +83,13 @@ Bytes OpusHeadPacket(uint32_t channels, uint32_t preSkip, uint32_t inputRate) {
 
 Bytes FlacMappingPacket(uint32_t rate, uint32_t channels, uint32_t bitsPerSample) {
     Bytes b;
-    b.u8(0x7F).str("FLAC").u8(1).u8(0).be16(1).str("fLaC").u8(0).be24(34);
-    b.be16(4096).be16(4096).be24(0).be24(0);
-    b.be64(uint64_t(rate) << 44 | uint64_t(channels - 1) << 41 | uint64_t(bitsPerSample - 1) << 36).zeros(16);
-    return b;
-}
-
-Bytes VorbisCommentBody(const std::vector<std::string>& comments) {
-    Bytes b;
-    b.le32(4).str("test").le32(static_cast<uint32_t>(comments.size()));
-    for (const std::string& c : comments) b.le32(static_cast<uint32_t>(c.size())).str(c);
-    return b;
+    b.u8(0x7F).str("FLAC").u8(1).u8(0).be16(1).str("fLaC");
+    return b.raw(FlacBlock(0, FlacStreamInfo(rate, channels, bitsPerSample, 0)));
 }
 
 std::string Base64Picture(uint32_t type, const std::string& mime, const std::string& description,
                           const std::vector<uint8_t>& data) {
-    Bytes block;
-    block.be32(type).be32(static_cast<uint32_t>(mime.size())).str(mime);
-    block.be32(static_cast<uint32_t>(description.size())).str(description).zeros(16);
-    block.be32(static_cast<uint32_t>(data.size())).raw(data);
+    const Bytes block = FlacPicture(type, mime, description, Bytes().raw(data));
     static const char kDigits[] = "ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz0123456789+/";
     std::string out;
     const std::vector<uint8_t>& d = block.data();

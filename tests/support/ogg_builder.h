@@ -22,9 +22,6 @@ Bytes OpusHeadPacket(uint32_t channels, uint32_t preSkip, uint32_t inputRate);
 // The mapping header with STREAMINFO (not the last metadata block).
 Bytes FlacMappingPacket(uint32_t rate, uint32_t channels, uint32_t bitsPerSample);
 
-// Vendor and "KEY=value" comments, to follow "\x03vorbis", "OpusTags" or a
-// FLAC block header.
-Bytes VorbisCommentBody(const std::vector<std::string>& comments);
 // A FLAC PICTURE block's body, base64 as METADATA_BLOCK_PICTURE holds it.
 std::string Base64Picture(uint32_t type, const std::string& mime, const std::string& description,
                           const std::vector<uint8_t>& data);
