@@ -95,6 +95,14 @@ bool WalkBlocks(int h, uint64_t at, uint64_t fileSize, Flac* f, MediaFacts* fact
     return f->haveInfo;
 }
 
+// The file's size, and where "fLaC" starts; false when it is not there.
+bool FindStream(int h, const char* path, uint64_t* size, uint64_t* start) {
+    std::vector<uint8_t> b;
+    if (!OpenedFileSize(h, path, size)) return false;
+    *start = SkipId3Tags(h, *size);
+    return *start + 4 <= *size && ReadExactAt(h, *start, 4, &b) && BytesEqual(b.data(), "fLaC", 4);
+}
+
 }  // namespace
 
 bool LooksLikeFlac(const char* path, const uint8_t* head, size_t n) {
@@ -103,22 +111,16 @@ bool LooksLikeFlac(const char* path, const uint8_t* head, size_t n) {
     const int h = MEx_fopen(path, "rb");
     if (h == 0) return false;
     FileCloser closer(h);
-    uint64_t size = 0;
-    std::vector<uint8_t> b;
-    if (!OpenedFileSize(h, path, &size)) return false;
-    const uint64_t at = SkipId3Tags(h, size);
-    return at + 4 <= size && ReadExactAt(h, at, 4, &b) && BytesEqual(b.data(), "fLaC", 4);
+    uint64_t size = 0, start = 0;
+    return FindStream(h, path, &size, &start);
 }
 
 int32_t FlacFacts(const char* path, int /*type*/, MediaFacts* facts) {
     const int h = MEx_fopen(path, "rb");
     if (h == 0) return MM_E_FAIL;
     FileCloser closer(h);
-    uint64_t size = 0;
-    std::vector<uint8_t> b;
-    if (!OpenedFileSize(h, path, &size)) return MM_E_FAIL;
-    const uint64_t start = SkipId3Tags(h, size);
-    if (start + 4 > size || !ReadExactAt(h, start, 4, &b) || !BytesEqual(b.data(), "fLaC", 4)) return MM_E_FAIL;
+    uint64_t size = 0, start = 0;
+    if (!FindStream(h, path, &size, &start)) return MM_E_FAIL;
     Flac f;
     bool oom = false;
     try {
