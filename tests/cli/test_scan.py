@@ -112,6 +112,32 @@ def test_files_that_fail_get_their_reason_and_the_scan_goes_on(tmp_path):
     assert found[str(tmp_path / "good.mp3")][2] is None
 
 
+# Formats only the accurate answers read: (file, ffmpeg arguments, format, codecs)
+OTHER_FORMATS = [
+    ("a.flac", ["-f", "lavfi", "-i", "sine=d=1"], "flac", ["flac"]),
+    ("a.opus", ["-f", "lavfi", "-i", "sine=d=1", "-c:a", "libopus"], "ogg", ["opus"]),
+    ("a.mkv", ["-f", "lavfi", "-i", "testsrc=d=1:s=64x48", "-f", "lavfi", "-i", "sine=d=1", "-c:v", "libx264",
+               "-c:a", "aac"], "matroska", ["h264", "aac"]),
+    ("a.aiff", ["-f", "lavfi", "-i", "sine=d=1"], "aiff", ["pcm_s16be"]),
+]
+
+
+@pytest.mark.skipif(not shutil.which("ffmpeg"), reason="ffmpeg makes the files")
+def test_formats_beyond_the_contract_are_scanned(tmp_path):
+    for name, args, _, _ in OTHER_FORMATS:
+        subprocess.run(["ffmpeg", "-loglevel", "error"] + args + ["-metadata", "title=T " + name, str(tmp_path / name)],
+                       check=True, timeout=120)
+    assert scan(tmp_path, tmp_path / "x.db")[0]["failed"] == 0
+    with sqlite3.connect(tmp_path / "x.db") as c:
+        found = {os.path.basename(bytes(p).decode()): (f, json.loads(s), e)
+                 for p, f, s, e in c.execute("SELECT path, format, streams, error FROM files")}
+        titles = dict(c.execute("SELECT value, key FROM tags WHERE key = 'title'"))
+    for name, _, fmt, codecs in OTHER_FORMATS:
+        assert found[name][0] == fmt and found[name][2] is None, name
+        assert sorted(s["codec"] for s in found[name][1]) == sorted(codecs), name
+        assert "T " + name in titles, name
+
+
 def test_export_writes_what_probe_writes(tmp_path):
     root = tmp_path / "lib"
     root.mkdir()
