@@ -104,11 +104,11 @@ int AccurateMediaType(const char* path) {
     uint8_t head[kHeadBytes];
     const size_t n = ReadHead(path, head);
     if (IsRf64Wave(head, n)) return MEDIA_TYPE_WAVE;
-    if (LooksLikeAdts(path)) return MEDIA_TYPE_AAC;
+    // Magic numbers first: the search for ADTS frames reads up to 64 KiB.
     for (const AccurateFormat& f : kAccurateFormats) {
         if (f.looksLike != nullptr && f.reader != nullptr && f.looksLike(path, head, n)) return f.type;
     }
-    return MEDIA_TYPE_UNKNOWN;
+    return LooksLikeAdts(path) ? MEDIA_TYPE_AAC : MEDIA_TYPE_UNKNOWN;
 }
 
 int32_t ReadFacts(const char* path, int type, MediaFacts* facts) {
