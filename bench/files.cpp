@@ -13,11 +13,13 @@ namespace fs = std::filesystem;
 
 std::string FamilyOf(const fs::path& path) {
     static const std::map<std::string, std::string> kFamilies = {
-        {"mp3", "MP3"},      {"aac", "AAC"},      {"m4a", "MP4"},        {"m4b", "MP4"}, {"m4v", "MP4"},
-        {"mp4", "MP4"},      {"3gp", "MP4"},      {"3g2", "MP4"},        {"wma", "ASF"}, {"wmv", "ASF"},
-        {"asf", "ASF"},      {"wav", "WAVE"},     {"amr", "AMR"},        {"awb", "AMR"}, {"avi", "AVI"},
-        {"rm", "RealMedia"}, {"ra", "RealMedia"}, {"rmvb", "RealMedia"}, {"qcp", "QCP"}, {"evc", "EVRC"},
-        {"mid", "MIDI"},
+        {"mp3", "MP3"},      {"aac", "AAC"},      {"m4a", "MP4"},        {"m4b", "MP4"},  {"m4v", "MP4"},
+        {"mp4", "MP4"},      {"3gp", "MP4"},      {"3g2", "MP4"},        {"wma", "ASF"},  {"wmv", "ASF"},
+        {"asf", "ASF"},      {"wav", "WAVE"},     {"amr", "AMR"},        {"awb", "AMR"},  {"avi", "AVI"},
+        {"rm", "RealMedia"}, {"ra", "RealMedia"}, {"rmvb", "RealMedia"}, {"qcp", "QCP"},  {"evc", "EVRC"},
+        {"mid", "MIDI"},     {"flac", "FLAC"},    {"ogg", "Ogg"},        {"opus", "Ogg"}, {"oga", "Ogg"},
+        {"mkv", "Matroska"}, {"mka", "Matroska"}, {"webm", "Matroska"},  {"aif", "AIFF"}, {"aiff", "AIFF"},
+        {"aifc", "AIFF"},
     };
     std::string ext = path.extension().string();
     if (!ext.empty()) ext.erase(0, 1);

@@ -146,6 +146,18 @@ def variety(out, work, cover):
     ffmpeg(p("rv10-ac3.rm"), video(20), ["-i", src], ["-c:v", "rv10", "-c:a", "ac3", "-shortest"], TAGS)
     ffmpeg(p("rv20-ac3.rm"), video(20), ["-i", src], ["-c:v", "rv20", "-c:a", "ac3", "-shortest"])
     ffmpeg(p("ac3-only.ra"), ["-i", src], ["-c:a", "ac3", "-f", "rm"])
+    # Formats only the accurate interface reads
+    ffmpeg(p("cover.flac"), ["-i", src, "-i", cover], ["-map", "0", "-map", "1", "-c:v", "copy",
+           "-disposition:v", "attached_pic"], TAGS)
+    ffmpeg(p("24bit.flac"), ["-i", mono], ["-c:a", "flac", "-sample_fmt", "s32"], TAGS)
+    ffmpeg(p("vorbis.ogg"), ["-i", src], ["-c:a", "libvorbis"], TAGS)
+    ffmpeg(p("opus.opus"), ["-i", src], ["-c:a", "libopus"], TAGS)
+    ffmpeg(p("h264-aac.mkv"), video(20), ["-i", src], ["-c:v", "libx264", "-preset", "ultrafast", "-c:a", "aac",
+           "-shortest"], TAGS)
+    ffmpeg(p("vp9-opus.webm"), video(20), ["-i", src], ["-c:v", "libvpx-vp9", "-deadline", "realtime",
+           "-c:a", "libopus", "-shortest"], TAGS)
+    ffmpeg(p("pcm16.aiff"), ["-i", src], ["-c:a", "pcm_s16be"], TAGS)
+    run(["sox", src, "-e", "floating-point"], p("float.aifc"))
 
 
 def main():
