@@ -107,7 +107,7 @@ bool FindStream(int h, const char* path, uint64_t* size, uint64_t* start) {
 
 bool LooksLikeFlac(const char* path, const uint8_t* head, size_t n) {
     if (n >= 4 && BytesEqual(head, "fLaC", 4)) return true;
-    if (n < 3 || !BytesEqual(head, "ID3", 3)) return false;
+    if (path == nullptr || n < 3 || !BytesEqual(head, "ID3", 3)) return false;
     const int h = MEx_fopen(path, "rb");
     if (h == 0) return false;
     FileCloser closer(h);

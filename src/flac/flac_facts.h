@@ -8,7 +8,8 @@
 
 namespace metainfo {
 
-// Whether the file starts a FLAC stream, after any ID3v2 tags put before it.
+// Whether the file starts a FLAC stream, after any ID3v2 tags put before it
+// (those only with a path to read them through).
 bool LooksLikeFlac(const char* path, const uint8_t* head, size_t n);
 
 int32_t FlacFacts(const char* path, int type, MediaFacts* facts);

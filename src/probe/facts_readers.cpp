@@ -71,7 +71,7 @@ const FactsReader kFactsReaders[MM_MEDIA_SLOTS] = {
 
 // A format only the accurate interface reads: how its first bytes look, and
 // its reader. A row's test sees the file's first kHeadBytes bytes (fewer for a
-// shorter file) and may read more through the path.
+// shorter file) and may read more through the path when it is not null.
 struct AccurateFormat {
     AccurateType type;
     bool (*looksLike)(const char* path, const uint8_t* head, size_t n);
@@ -96,18 +96,30 @@ size_t ReadHead(const char* path, uint8_t* head) {
     return got > 0 ? static_cast<size_t>(got) : 0;
 }
 
-}  // namespace
-
-int AccurateMediaType(const char* path) {
-    int type = MEDIA_TYPE_UNKNOWN;
-    if (MM_MediaExtractor_DetectMediaType(path, &type) == MM_OK && type != MEDIA_TYPE_UNKNOWN) return type;
-    uint8_t head[kHeadBytes];
-    const size_t n = ReadHead(path, head);
-    if (IsRf64Wave(head, n)) return MEDIA_TYPE_WAVE;
-    // Magic numbers first: the search for ADTS frames reads up to 64 KiB.
+// The accurate-only format whose test the head passes; with a null path the
+// tests judge by the head alone.
+int AccurateTypeOf(const char* path, const uint8_t* head, size_t n) {
     for (const AccurateFormat& f : kAccurateFormats) {
         if (f.looksLike != nullptr && f.reader != nullptr && f.looksLike(path, head, n)) return f.type;
     }
+    return MEDIA_TYPE_UNKNOWN;
+}
+
+}  // namespace
+
+int AccurateMediaType(const char* path) {
+    uint8_t head[kHeadBytes];
+    const size_t n = ReadHead(path, head);
+    // Magic numbers first: on a file it does not know, the MM_ detection tries
+    // the frame syncs of several formats.
+    int type = AccurateTypeOf(nullptr, head, n);
+    if (type != MEDIA_TYPE_UNKNOWN) return type;
+    if (MM_MediaExtractor_DetectMediaType(path, &type) == MM_OK && type != MEDIA_TYPE_UNKNOWN) return type;
+    if (IsRf64Wave(head, n)) return MEDIA_TYPE_WAVE;
+    // Tests that read past the head (FLAC behind ID3 tags); then the search
+    // for ADTS frames, which reads up to 64 KiB.
+    type = AccurateTypeOf(path, head, n);
+    if (type != MEDIA_TYPE_UNKNOWN) return type;
     return LooksLikeAdts(path) ? MEDIA_TYPE_AAC : MEDIA_TYPE_UNKNOWN;
 }
 
