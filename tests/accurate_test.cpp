@@ -168,6 +168,56 @@ TEST(AccurateInterface, CutsWholeFramesOfTheRange) {
     EXPECT_EQ(mi_cut(dir.PathOf("frames.mp3").c_str(), 500, 500, dir.PathOf("x").c_str()), MI_E_ARGUMENT);
 }
 
+// A Standard MIDI File: header (format, division) and tracks of events.
+std::vector<uint8_t> Smf(uint16_t format, uint16_t division, const std::vector<Bytes>& tracks) {
+    Bytes b;
+    b.str("MThd").be32(6).be16(format).be16(static_cast<uint16_t>(tracks.size())).be16(division);
+    for (const Bytes& t : tracks) b.str("MTrk").be32(static_cast<uint32_t>(t.data().size())).raw(t);
+    return b.data();
+}
+
+const Bytes kEndOfTrack = Bytes{0, 0xFF, 0x2F, 0};
+
+// One quarter note (96 ticks at 120 beats a minute: 500 ms), by running status.
+Bytes OneNote() { return Bytes{0, 0x90, 60, 96, 0x60, 60, 0}.raw(kEndOfTrack); }
+
+// Every event walked through the tempo map; the MM_ side gives no play time.
+TEST(AccurateInterface, MidiPlayTimeThroughTheTempoMap) {
+    // Track 0: a name, 4 beats/s to tick 192, then 1 beat/s. Track 1: a SysEx,
+    // a program change, notes up to tick 384.
+    const Bytes tempoMap = Bytes{0, 0xFF, 0x03, 4}
+                               .str("Song")
+                               .raw(Bytes{0, 0xFF, 0x51, 3, 0x03, 0xD0, 0x90})
+                               .raw(Bytes{0x81, 0x40, 0xFF, 0x51, 3, 0x0F, 0x42, 0x40})
+                               .raw(kEndOfTrack);
+    const Bytes notes =
+        Bytes{0, 0xF0, 3, 0x7E, 0x7F, 0xF7, 0, 0xC0, 5, 0, 0x90, 60, 96, 0x83, 0x00, 0x80, 60, 0}.raw(kEndOfTrack);
+    const struct {
+        const char* name;
+        std::vector<uint8_t> bytes;
+        int64_t durationMs;
+        const char* title;
+    } rows[] = {
+        {"one note", Smf(0, 96, {OneNote()}), 500, ""},
+        {"tempo changes in another track", Smf(1, 96, {tempoMap, notes}), 2500, "Song"},
+        // 25 frames a second of 40 ticks: 96 ticks are 96 ms.
+        {"SMPTE time", Smf(0, 0xE728, {OneNote()}), 96, ""},
+        {"a track cut inside a note", Smf(0, 96, {Bytes{0, 0x90, 60, 96, 0x60, 0x80}}), 500, ""},
+    };
+    TempDir dir;
+    for (const auto& row : rows) {
+        const std::string path = dir.Write("tune.mid", row.bytes);
+        mi_info* info = nullptr;
+        ASSERT_EQ(mi_probe(path.c_str(), &info), MI_OK) << row.name;
+        EXPECT_STREQ(info->format, "midi") << row.name;
+        EXPECT_EQ(info->duration_ms, row.durationMs) << row.name;
+        EXPECT_STREQ(info->title != nullptr ? info->title : "", row.title) << row.name;
+        mi_info_free(info);
+        _MMClipInfo clip{};
+        EXPECT_EQ(MM_MediaExtractor_GetClipInfo(path.c_str(), MEDIA_TYPE_MIDI, &clip), MM_E_NOTIMPL) << row.name;
+    }
+}
+
 TEST(AccurateInterface, ResultsForWhatIsNotMedia) {
     TempDir dir;
     const std::string text = dir.Write("notes.txt", Bytes().str("just some words, nothing more\n").data());

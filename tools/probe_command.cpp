@@ -79,8 +79,10 @@ void PrintStream(const mi_stream& s) {
                     s.profile != nullptr ? s.profile : "", s.width, s.height);
         if (s.frame_rate_den != 0) std::printf(", %.3f fps", static_cast<double>(s.frame_rate_num) / s.frame_rate_den);
     } else {
-        std::printf("    audio %s%s%s, %u Hz, %u ch", codec, s.profile != nullptr ? " " : "",
-                    s.profile != nullptr ? s.profile : "", s.sample_rate, s.channels);
+        std::printf("    audio %s%s%s", codec, s.profile != nullptr ? " " : "", s.profile != nullptr ? s.profile : "");
+        // MIDI and other event streams have neither.
+        if (s.sample_rate != 0) std::printf(", %u Hz", s.sample_rate);
+        if (s.channels != 0) std::printf(", %u ch", s.channels);
         if (s.bits_per_sample != 0) std::printf(", %u bits", s.bits_per_sample);
     }
     if (s.bit_rate != 0) std::printf(", %llu bit/s", static_cast<unsigned long long>(s.bit_rate));

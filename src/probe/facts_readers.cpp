@@ -17,6 +17,7 @@
 #include "ogg/ogg_facts.h"
 #include "probe/contract_facts.h"
 #include "speech/amr.h"
+#include "speech/midi_facts.h"
 #include "speech/wave_facts.h"
 
 namespace metainfo {
@@ -45,6 +46,8 @@ int32_t ReadAmr(const char* path, int /*type*/, MediaFacts* facts) { return AmrF
 
 int32_t ReadAvi(const char* path, int /*type*/, MediaFacts* facts) { return AviFacts(path, facts); }
 
+int32_t ReadMidi(const char* path, int /*type*/, MediaFacts* facts) { return MidiFacts(path, facts); }
+
 int32_t ReadMp3(const char* path, int /*type*/, MediaFacts* facts) {
     return WithId3Tags(Mp3StreamFacts(path, facts), path, facts);
 }
@@ -56,7 +59,7 @@ const FactsReader kFactsReaders[MM_MEDIA_SLOTS] = {
     /* 2 RealMedia */ nullptr,
     /* 3 MP4 */ Mp4Facts,
     /* 4 ASF */ AsfFacts,
-    /* 5 MIDI */ nullptr,
+    /* 5 MIDI */ ReadMidi,
     /* 6 AAC */ ReadAac,
     /* 7 WAVE */ ReadWave,
     /* 8 AMR-NB */ ReadAmr,
