@@ -147,13 +147,60 @@ TEST_F(AccurateMp4Test, StreamsInFfprobeTerms) {
     for (const auto& row : rows) EXPECT_EQ(Describe(Facts(row.file)), row.want) << row.name;
 }
 
-TEST_F(AccurateMp4Test, DurationWithoutMovieHeaderTimeIsTheLongestTrack) {
-    const ByteVec file =
-        Join({Ftyp(),
-              Box("moov", Join({Mvhd(0, 1000, 0), TimedTrak("soun", 8000, 20000, AacEntry(AscLc44()), 20, 1000, 10),
-                                TimedTrak("soun", 1000, 4000, AacEntry(AscLc44()), 4, 1000, 10)})),
-              Box("mdat", ByteVec(16, 0))});
-    EXPECT_EQ(Facts(file).durationUs, 4000000);
+// A fragmented file: an empty track and "mvex", then a segment index when
+// given, one fragment (43 samples of 1024 ticks from 2 s on) and, when
+// given, the random access box that names it.
+ByteVec Fragmented(bool withSidx, bool withMfra, uint32_t mfroSize = 0) {
+    const ByteVec moov =
+        Box("moov", Join({Mvhd(0, 1000, 0), TimedTrak("soun", 44100, 0, AacEntry(AscLc44()), 0, 1024, 0),
+                          Box("mvex", FullBox("trex", 0, 0, Bytes().be32(0).be32(1).zeros(12)))}));
+    const ByteVec sidx = withSidx ? FullBox("sidx", 0, 0,
+                                            Bytes()
+                                                .be32(1)
+                                                .be32(1000)
+                                                .be32(0)
+                                                .be32(0)
+                                                .be16(0)
+                                                .be16(2)
+                                                .be32(100)
+                                                .be32(1500)
+                                                .be32(0x90000000u)
+                                                .be32(100)
+                                                .be32(1250)
+                                                .be32(0x90000000u))
+                                  : ByteVec{};
+    const ByteVec traf =
+        Box("traf", Join({FullBox("tfhd", 0, 0x08, Bytes().be32(0).be32(1024)),
+                          FullBox("tfdt", 1, 0, Bytes().be64(88200)), FullBox("trun", 0, 0, Bytes().be32(43))}));
+    const ByteVec head = Join({Ftyp("iso5"), moov, sidx});
+    const ByteVec moof = Box("moof", Join({FullBox("mfhd", 0, 0, Bytes().be32(1)), traf}));
+    const ByteVec tfra =
+        FullBox("tfra", 1, 0, Bytes().be32(0).be32(0).be32(1).be64(88200).be64(head.size()).u8(1).u8(1).u8(1));
+    const uint32_t mfraSize = static_cast<uint32_t>(8 + tfra.size() + 16);
+    const ByteVec mfra =
+        Box("mfra", Join({tfra, FullBox("mfro", 0, 0, Bytes().be32(mfroSize != 0 ? mfroSize : mfraSize))}));
+    return Join({head, moof, Box("mdat", ByteVec(64, 0)), withMfra ? mfra : ByteVec{}});
+}
+
+TEST_F(AccurateMp4Test, DurationWithoutMovieHeaderTime) {
+    const struct {
+        const char* name;
+        ByteVec file;
+        int64_t durationUs;
+    } rows[] = {
+        {"the longest track",
+         Join({Ftyp(),
+               Box("moov", Join({Mvhd(0, 1000, 0), TimedTrak("soun", 8000, 20000, AacEntry(AscLc44()), 20, 1000, 10),
+                                 TimedTrak("soun", 1000, 4000, AacEntry(AscLc44()), 4, 1000, 10)})),
+               Box("mdat", ByteVec(16, 0))}),
+         4000000},
+        // (88200 + 43 * 1024) / 44100 s, over the index's 2.75 s.
+        {"the last fragment mfra names", Fragmented(true, true), 2998458},
+        {"the segment index", Fragmented(true, false), 2750000},
+        {"neither", Fragmented(false, false), -1},
+        {"mfro sizes past the file", Fragmented(false, true, 0x7FFFFFF0u), -1},
+    };
+    for (const auto& row : rows) EXPECT_EQ(Facts(row.file).durationUs, row.durationUs) << row.name;
 }
 
 // Object type 29 opens the configuration: the contract does not read it.

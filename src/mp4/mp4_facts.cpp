@@ -15,6 +15,14 @@
 #include "mp4/mp4_truth.h"
 
 namespace metainfo {
+
+int64_t Micros(uint64_t ticks, uint32_t timescale) {
+    if (timescale == 0) return -1;
+    const uint64_t whole = ticks / timescale, part = ticks % timescale;
+    if (whole > (uint64_t{1} << 42)) return -1;  // past a hundred years: no length a file has
+    return static_cast<int64_t>(whole * 1000000 + (part * 1000000 + timescale / 2) / timescale);
+}
+
 namespace {
 
 // value * mul / div without overflow for the sizes and times of a file.
@@ -23,13 +31,6 @@ uint64_t MulDiv(uint64_t value, uint64_t mul, uint64_t div) {
     const long double q = static_cast<long double>(value) * mul / div;
     // A hostile file's times can make any rate; no answer beyond 2^63 is one.
     return q < 9.2e18L ? static_cast<uint64_t>(q) : 0;
-}
-
-// Ticks of a timescale in microseconds, rounded.
-int64_t Micros(uint64_t ticks, uint32_t timescale) {
-    const uint64_t whole = ticks / timescale, part = ticks % timescale;
-    if (whole > (uint64_t{1} << 42)) return -1;  // past a hundred years: no length a file has
-    return static_cast<int64_t>(whole * 1000000 + (part * 1000000 + timescale / 2) / timescale);
 }
 
 uint64_t Gcd(uint64_t a, uint64_t b) {
@@ -154,7 +155,7 @@ void ImplicitSbr(const char* path, Mp4Truth* truth) {
     }
 }
 
-void Assemble(const Mp4Truth& truth, uint64_t fileSize, MediaFacts* f) {
+void Assemble(const char* path, const Mp4Truth& truth, uint64_t fileSize, MediaFacts* f) {
     f->format = "mp4";  // the MM_ name of every file of the family
     bool hasVideo = false;
     int64_t longest = -1;
@@ -171,6 +172,7 @@ void Assemble(const Mp4Truth& truth, uint64_t fileSize, MediaFacts* f) {
     f->durationUs = truth.movieTimescale != 0 && truth.movieDuration != 0
                         ? Micros(truth.movieDuration, truth.movieTimescale)
                         : longest;
+    if (f->durationUs <= 0 && truth.fragmented) f->durationUs = FragmentedDurationUs(path, fileSize, truth);
     f->durationExact = f->durationUs > 0;
     if (f->durationUs > 0) f->bitRate = MulDiv(fileSize * 8, 1000000, static_cast<uint64_t>(f->durationUs));
     f->tags = truth.tags;
@@ -193,7 +195,7 @@ int32_t Mp4Facts(const char* path, int /*type*/, MediaFacts* facts) {
             Mp3Channels(path, &truth);
             ImplicitSbr(path, &truth);
         }
-        if (result == MM_OK) Assemble(truth, fileSize, facts);
+        if (result == MM_OK) Assemble(path, truth, fileSize, facts);
     } catch (const std::bad_alloc&) {
         FreeTrackList(&info);
         return MM_E_OUTOFMEMORY;

@@ -13,6 +13,7 @@ namespace metainfo {
 
 struct Mp4TrackTruth {
     uint32_t handler = 0;
+    uint32_t trackId = 0;  // "tkhd"
     uint32_t timescale = 0;  // "mdhd"
     uint64_t duration = 0;
     bool hasEdit = false;
@@ -33,6 +34,7 @@ struct Mp4Truth {
     std::vector<uint32_t> brands;
     uint32_t movieTimescale = 0;
     uint64_t movieDuration = 0;
+    bool fragmented = false;  // "mvex": samples in movie fragments
     std::vector<Mp4TrackTruth> tracks;
     TagFacts tags;
     std::vector<PictureFacts> pictures;
@@ -54,5 +56,14 @@ void ChunkOffsetFacts(int h, int64_t start, uint32_t size, bool wide, Mp4TrackTr
 // and pictures.
 void MetaFacts(int h, int64_t start, uint32_t size, Mp4Truth* truth);
 void UdtaFacts(int h, int64_t start, uint32_t size, Mp4Truth* truth);
+
+// Ticks of a timescale in microseconds, rounded; -1 past a hundred years or
+// without a timescale.
+int64_t Micros(uint64_t ticks, uint32_t timescale);
+
+// A fragmented file's play time in µs, from the last fragment its random
+// access box ("mfra") names or from its segment index ("sidx"); -1 when
+// neither tells.
+int64_t FragmentedDurationUs(const char* path, uint64_t fileSize, const Mp4Truth& truth);
 
 }  // namespace metainfo

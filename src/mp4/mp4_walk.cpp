@@ -198,6 +198,7 @@ int32_t AnaMoov(int h, int mode, void* out) {
     return WalkChildren(h, end, [&](uint32_t type, int64_t start, uint32_t size) {
         if (truth != nullptr && type == FourCC("meta")) MetaFacts(h, start, size, truth);
         if (truth != nullptr && type == FourCC("udta")) UdtaFacts(h, start, size, truth);
+        if (truth != nullptr && type == FourCC("mvex")) truth->fragmented = true;
         if (type == FourCC("mvhd") && mode == kModeClip) {
             AnaMvhd(h, static_cast<_ME_ClipInfoEx*>(out));
         } else if (type == FourCC("trak") && (mode == kModeClip || mode == kModeTrackType)) {
@@ -270,6 +271,7 @@ int32_t AnaTkhd(int h, _ME_ClipInfoEx* info) {
     const uint32_t height = ReadBE32(buf.data + offset + 4) >> 16;
     // The first track that declares a size wins.
     if (info->truth != nullptr && info->truth->Track() != nullptr) {
+        info->truth->Track()->trackId = ReadBE32(buf.data + at + (full.version == 0 ? 8 : 16));
         info->truth->Track()->tkhdWidth = width;
         info->truth->Track()->tkhdHeight = height;
     }
