@@ -97,6 +97,9 @@ TEST(AccurateFlac, ApeTagsFillWhatId3Lacks) {
         {"ID3v2, APEv2, ID3v1", Cat({id3.data(), audio.data(), ape.data(), Id3v1Titled("V1")}),
          "mp3 audio/mpeg 1045 | mp3 44100x2x0 128000 | Id3 title;A;;AA;;2001-02;2001;3/11;2/0;; Mood=calm | "
          "image/png 3 cover.png 6 89504e47"},
+        {"an APE tag ranks above the ID3v1 tag after it", Cat({audio.data(), ape.data(), Id3v1Titled("V1")}),
+         "mp3 audio/mpeg 1045 | mp3 44100x2x0 128000 | Ape title;A;;AA;;2001-02;2001;3/11;2/0;; Mood=calm | "
+         "image/png 3 cover.png 6 89504e47"},
         {"APEv1 alone at the end", Cat({audio.data(), ApeTag({{"Title", Bytes().str("T1")}}, 1000)}),
          "mp3 audio/mpeg 1045 | mp3 44100x2x0 128000 | T1;;;;;;0;0/0;0/0;;"},
         {"a tag size past the start of the file",
