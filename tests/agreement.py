@@ -156,6 +156,7 @@ opus_48000_2ch_9.6s.opus           A48000:9.6 -ac 2 -c:a libopus
 opus_16000_1ch_tags_ffmpeg.opus    A16000:3.3 -c:a libopus TAGS_UNI
 oggflac_44100_2ch_3.3s.oga         A44100:3.3 -ac 2 -c:a flac -f ogg
 oggflac_tags_ffmpeg_48000.oga      A48000:0.5 -c:a flac -f ogg TAGS_UNI
+ogv_theora_vorbis_160x120_25fps.ogv  V160x120:25:3.3 A44100:3.3 -c:v libtheora -c:a libvorbis
 mkv_h264_aac_160x120_25fps.mkv     V160x120:25:3.3 A44100:3.3 H264 AAC2
 mkv_hevc_opus_160x120_25fps.mkv    V160x120:25:1 A48000:1 HEVC -c:a libopus
 mkv_av1_aac_160x120_25fps.mkv      V160x120:25:1 A44100:1 AV1 YUV AAC2
@@ -512,12 +513,15 @@ def from_mutagen(path):
     if codec.startswith("mp4a.40."):
         out["audio.profile"] = AAC_PROFILES.get(codec.rsplit(".", 1)[1])
     raw, pictures = mutagen_tags(f.tags) if f.tags is not None else ({}, 0)
-    if kind == "MP3":  # an APE tag at the end fills what the ID3 tags lack
+    if kind == "MP3":  # an APE tag at the end ranks below ID3v2 and above ID3v1, as in TagLib
         try:
             ape, ape_pictures = mutagen_tags(mutagen.apev2.APEv2(path))
-            raw, pictures = {k: raw.get(k) or ape.get(k) for k in TAG_KEYS}, pictures + ape_pictures
+            first, then = (ape, raw) if getattr(f.tags, "version", None) == (1, 1) else (raw, ape)
+            raw, pictures = {k: first.get(k) or then.get(k) for k in TAG_KEYS}, pictures + ape_pictures
         except mutagen.apev2.error:
             pass
+    if kind == "OggTheora":  # mutagen sees the video stream only
+        out["audio.bit_rate"], out["video.frame_rate"] = None, info.fps
     out.update(tag_fields(raw))
     out["pictures"] = pictures + len(getattr(f, "pictures", None) or [])
     return out
