@@ -150,6 +150,8 @@ avi_mpeg4_pcm_176x144_29.97fps.avi  V176x144:30000/1001:9.6 A22050:9.6 -c:v mpeg
 flac_s16_44100_2ch_3.3s.flac       A44100:3.3 -ac 2 -c:a flac
 flac_s24_96000_1ch_0.5s.flac       A96000:0.5 -ac 1 -c:a flac -sample_fmt s32
 flac_tags_ffmpeg_22050_9.6s.flac   A22050:9.6 -c:a flac TAGS_UNI
+flac_s24_96000_2ch_61s.flac        A96000:61 -ac 2 -c:a flac -sample_fmt s32
+ogg_vorbis_q10_48000_2ch_61s.ogg   A48000:61 -ac 2 -c:a libvorbis -q:a 10
 ogg_vorbis_44100_2ch_9.6s.ogg      A44100:9.6 -ac 2 -c:a libvorbis
 ogg_vorbis_tags_ffmpeg.ogg         A22050:3.3 -c:a libvorbis TAGS_LATIN
 opus_48000_2ch_9.6s.opus           A48000:9.6 -ac 2 -c:a libopus
@@ -158,6 +160,8 @@ oggflac_44100_2ch_3.3s.oga         A44100:3.3 -ac 2 -c:a flac -f ogg
 oggflac_tags_ffmpeg_48000.oga      A48000:0.5 -c:a flac -f ogg TAGS_UNI
 ogv_theora_vorbis_160x120_25fps.ogv  V160x120:25:3.3 A44100:3.3 -c:v libtheora -c:a libvorbis
 mkv_h264_aac_160x120_25fps.mkv     V160x120:25:3.3 A44100:3.3 H264 AAC2
+mkv_h264_opus_320x240_30fps_61s.mkv  V320x240:30:61 A48000:61 H264 -c:a libopus
+mkv_live_h264_aac_9.6s.mkv         V160x120:25:9.6 A44100:9.6 H264 AAC2 -live 1
 mkv_hevc_opus_160x120_25fps.mkv    V160x120:25:1 A48000:1 HEVC -c:a libopus
 mkv_av1_aac_160x120_25fps.mkv      V160x120:25:1 A44100:1 AV1 YUV AAC2
 webm_vp9_opus_160x120_25fps.webm   V160x120:25:1 A48000:1 VP9 -c:a libopus
