@@ -165,7 +165,7 @@ mkv_live_h264_aac_9.6s.mkv         V160x120:25:9.6 A44100:9.6 H264 AAC2 -live 1
 mkv_hevc_opus_160x120_25fps.mkv    V160x120:25:1 A48000:1 HEVC -c:a libopus
 mkv_av1_aac_160x120_25fps.mkv      V160x120:25:1 A44100:1 AV1 YUV AAC2
 webm_vp9_opus_160x120_25fps.webm   V160x120:25:1 A48000:1 VP9 -c:a libopus
-mkv_tags_cover_29.97fps.mkv        V176x144:30000/1001:3.3 A44100:3.3 H264 AAC2 TAGS_UNI -attach {dir}/work/cover.png -metadata:s:t mimetype=image/png
+mkv_tags_cover_29.97fps.mkv        V176x144:30000/1001:3.3 A44100:3.3 H264 AAC2 TAGS_UNI ATTACH_PNG
 mka_vorbis_tags.mka                A44100:9.6 -c:a libvorbis TAGS_LATIN
 mka_flac_s24_48000.mka             A48000:3.3 -c:a flac -sample_fmt s32
 aiff_s16_44100_2ch_3.3s.aiff       A44100:3.3 -ac 2 -c:a pcm_s16be
@@ -180,6 +180,7 @@ GROUPS = {"YUV": ["-pix_fmt", "yuv420p"], "AAC2": ["-c:a", "aac", "-ac", "2"],
                    "-pix_fmt", "yuv420p"],
           "VP9": ["-c:v", "libvpx-vp9", "-deadline", "realtime", "-cpu-used", "8", "-pix_fmt",
                   "yuv420p"],
+          "ATTACH_PNG": ["-attach", "{dir}/work/cover.png", "-metadata:s:t", "mimetype=image/png"],
           "TAGS_LATIN": meta_args(LATIN, "Pop"), "TAGS_UNI": meta_args(UNI, "Jazz")}
 AV1 = {"libsvtav1": ["-preset", "12"], "libaom-av1": ["-cpu-used", "8"], "librav1e": []}
 
@@ -199,9 +200,11 @@ TAGGED = {
     "m4a_tags_cover.m4a": ("ffmpeg A44100:3.3 AAC2", "mp4", UNI, "Jazz", 4, 3, "png", None),
     "m4a_tags_jpeg.m4a": ("ffmpeg A22050:9.6 -c:a aac", "mp4", LATIN, "Rock", 4, 3, "jpeg", None),
     "wav_id3.wav": ("ffmpeg A44100:3.3 -c:a pcm_s16le", "id3", UNI, "Pop", 3, 1, None, None),
-    "aiff_id3_cover.aiff": ("ffmpeg A44100:3.3 -c:a pcm_s16be", "id3", UNI, "Jazz", 3, 1, "png", None),
-    "flac_id3v2_before.flac": ("ffmpeg A44100:3.3 -c:a flac", "id3", LATIN, "Pop", 4, 3, None, None),
-    "flac_vc_cover.flac": ("ffmpeg A44100:3.3 -ac 2 -c:a flac", "vc", UNI, "Jazz", 0, 0, "png", None),
+    "aiff_id3_cover.aiff": ("ffmpeg A44100:3.3 -c:a pcm_s16be", "id3", UNI, "Jazz", 3, 1, "png",
+                            None),
+    "flac_after_id3v2.flac": ("ffmpeg A44100:3.3 -c:a flac", "id3", LATIN, "Pop", 4, 3, None, None),
+    "flac_vc_cover.flac": ("ffmpeg A44100:3.3 -ac 2 -c:a flac", "vc", UNI, "Jazz", 0, 0, "png",
+                           None),
     "flac_s24_vc_48000.flac": ("ffmpeg A48000:9.6 -c:a flac -sample_fmt s32", "vc", LATIN, "Rock",
                                0, 0, None, None),
     "ogg_vorbis_vc_cover.ogg": ("ffmpeg A44100:3.3 -c:a libvorbis", "vc", UNI, "Jazz", 0, 0, "jpeg",
@@ -521,7 +524,8 @@ def from_mutagen(path):
         try:
             ape, ape_pictures = mutagen_tags(mutagen.apev2.APEv2(path))
             first, then = (ape, raw) if getattr(f.tags, "version", None) == (1, 1) else (raw, ape)
-            raw, pictures = {k: first.get(k) or then.get(k) for k in TAG_KEYS}, pictures + ape_pictures
+            raw = {k: first.get(k) or then.get(k) for k in TAG_KEYS}
+            pictures += ape_pictures
         except mutagen.apev2.error:
             pass
     if kind == "OggTheora":  # mutagen sees the video stream only
