@@ -55,11 +55,11 @@ TEST(AccurateFlac, FactsOfBuiltStreams) {
                                                     "ARTIST=B", "METADATA_BLOCK_PICTURE=AAAA", "novalue"})),
                FlacBlock(kPicture, FlacPicture(3, "image/png", "front", kPng)),
                FlacBlock(kPadding, Bytes().zeros(9), true)}),
-         "flac audio/flac 3000 | flac 44100x2x16 0 | T;A;B;Al;AA;Rock;2019-05-02;2019;3/11;1/2;D;C FOO=bar | "
+         "flac audio/flac 3000 | flac 44100x2x16 800 | T;A;B;Al;AA;Rock;2019-05-02;2019;3/11;1/2;D;C FOO=bar | "
          "image/png 3 front 6 89504e47"},
         {"24-bit behind two ID3v2 tags",
          Flac({FlacBlock(kInfo, FlacStreamInfo(96000, 1, 24, 48000), true)}, Cat({Id3Tag(3, {}), Id3Tag(4, {})})),
-         "flac audio/flac 500 | flac 96000x1x24 0 | ;;;;;;0;0/0;0/0;;"},
+         "flac audio/flac 500 | flac 96000x1x24 4800 | ;;;;;;0;0/0;0/0;;"},
         {"no sample count: length unknown; blocks after the last one are frames",
          Flac({FlacBlock(kInfo, FlacStreamInfo(8000, 1, 8, 0), true),
                FlacBlock(kComments, VorbisComments({"TITLE=X"}))}),
@@ -67,7 +67,7 @@ TEST(AccurateFlac, FactsOfBuiltStreams) {
         {"a picture larger than its block is left out",
          Flac({FlacBlock(kInfo, FlacStreamInfo(8000, 1, 16, 8000)),
                FlacBlock(kPicture, Bytes(FlacPicture(0, "image/png", "", kPng)).patch_be32(37, 99), true)}),
-         "flac audio/flac 1000 | flac 8000x1x16 0 | ;;;;;;0;0/0;0/0;;"},
+         "flac audio/flac 1000 | flac 8000x1x16 2400 | ;;;;;;0;0/0;0/0;;"},
         {"a block past the end of the file",
          Flac({FlacBlock(kInfo, FlacStreamInfo(8000, 1, 16, 8000)), Bytes().u8(kPadding).be24(0xFFFFFF)}), "error 8"},
         {"no STREAMINFO", Flac({FlacBlock(kPadding, Bytes().zeros(4), true)}), "error 8"},
@@ -96,6 +96,9 @@ TEST(AccurateFlac, ApeTagsFillWhatId3Lacks) {
     const std::vector<Row> rows = {
         {"ID3v2, APEv2, ID3v1", Cat({id3.data(), audio.data(), ape.data(), Id3v1Titled("V1")}),
          "mp3 audio/mpeg 1045 | mp3 44100x2x0 128000 | Id3 title;A;;AA;;2001-02;2001;3/11;2/0;; Mood=calm | "
+         "image/png 3 cover.png 6 89504e47"},
+        {"an APE tag ranks above the ID3v1 tag after it", Cat({audio.data(), ape.data(), Id3v1Titled("V1")}),
+         "mp3 audio/mpeg 1045 | mp3 44100x2x0 128000 | Ape title;A;;AA;;2001-02;2001;3/11;2/0;; Mood=calm | "
          "image/png 3 cover.png 6 89504e47"},
         {"APEv1 alone at the end", Cat({audio.data(), ApeTag({{"Title", Bytes().str("T1")}}, 1000)}),
          "mp3 audio/mpeg 1045 | mp3 44100x2x0 128000 | T1;;;;;;0;0/0;0/0;;"},

@@ -5,11 +5,12 @@ Makes media files with ffmpeg, lame and sox across containers, codecs and tag en
 the corpus files, asks metainfo, ffprobe and mutagen about each and counts, field by field, how
 often metainfo gives the answer its two peers agree on.
 """
-import argparse, concurrent.futures, json, os, re, shutil, subprocess, sys, tempfile
+import argparse, base64, concurrent.futures, json, os, re, shutil, subprocess, sys, tempfile
 
 try:
     import mutagen
-    import mutagen.id3, mutagen.mp3, mutagen.mp4, mutagen.wave
+    import mutagen.id3, mutagen.mp3, mutagen.mp4, mutagen.wave, mutagen.aiff, mutagen.apev2
+    import mutagen.flac, mutagen._vorbis
 except ImportError:
     mutagen = None
 
@@ -26,18 +27,22 @@ ID3_GENRES = (
     "New Wave,Psychadelic,Rave,Showtunes,Trailer,Lo-Fi,Tribal,Acid Punk,Acid Jazz,Polka,Retro,"
     "Musical,Rock & Roll,Hard Rock").split(",")
 
-# Tag fields and where each tag type keeps them: ffprobe, ID3, MP4, ASF.
+# Tag fields and where each tag type keeps them: ffprobe, ID3, MP4, ASF, Vorbis comment, APE;
+# "A|B": the first of the keys there (ffmpeg writes a comment as DESCRIPTION). Only Vorbis
+# comments keep a track total apart; the others write "3/10".
 TAG_KEYS = {
-    "title": ("title", "TIT2", "\xa9nam", "Title"),
-    "artist": ("artist", "TPE1", "\xa9ART", "Author"),
-    "album": ("album", "TALB", "\xa9alb", "WM/AlbumTitle"),
-    "album_artist": ("album_artist", "TPE2", "aART", "WM/AlbumArtist"),
-    "genre": ("genre", "TCON", "\xa9gen", "WM/Genre"),
-    "date": ("date", "TDRC", "\xa9day", "WM/Year"),
-    "track": ("track", "TRCK", "trkn", "WM/TrackNumber"),
-    "disc": ("disc", "TPOS", "disk", "WM/PartOfSet"),
-    "comment": ("comment", "COMM", "\xa9cmt", "Description"),
-    "composer": ("composer", "TCOM", "\xa9wrt", "WM/Composer"),
+    "title": ("title", "TIT2", "\xa9nam", "Title", "TITLE", "Title"),
+    "artist": ("artist", "TPE1", "\xa9ART", "Author", "ARTIST", "Artist"),
+    "album": ("album", "TALB", "\xa9alb", "WM/AlbumTitle", "ALBUM", "Album"),
+    "album_artist": ("album_artist", "TPE2", "aART", "WM/AlbumArtist", "ALBUMARTIST",
+                     "Album Artist"),
+    "genre": ("genre", "TCON", "\xa9gen", "WM/Genre", "GENRE", "Genre"),
+    "date": ("date", "TDRC", "\xa9day", "WM/Year", "DATE", "Year"),
+    "track": ("track", "TRCK", "trkn", "WM/TrackNumber", "TRACKNUMBER", "Track"),
+    "disc": ("disc", "TPOS", "disk", "WM/PartOfSet", "DISCNUMBER", "Disc"),
+    "comment": ("comment", "COMM", "\xa9cmt", "Description", "COMMENT|DESCRIPTION", "Comment"),
+    "composer": ("composer", "TCOM", "\xa9wrt", "WM/Composer", "COMPOSER", "Composer"),
+    "track_total": ("tracktotal", None, None, None, "TRACKTOTAL", None),
 }
 
 # Compared fields and how two answers agree: "dur" within 0.5 % or 50 ms; "rate" (bit
@@ -113,9 +118,9 @@ mp4_h264_160x120_15fps_9.6s_aac.mp4  V160x120:15:9.6 A22050:9.6 H264 -c:a aac
 mp4_h264_128x96_30fps_0.5s.mp4     V128x96:30:0.5 H264
 mp4_mpeg4_160x120_25fps_aac.mp4    V160x120:25:3.3 A48000:3.3 -c:v mpeg4 YUV AAC2
 mp4_mpeg4_176x144_29.97fps.mp4     V176x144:30000/1001:3.3 -c:v mpeg4 YUV
-mp4_hevc_160x120_25fps_aac.mp4     V160x120:25:1 A44100:1 -c:v libx265 -preset ultrafast -x265-params log-level=error YUV AAC2
+mp4_hevc_160x120_25fps_aac.mp4     V160x120:25:1 A44100:1 HEVC AAC2
 mp4_av1_160x120_25fps.mp4          V160x120:25:1 AV1 YUV
-mp4_vp9_160x120_25fps_opus.mp4     V160x120:25:1 A48000:1 -c:v libvpx-vp9 -deadline realtime -cpu-used 8 YUV -c:a libopus
+mp4_vp9_160x120_25fps_opus.mp4     V160x120:25:1 A48000:1 VP9 -c:a libopus
 mp4_opus_48000.mp4                 A48000:3.3 -ac 2 -c:a libopus
 mp4_flac_44100.mp4                 A44100:3.3 -ac 2 -c:a flac -strict -2
 m4a_alac_44100.m4a                 A44100:3.3 -ac 2 -c:a alac
@@ -142,9 +147,40 @@ asf_wmav2_22050_1ch_9.6s.wma       A22050:9.6 -c:a wmav2 -metadata title=Short -
 asf_wmv2_160x120_25fps.wmv         V160x120:25:3.3 A44100:3.3 -c:v wmv2 YUV -c:a wmav2 TAGS_UNI
 avi_mpeg4_mp3_160x120_25fps.avi    V160x120:25:3.3 A44100:3.3 -c:v mpeg4 YUV -c:a libmp3lame -b:a 128k
 avi_mpeg4_pcm_176x144_29.97fps.avi  V176x144:30000/1001:9.6 A22050:9.6 -c:v mpeg4 YUV -c:a pcm_s16le
+flac_s16_44100_2ch_3.3s.flac       A44100:3.3 -ac 2 -c:a flac
+flac_s24_96000_1ch_0.5s.flac       A96000:0.5 -ac 1 -c:a flac -sample_fmt s32
+flac_tags_ffmpeg_22050_9.6s.flac   A22050:9.6 -c:a flac TAGS_UNI
+flac_s24_96000_2ch_61s.flac        A96000:61 -ac 2 -c:a flac -sample_fmt s32
+ogg_vorbis_q10_48000_2ch_61s.ogg   A48000:61 -ac 2 -c:a libvorbis -q:a 10
+ogg_vorbis_44100_2ch_9.6s.ogg      A44100:9.6 -ac 2 -c:a libvorbis
+ogg_vorbis_tags_ffmpeg.ogg         A22050:3.3 -c:a libvorbis TAGS_LATIN
+opus_48000_2ch_9.6s.opus           A48000:9.6 -ac 2 -c:a libopus
+opus_16000_1ch_tags_ffmpeg.opus    A16000:3.3 -c:a libopus TAGS_UNI
+oggflac_44100_2ch_3.3s.oga         A44100:3.3 -ac 2 -c:a flac -f ogg
+oggflac_tags_ffmpeg_48000.oga      A48000:0.5 -c:a flac -f ogg TAGS_UNI
+ogv_theora_vorbis_160x120_25fps.ogv  V160x120:25:3.3 A44100:3.3 -c:v libtheora -c:a libvorbis
+mkv_h264_aac_160x120_25fps.mkv     V160x120:25:3.3 A44100:3.3 H264 AAC2
+mkv_h264_opus_320x240_30fps_61s.mkv  V320x240:30:61 A48000:61 H264 -c:a libopus
+mkv_live_h264_aac_9.6s.mkv         V160x120:25:9.6 A44100:9.6 H264 AAC2 -live 1
+mkv_hevc_opus_160x120_25fps.mkv    V160x120:25:1 A48000:1 HEVC -c:a libopus
+mkv_av1_aac_160x120_25fps.mkv      V160x120:25:1 A44100:1 AV1 YUV AAC2
+webm_vp9_opus_160x120_25fps.webm   V160x120:25:1 A48000:1 VP9 -c:a libopus
+mkv_tags_cover_29.97fps.mkv        V176x144:30000/1001:3.3 A44100:3.3 H264 AAC2 TAGS_UNI ATTACH_PNG
+mka_vorbis_tags.mka                A44100:9.6 -c:a libvorbis TAGS_LATIN
+mka_flac_s24_48000.mka             A48000:3.3 -c:a flac -sample_fmt s32
+aiff_s16_44100_2ch_3.3s.aiff       A44100:3.3 -ac 2 -c:a pcm_s16be
+aiff_s24_96000_1ch_9.6s.aiff       A96000:9.6 -ac 1 -c:a pcm_s24be
+aiff_id3_ffmpeg.aiff               A44100:3.3 -c:a pcm_s16be -write_id3v2 1 TAGS_UNI
+aifc_f32_48000_2ch_3.3s.aifc       A48000:3.3 -ac 2 -c:a pcm_f32be -f aiff
+aifc_alaw_8000_1ch_3.3s.aifc       A8000:3.3 -c:a pcm_alaw -f aiff
 """
 GROUPS = {"YUV": ["-pix_fmt", "yuv420p"], "AAC2": ["-c:a", "aac", "-ac", "2"],
           "H264": ["-c:v", "libx264", "-preset", "ultrafast", "-pix_fmt", "yuv420p"],
+          "HEVC": ["-c:v", "libx265", "-preset", "ultrafast", "-x265-params", "log-level=error",
+                   "-pix_fmt", "yuv420p"],
+          "VP9": ["-c:v", "libvpx-vp9", "-deadline", "realtime", "-cpu-used", "8", "-pix_fmt",
+                  "yuv420p"],
+          "ATTACH_PNG": ["-attach", "{dir}/work/cover.png", "-metadata:s:t", "mimetype=image/png"],
           "TAGS_LATIN": meta_args(LATIN, "Pop"), "TAGS_UNI": meta_args(UNI, "Jazz")}
 AV1 = {"libsvtav1": ["-preset", "12"], "libaom-av1": ["-cpu-used", "8"], "librav1e": []}
 
@@ -164,37 +200,97 @@ TAGGED = {
     "m4a_tags_cover.m4a": ("ffmpeg A44100:3.3 AAC2", "mp4", UNI, "Jazz", 4, 3, "png", None),
     "m4a_tags_jpeg.m4a": ("ffmpeg A22050:9.6 -c:a aac", "mp4", LATIN, "Rock", 4, 3, "jpeg", None),
     "wav_id3.wav": ("ffmpeg A44100:3.3 -c:a pcm_s16le", "id3", UNI, "Pop", 3, 1, None, None),
+    "aiff_id3_cover.aiff": ("ffmpeg A44100:3.3 -c:a pcm_s16be", "id3", UNI, "Jazz", 3, 1, "png",
+                            None),
+    "flac_after_id3v2.flac": ("ffmpeg A44100:3.3 -c:a flac", "id3", LATIN, "Pop", 4, 3, None, None),
+    "flac_vc_cover.flac": ("ffmpeg A44100:3.3 -ac 2 -c:a flac", "vc", UNI, "Jazz", 0, 0, "png",
+                           None),
+    "flac_s24_vc_48000.flac": ("ffmpeg A48000:9.6 -c:a flac -sample_fmt s32", "vc", LATIN, "Rock",
+                               0, 0, None, None),
+    "ogg_vorbis_vc_cover.ogg": ("ffmpeg A44100:3.3 -c:a libvorbis", "vc", UNI, "Jazz", 0, 0, "jpeg",
+                                None),
+    "opus_vc.opus": ("ffmpeg A48000:3.3 -c:a libopus", "vc", LATIN, "Pop", 0, 0, None, None),
+    "opus_vc_cover.opus": ("ffmpeg A48000:0.5 -ac 2 -c:a libopus", "vc", UNI, "Rock", 0, 0, "png",
+                           None),
+    "oggflac_vc_cover.oga": ("ffmpeg A44100:3.3 -c:a flac -f ogg", "vc", UNI, "Blues", 0, 0, "png",
+                             None),
+    "mp3_ape.mp3": (MP3_BASE, "ape", UNI, "Jazz", 0, 0, "jpeg", None),
+    "mp3_ape_id3v1.mp3": (MP3_BASE, "ape", LATIN, "Rock", 1, 0, None, None),
 }
 
 
+def id3v1(values, genre):
+    """A 128-byte ID3v1.1 tag of the same values, cut to its field sizes."""
+    def text(key, size):
+        return values[key].encode("latin-1", "replace")[:size].ljust(size, b"\0")
+    return (b"TAG" + text("title", 30) + text("artist", 30) + text("album", 30) +
+            values["date"][:4].encode() + text("comment", 28) +
+            bytes([0, int(values["track"].split("/")[0]), ID3_GENRES.index(genre)]))
+
+
 def write_tags(path, covers, kind, text, genre, version, enc, cover, padding):
-    """mutagen where present (it chooses text encodings and padding), else ffmpeg's writer."""
+    """mutagen where present (it chooses text encodings and padding), else ffmpeg's writer.
+    kind: "id3", "mp4", "vc" (Vorbis comments: FLAC, Ogg), "ape" (version 1: after an ID3v1)."""
     if mutagen is None:
+        if kind == "ape":
+            raise RuntimeError("APE tags need mutagen")
         tmp = path + ".tmp" + os.path.splitext(path)[1]
-        ver = ["-id3v2_version", str(version)] if kind != "mp4" else []
+        ver = ["-id3v2_version", str(version)] if kind == "id3" else []
         run(["ffmpeg", "-v", "error", "-y", "-i", path, "-c", "copy", *ver,
              *meta_args(text, genre), tmp], check=True)
         return os.replace(tmp, path)
     values = tag_values(text, genre)
-    f = (mutagen.mp4.MP4 if kind == "mp4" else mutagen.wave.WAVE if path.endswith(".wav")
-         else mutagen.mp3.MP3)(path)
-    if f.tags is None:
+    mime, data = "image/" + (cover or ""), covers.get(cover)
+    if kind == "ape":
+        tags = mutagen.apev2.APEv2()
+        for field, val in values.items():
+            tags[TAG_KEYS[field][5]] = val
+        if cover:
+            tags["Cover Art (Front)"] = mutagen.apev2.APEValue(
+                b"cover." + cover.encode() + b"\0" + data, mutagen.apev2.BINARY)
+        tags.save(path)
+        if version == 1:  # mutagen would put a new APE tag after an ID3v1 tag
+            with open(path, "ab") as out:
+                out.write(id3v1(values, genre))
+        return
+    cls = {"mp4": mutagen.mp4.MP4, "vc": mutagen.File}.get(kind) or {
+        ".wav": mutagen.wave.WAVE, ".aiff": mutagen.aiff.AIFF, ".mp3": mutagen.mp3.MP3}.get(
+        os.path.splitext(path)[1])
+    f = cls(path) if cls else None  # else an ID3v2 tag put before the file's own bytes
+    if f is not None and f.tags is None:
         f.add_tags()
     if kind == "mp4":
         for field, val in values.items():
             key = TAG_KEYS[field][2]
             f.tags[key] = [tuple(map(int, val.split("/")))] if key in ("trkn", "disk") else [val]
         if cover:
-            f.tags["covr"] = [mutagen.mp4.MP4Cover(covers[cover], {"png": 14, "jpeg": 13}[cover])]
+            f.tags["covr"] = [mutagen.mp4.MP4Cover(data, {"png": 14, "jpeg": 13}[cover])]
         return f.save()
+    if kind == "vc":
+        for field, val in values.items():
+            num, _, total = val.partition("/") if field in ("track", "disc") else (val, "", "")
+            f.tags[TAG_KEYS[field][4]] = [num]
+            if total:
+                f.tags[field.upper() + "TOTAL"] = [total]
+        if cover:
+            pic = mutagen.flac.Picture()
+            pic.type, pic.mime, pic.desc, pic.data = 3, mime, "cover", data
+            if isinstance(f, mutagen.flac.FLAC):
+                f.add_picture(pic)
+            else:
+                f.tags["METADATA_BLOCK_PICTURE"] = [base64.b64encode(pic.write()).decode()]
+        return f.save()
+    tags = f.tags if f is not None else mutagen.id3.ID3()
     for field, val in values.items():
         fid = TAG_KEYS[field][1]
         extra = {"lang": "eng", "desc": ""} if fid == "COMM" else {}
-        f.tags.add(getattr(mutagen.id3, fid)(encoding=enc, text=[val], **extra))
+        tags.add(getattr(mutagen.id3, fid)(encoding=enc, text=[val], **extra))
     if cover:
-        f.tags.add(mutagen.id3.APIC(encoding=enc, mime="image/" + cover, type=3, desc="cover",
-                                    data=covers[cover]))
-    f.save(v2_version=version, padding=None if padding is None else (lambda info: padding))
+        tags.add(mutagen.id3.APIC(encoding=enc, mime=mime, type=3, desc="cover", data=data))
+    pad = None if padding is None else (lambda info: padding)
+    if f is None:
+        return tags.save(path, v2_version=version, padding=pad)
+    f.save(v2_version=version, padding=pad)
 
 
 def lame(name, rate, ch, dur, opts):
@@ -230,9 +326,10 @@ def recipes(encoders):
         tool, *words = base.split()
         out.append(ffmpeg(name, words, groups) if tool == "ffmpeg" else
                    lame(name, int(words[0]), words[1], words[2], " ".join(words[3:])))
-    out.append(("wav_sox_s24_96000_2ch_0.5s.wav", [
-        ["sox", "-n", "-r", "96000", "-c", "2", "-b", "24", "{out}", "synth", "0.5", "sine", "440"]],
-        {"sox"}))
+    out += [(name, [["sox", "-n", *opts.split(), "{out}", "synth", "0.5", "sine", "440"]], {"sox"})
+            for name, opts in (("wav_sox_s24_96000_2ch_0.5s.wav", "-r 96000 -c 2 -b 24"),
+                               ("aifc_sox_s16_22050_2ch_0.5s.aifc", "-r 22050 -c 2 -b 16"),
+                               ("aifc_sox_s8_8000_1ch_0.5s.aifc", "-r 8000 -c 1 -b 8"))]
     return out
 
 
@@ -327,11 +424,11 @@ def tag_fields(raw):
     year comes from the date, numeric ID3 genres become names."""
     out = {"tags." + k: raw.get(k) for k in TAG_KEYS if k not in ("track", "disc")}
     out["tags.genre"] = genre_name(raw.get("genre"))
-    for field, total in (("track", "tags.track_total"), ("disc", None)):
+    for field in ("track", "disc"):
         num, _, tot = str(raw.get(field) or "").partition("/")
         out["tags." + field] = num or None
-        if total:
-            out[total] = tot or None
+        if field == "track":
+            out["tags.track_total"] = tot or raw.get("track_total")
     year = re.match(r"\s*(\d{4})", str(raw.get("date") or ""))
     out["tags.year"] = year.group(1) if year else None
     return out
@@ -374,25 +471,36 @@ def from_ffprobe(path):
 
 
 def mutagen_tags(tags):
-    """(raw tag texts by field, picture count) from ID3, MP4 and ASF tags."""
+    """(raw tag texts by field, picture count) from ID3, MP4, ASF, Vorbis comment and APE tags."""
     kind = type(tags).__name__
+
+    def pick(get, column):
+        return {f: next(filter(None, map(get, k[column].split("|"))), None)
+                for f, k in TAG_KEYS.items() if k[column]}
     if isinstance(tags, mutagen.id3.ID3):
         def get(key):
             frames = tags.getall(key)
             if key == "COMM":
                 frames = [f for f in frames if not f.desc] or frames
             return str(frames[0].text[0]) if frames and frames[0].text else None
-        return {f: get(k[1]) for f, k in TAG_KEYS.items()}, len(tags.getall("APIC"))
+        return pick(get, 1), len(tags.getall("APIC"))
     if kind == "MP4Tags":
         def get(key):
             value = (tags.get(key) or [None])[0]
             return "/".join(map(str, value)) if isinstance(value, tuple) else value
-        return {f: get(k[2]) for f, k in TAG_KEYS.items()}, len(tags.get("covr") or [])
+        return pick(get, 2), len(tags.get("covr") or [])
     if kind == "ASFTags":
         def get(key):
             values = tags.get(key) or []
             return str(values[0].value) if values else None
-        return {f: get(k[3]) for f, k in TAG_KEYS.items()}, len(tags.get("WM/Picture") or [])
+        return pick(get, 3), len(tags.get("WM/Picture") or [])
+    if isinstance(tags, mutagen._vorbis.VCommentDict):
+        return (pick(lambda key: (tags.get(key) or [None])[0], 4),
+                len(tags.get("METADATA_BLOCK_PICTURE") or []))
+    if isinstance(tags, mutagen.apev2.APEv2):
+        text = {k: str(v) for k, v in tags.items() if v.kind == mutagen.apev2.TEXT}
+        return pick(lambda key: text.get(key), 5), sum(
+            k.lower().startswith("cover art") for k in tags.keys())
     return {}, None
 
 
@@ -406,13 +514,24 @@ def from_mutagen(path):
     info, kind = f.info, type(f).__name__
     codec = str(getattr(info, "codec", "")).lower()
     out = {field: getattr(info, name, None) for field, name in MUTAGEN_INFO.items()}
-    out["audio.codec"] = {"MP3": f"mp{getattr(info, 'layer', 3)}", "AAC": "aac", "FLAC": "flac"}.get(
+    out["audio.codec"] = {"MP3": f"mp{getattr(info, 'layer', 3)}", "AAC": "aac", "FLAC": "flac",
+                          "OggFLAC": "flac", "OggVorbis": "vorbis", "OggOpus": "opus"}.get(
         kind, next((v for k, v in MP4_CODECS.items() if codec.startswith(k)), None))
     if codec.startswith("mp4a.40."):
         out["audio.profile"] = AAC_PROFILES.get(codec.rsplit(".", 1)[1])
     raw, pictures = mutagen_tags(f.tags) if f.tags is not None else ({}, 0)
+    if kind == "MP3":  # an APE tag at the end ranks below ID3v2 and above ID3v1, as in TagLib
+        try:
+            ape, ape_pictures = mutagen_tags(mutagen.apev2.APEv2(path))
+            first, then = (ape, raw) if getattr(f.tags, "version", None) == (1, 1) else (raw, ape)
+            raw = {k: first.get(k) or then.get(k) for k in TAG_KEYS}
+            pictures += ape_pictures
+        except mutagen.apev2.error:
+            pass
+    if kind == "OggTheora":  # mutagen sees the video stream only
+        out["audio.bit_rate"], out["video.frame_rate"] = None, info.fps
     out.update(tag_fields(raw))
-    out["pictures"] = pictures
+    out["pictures"] = pictures + len(getattr(f, "pictures", None) or [])
     return out
 
 

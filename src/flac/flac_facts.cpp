@@ -135,12 +135,13 @@ int32_t FlacFacts(const char* path, int /*type*/, MediaFacts* facts) {
     s.sampleRate = f.rate;
     s.channels = f.channels;
     s.bitsPerSample = f.bits;
-    facts->streams.push_back(s);
     if (f.samples != 0 && f.rate != 0) {
         facts->durationUs = static_cast<int64_t>(f.samples * 1000000 / f.rate);
         facts->durationExact = true;
-        facts->bitRate = (size - f.audioStart) * 8 * f.rate / f.samples;
+        // The frames' bytes over the play time: the stream's own average rate.
+        s.bitRate = static_cast<uint64_t>(static_cast<long double>(size - f.audioStart) * 8 * f.rate / f.samples);
     }
+    facts->streams.push_back(s);
     return MM_OK;
 }
 

@@ -71,7 +71,8 @@ void YearFromDate(TagFacts* t) {
 
 }  // namespace
 
-bool ReadId3Facts(const char* path, TagFacts* tags, std::vector<PictureFacts>* pictures, uint64_t* tagEnd) {
+bool ReadId3Facts(const char* path, TagFacts* tags, std::vector<PictureFacts>* pictures, uint64_t* tagEnd,
+                  const TagFacts* beforeV1) {
     *tagEnd = 0;
     const int h = path != nullptr ? MEx_fopen(path, "rb") : 0;
     if (h == 0) return true;
@@ -82,6 +83,10 @@ bool ReadId3Facts(const char* path, TagFacts* tags, std::vector<PictureFacts>* p
     bool memory = true;
     try {
         if (*tagEnd > 0) memory = ReadId3V2Facts(h, fileSize, 0, tags, pictures);
+        if (beforeV1 != nullptr) {
+            YearFromDate(tags);
+            tags->FillFrom(*beforeV1);
+        }
         ReadV1(h, fileSize, *tagEnd, tags);
         YearFromDate(tags);
     } catch (const std::bad_alloc&) {

@@ -14,7 +14,10 @@ namespace metainfo {
 // the v2 tags at the start take (footers and tags repeated behind the first
 // included): where the audio starts. False only when memory runs out; a file
 // without tags (or that cannot be read) leaves tags and pictures as they are.
-bool ReadId3Facts(const char* path, TagFacts* tags, std::vector<PictureFacts>* pictures, uint64_t* tagEnd);
+// `beforeV1` (an APE tag's texts) fills what the v2 tag lacks ahead of the v1
+// tag, whose fields are short Latin-1 texts and a bare year.
+bool ReadId3Facts(const char* path, TagFacts* tags, std::vector<PictureFacts>* pictures, uint64_t* tagEnd,
+                  const TagFacts* beforeV1 = nullptr);
 
 // Fills tags and pictures from an ID3v2 tag at `offset` inside another
 // container (a WAVE "id3 " chunk). False only when memory runs out.

@@ -1,5 +1,8 @@
 #include "probe/facts_readers.h"
 
+#include <new>
+#include <vector>
+
 #include "aac/aac_facts.h"
 #include "asf/asf_facts.h"
 #include "avi/avi_queries.h"
@@ -27,14 +30,20 @@ using FactsReader = int32_t (*)(const char* path, int type, MediaFacts* facts);
 
 int32_t ReadWave(const char* path, int /*type*/, MediaFacts* facts) { return WaveFacts(path, facts); }
 // ADTS and MPEG audio carry ID3 tags: before the stream, and ID3v1 at its end;
-// an APE tag at the end fills what the ID3 tags lack.
+// an APE tag at the end fills what the ID3v2 tag lacks, ahead of the ID3v1 tag.
 int32_t WithId3Tags(int32_t read, const char* path, MediaFacts* facts) {
     if (read != MM_OK) return read;
     uint64_t tagEnd = 0;
     TagFacts ape;
-    if (!ReadId3Facts(path, &facts->tags, &facts->pictures, &tagEnd) || !ReadApeFacts(path, &ape, &facts->pictures))
+    std::vector<PictureFacts> apePictures;
+    try {
+        if (!ReadApeFacts(path, &ape, &apePictures) ||
+            !ReadId3Facts(path, &facts->tags, &facts->pictures, &tagEnd, &ape))
+            return MM_E_OUTOFMEMORY;
+        facts->pictures.insert(facts->pictures.end(), apePictures.begin(), apePictures.end());
+    } catch (const std::bad_alloc&) {
         return MM_E_OUTOFMEMORY;
-    facts->tags.FillFrom(ape);
+    }
     return MM_OK;
 }
 
