@@ -104,11 +104,12 @@ int AccurateMediaType(const char* path) {
     uint8_t head[kHeadBytes];
     const size_t n = ReadHead(path, head);
     if (IsRf64Wave(head, n)) return MEDIA_TYPE_WAVE;
-    if (LooksLikeAdts(path)) return MEDIA_TYPE_AAC;
+    // The formats known by their first bytes before ADTS, which has no
+    // signature and is looked for in the file's first 64 KiB.
     for (const AccurateFormat& f : kAccurateFormats) {
         if (f.looksLike != nullptr && f.reader != nullptr && f.looksLike(path, head, n)) return f.type;
     }
-    return MEDIA_TYPE_UNKNOWN;
+    return LooksLikeAdts(path) ? MEDIA_TYPE_AAC : MEDIA_TYPE_UNKNOWN;
 }
 
 int32_t ReadFacts(const char* path, int type, MediaFacts* facts) {
