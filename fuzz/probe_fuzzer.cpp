@@ -12,16 +12,7 @@ const char* const kSuffixes[] = {".mp3", ".aac", ".m4a", ".wma", ".wav", ".amr",
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
     fuzz::InputFile input(data, size);
     const std::string path = input.Path(kSuffixes[input.Tail() & 7]);
-    mi_info* info = nullptr;
-    if (mi_probe(path.c_str(), &info) == MI_OK) {
-        for (size_t i = 0; i < info->picture_count; ++i) {
-            size_t bytes = 0;
-            if (mi_picture_copy(path.c_str(), info, i, nullptr, 0, &bytes) != MI_E_BUFFER || bytes > size) continue;
-            std::string copy(bytes, '\0');
-            mi_picture_copy(path.c_str(), info, i, &copy[0], copy.size(), &bytes);
-        }
-        mi_info_free(info);
-    }
+    fuzz::ProbeAndCopy(path, size);
     const int64_t start = size >= 2 ? data[size - 2] * 100 : 0;
     mi_cut(path.c_str(), start, start + 1 + (size >= 1 ? data[size - 1] * 100 : 0), input.OutputPath(".out").c_str());
     return 0;

@@ -16,7 +16,7 @@ set -euo pipefail
 root=$(cd "$(dirname "$0")/.." && pwd)
 build=${FUZZ_BUILD:-$root/build-fuzz}
 work=${FUZZ_WORK:-$build/fuzz-work}
-all_targets=(detect mp3 mp4 aac asf realmedia avi speech extract avi_parser mp4_maker probe)
+all_targets=(detect mp3 mp4 aac asf realmedia avi speech extract avi_parser mp4_maker probe flac ogg matroska aiff ape)
 seconds=60
 jobs=1
 build_first=1
@@ -35,7 +35,10 @@ usage() { sed -n '2,16p' "$0" | sed 's/^# \{0,1\}//'; exit 2; }
 # targets that see every format.
 dicts_of() {
   case $1 in
-    detect | probe) echo mp3 aac mp4 asf realmedia avi speech ;;
+    detect) echo mp3 aac mp4 asf realmedia avi speech ;;
+    probe) echo mp3 aac mp4 asf realmedia avi speech flac ogg matroska aiff ape ;;
+    ogg) echo ogg flac ;;
+    ape) echo ape mp3 aac ;;
     extract) echo mp3 aac speech ;;
     avi_parser) echo avi ;;
     mp4_maker) echo mp4 ;;
@@ -231,7 +234,9 @@ main() {
 
   echo "== seeds"
   rm -rf "$work/seeds"
-  "$bin/metainfo_make_seeds" "$work/seeds" "$root/samples" "$root/../shared/corpus"
+  rm -rf "$work/media"
+  "$root/fuzz/make_media.sh" "$work/media"
+  "$bin/metainfo_make_seeds" "$work/seeds" "$root/samples" "$work/media" "$root/../shared/corpus"
   mkdir -p "$work/dicts"
   for t in "${targets[@]}"; do
     : >"$work/dicts/$t.dict"

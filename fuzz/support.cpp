@@ -14,6 +14,7 @@
 #include <vector>
 
 #include "core/thread_state.h"
+#include "metainfo/probe.h"
 
 namespace fuzz {
 namespace {
@@ -305,6 +306,23 @@ void FuzzFamily(const uint8_t* data, size_t size, const Variant* variants, size_
     }
     QueryAll(input.Path(pick->suffix), pick->type);
     QueryAll(input.ProtectedPath(), pick->type);
+}
+
+void ProbeAndCopy(const std::string& path, size_t inputSize) {
+    mi_info* info = nullptr;
+    if (mi_probe(path.c_str(), &info) != MI_OK) return;
+    for (size_t i = 0; i < info->picture_count; ++i) {
+        size_t bytes = 0;
+        if (mi_picture_copy(path.c_str(), info, i, nullptr, 0, &bytes) != MI_E_BUFFER || bytes > inputSize) continue;
+        std::string copy(bytes, '\0');
+        if (mi_picture_copy(path.c_str(), info, i, &copy[0], copy.size(), &bytes) == MI_OK) Touch(copy.data(), bytes);
+    }
+    mi_info_free(info);
+}
+
+void FuzzProbe(const uint8_t* data, size_t size, const char* const* suffixes, size_t count) {
+    InputFile input(data, size);
+    ProbeAndCopy(input.Path(suffixes[input.Tail() % count]), size);
 }
 
 }  // namespace fuzz

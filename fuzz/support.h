@@ -75,6 +75,19 @@ void FuzzFamily(const uint8_t* data, size_t size, const Variant (&variants)[N]) 
     FuzzFamily(data, size, variants, N);
 }
 
+// The accurate interface on path: mi_probe, then every picture it finds
+// copied (a picture announced larger than the input is not copied).
+void ProbeAndCopy(const std::string& path, size_t inputSize);
+
+// A format's accurate reader: the input under the suffix its tail byte picks,
+// probed and its pictures copied.
+void FuzzProbe(const uint8_t* data, size_t size, const char* const* suffixes, size_t count);
+
+template <size_t N>
+void FuzzProbe(const uint8_t* data, size_t size, const char* const (&suffixes)[N]) {
+    FuzzProbe(data, size, suffixes, N);
+}
+
 }  // namespace fuzz
 
 // Removes this process's scratch files (also called by the replay driver when

@@ -93,6 +93,7 @@ TEST(AccurateFlac, ApeTagsFillWhatId3Lacks) {
                               {"Mood", Bytes().str("calm")},
                               {"Cover Art (Front)", Bytes().str("cover.png").u8(0).raw(kPng), true},
                               {"Cover Art (Back)", Bytes().str("no separator"), true}});
+    const Bytes bigCover = Bytes().str("c.png").u8(0).raw(kPng).zeros(40000);
     const std::vector<Row> rows = {
         {"ID3v2, APEv2, ID3v1", Cat({id3.data(), audio.data(), ape.data(), Id3v1Titled("V1")}),
          "mp3 audio/mpeg 1045 | mp3 44100x2x0 128000 | Id3 title;A;;AA;;2001-02;2001;3/11;2/0;; Mood=calm | "
@@ -100,6 +101,11 @@ TEST(AccurateFlac, ApeTagsFillWhatId3Lacks) {
         {"an APE tag ranks above the ID3v1 tag after it", Cat({audio.data(), ape.data(), Id3v1Titled("V1")}),
          "mp3 audio/mpeg 1045 | mp3 44100x2x0 128000 | Ape title;A;;AA;;2001-02;2001;3/11;2/0;; Mood=calm | "
          "image/png 3 cover.png 6 89504e47"},
+        // Over 1 MiB of frames the length comes from the stream's bytes: both tags are left out.
+        {"APEv2 then ID3v1 (as mutagen writes them), no ID3v2",
+         Cat({Mp3Frames(2600), ApeTag({{"Artist", Bytes().str("A")}, {"Cover Art (Front)", bigCover, true}}).data(),
+              Id3v1Titled("V1")}),
+         "mp3 audio/mpeg 67763~ | mp3 44100x2x0 128000 | V1;A;;;;;0;0/0;0/0;; | image/png 3 c.png 40006 89504e47"},
         {"APEv1 alone at the end", Cat({audio.data(), ApeTag({{"Title", Bytes().str("T1")}}, 1000)}),
          "mp3 audio/mpeg 1045 | mp3 44100x2x0 128000 | T1;;;;;;0;0/0;0/0;;"},
         {"a tag size past the start of the file",

@@ -135,6 +135,7 @@ TEST(AccurateMatroska, FileFacts) {
     // A TrackEntry whose size passes the end of Tracks is left out.
     Bytes cut = Ebml(kTracks, Bytes().raw(Audio("A_PCM/INT/LIT", Bytes(), 8000, 1, 16)).raw(avc));
     cut.data()[4] = static_cast<uint8_t>(0x80 | (cut.size() - 5 - 10));
+    const Bytes void1M = Ebml(0xEC, Bytes().zeros(1 << 20));
     const Bytes badHeader = Bytes().u8(0x1A).u8(0x45).u8(0xDF).u8(0xA3).u8(0x00).fill(40, 0);
     const std::vector<Row> rows = {
         {"h264 and AAC with tags and a cover",
@@ -156,6 +157,13 @@ TEST(AccurateMatroska, FileFacts) {
         {"no Duration, Clusters of unknown size",
          Mkv("webm", {Info(-1), flac, Cluster(0, 0, true), Cluster(3000, 7, true)}, true), MI_OK,
          "webm audio/webm 3007~ | flac//-1 96000x2x24 | Segment title;;;0;0/0"},
+        // Over 1 MiB only the last 60 KiB is searched for the last Cluster.
+        {"no Duration, over 1 MiB: the last Cluster near the end",
+         Mkv("webm", {Info(-1), flac, Cluster(0, 0), void1M, Cluster(9000, 40)}), MI_OK,
+         "webm audio/webm 9040~ | flac//-1 96000x2x24 | Segment title;;;0;0/0"},
+        {"no Duration, over 1 MiB: no Cluster near the end",
+         Mkv("webm", {Info(-1), flac, Cluster(0, 0), Cluster(9000, 40), void1M}), MI_OK,
+         "webm audio/webm -1~ | flac//-1 96000x2x24 | Segment title;;;0;0/0"},
         {"a TrackEntry past its parent", Mkv("matroska", {Info(10), cut}), MI_OK,
          "matroska audio/x-matroska 10 | pcm_s16le//-1 8000x1x16 | Segment title;;;0;0/0"},
         {"an EBML size of no length", badHeader, MI_E_NOT_MEDIA, ""},

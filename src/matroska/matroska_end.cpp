@@ -1,7 +1,10 @@
 // Where the last frame of a Matroska file lies when Info states no
 // Duration: the last Cluster, reached by hopping over Cluster sizes (from the
 // latest one the Cues name) or, where a Cluster's size is unknown, looked for
-// backwards from the end; then its blocks one header at a time.
+// backwards from the end; then its blocks one header at a time. A Segment over
+// 1 MiB is only looked at in its last 60 KiB (64 KiB with the file's first
+// 4 KiB): hopping over its Clusters would read a header per Cluster all through
+// the file. Without a Cluster there, the latest cue's time stands, or none.
 #include <vector>
 
 #include "matroska/ebml.h"
@@ -14,6 +17,8 @@ constexpr int kMaxHops = 1 << 16;
 constexpr int kMaxBlocks = 1 << 16;
 constexpr int kMaxTailBlocks = 16;
 constexpr uint64_t kTailBlock = uint64_t{64} << 10;
+constexpr uint64_t kLargeSegment = uint64_t{1} << 20;
+constexpr uint64_t kLargeTail = uint64_t{60} << 10;
 constexpr size_t kBlockHead = 32;
 
 // The relative timecode of a Block or SimpleBlock: after its track number.
@@ -70,13 +75,13 @@ bool LastBlockTime(int h, uint64_t pos, uint64_t end, uint64_t* ticks) {
     return true;
 }
 
-// The last Cluster ID in the last kMaxTailBlocks blocks that reads as one.
-bool TailClusterTime(int h, uint64_t segment, uint64_t end, uint64_t* ticks) {
+// The last Cluster ID in the last blocks (at most maxBlocks) that reads as one.
+bool TailClusterTime(int h, uint64_t segment, uint64_t end, uint64_t blockSize, int maxBlocks, uint64_t* ticks) {
     std::vector<uint8_t> block;
     uint64_t blockEnd = end;
-    for (int i = 0; i < kMaxTailBlocks && blockEnd > segment; ++i) {
-        const uint64_t start = blockEnd - segment > kTailBlock ? blockEnd - kTailBlock : segment;
-        if (!EbmlReadBody(h, start, blockEnd - start, kTailBlock, &block) || block.size() < 4) return false;
+    for (int i = 0; i < maxBlocks && blockEnd > segment; ++i) {
+        const uint64_t start = blockEnd - segment > blockSize ? blockEnd - blockSize : segment;
+        if (!EbmlReadBody(h, start, blockEnd - start, blockSize, &block) || block.size() < 4) return false;
         for (size_t at = block.size() - 3; at-- > 0;) {
             const bool id =
                 block[at] == 0x1F && block[at + 1] == 0x43 && block[at + 2] == 0xB6 && block[at + 3] == 0x75;
@@ -91,6 +96,7 @@ bool TailClusterTime(int h, uint64_t segment, uint64_t end, uint64_t* ticks) {
 }  // namespace
 
 bool MkvLastFrameTime(int h, uint64_t from, uint64_t segment, uint64_t end, uint64_t* ticks) {
+    if (end - segment > kLargeSegment) return TailClusterTime(h, segment, end, kLargeTail, 1, ticks);
     uint64_t last = 0, pos = from;
     bool found = false, open = false;
     EbmlElement e;
@@ -105,7 +111,7 @@ bool MkvLastFrameTime(int h, uint64_t from, uint64_t segment, uint64_t end, uint
         }
         pos += e.headerSize + e.size;
     }
-    if (open && TailClusterTime(h, segment, end, ticks)) return true;
+    if (open && TailClusterTime(h, segment, end, kTailBlock, kMaxTailBlocks, ticks)) return true;
     return found && LastBlockTime(h, last, end, ticks);
 }
 

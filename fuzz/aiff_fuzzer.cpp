@@ -1,0 +1,12 @@
+// AIFF and AIFC files through the accurate interface. The input's last byte picks the
+// suffix, and every picture found is copied.
+#include "support.h"
+
+namespace {
+const char* const kSuffixes[] = {".aiff", ".aifc", ".aif"};
+}
+
+extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
+    fuzz::FuzzProbe(data, size, kSuffixes);
+    return 0;
+}
