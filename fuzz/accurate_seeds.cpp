@@ -43,7 +43,7 @@ Bytes Prefixed(const std::string& prefix, const Bytes& body) { return Bytes().st
 Bytes Ogg(const std::string& codec) {
     std::vector<std::string> comments = kComments;
     comments.push_back("METADATA_BLOCK_PICTURE=" + Base64Picture(3, "image/png", "front", kPng.data()));
-    const Bytes body = VorbisCommentBody(comments), audio = Bytes().fill(200, 0x55);
+    const Bytes body = VorbisComments(comments), audio = Bytes().fill(200, 0x55);
     if (codec == "opus") {
         return OggStreamPages(1, {OpusHeadPacket(2, 312, 48000), Prefixed("OpusTags", body), audio, audio}, 4, 48312);
     }
