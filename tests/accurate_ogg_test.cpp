@@ -21,6 +21,27 @@ Bytes FlacBlock(uint8_t header, const Bytes& body) {
     return Bytes().u8(header).be24(static_cast<uint32_t>(body.size())).raw(body);
 }
 
+// Theora 3.2.1, 160x120 in 10x8 macroblocks, 25 fps, keyframe shift 6.
+Bytes TheoraIdPacket() {
+    return Bytes()
+        .str("\x80theora")
+        .u8(3)
+        .u8(2)
+        .u8(1)
+        .be16(10)
+        .be16(8)
+        .be24(160)
+        .be24(120)
+        .be16(0)
+        .be32(25)
+        .be32(1)
+        .be24(1)
+        .be24(1)
+        .u8(0)
+        .be24(0)
+        .be16(6 << 5);
+}
+
 const std::vector<std::string> kTags = {"TITLE=T",     "ARTIST=Ar",       "album=Al",         "ALBUMARTIST=AA",
                                         "GENRE=Rock",  "DATE=2019-02-03", "TRACKNUMBER=3/11", "DISCNUMBER=1",
                                         "DISCTOTAL=2", "DESCRIPTION=D",   "COMPOSER=C",       "mood=Happy"};
@@ -87,6 +108,9 @@ TEST(AccurateOgg, FactsOfBuiltPages) {
              3, {FlacMappingPacket(32000, 1, 24), FlacBlock(0x84, VorbisCommentBody(kTags)), Bytes{0xFF, 0xF8, 0}}, 255,
              48000),
          "ogg audio/ogg 1500 | flac 32000x1x24 0" + kTagSummary},
+        {"theora's frames (keyframe 99, one after it) outlast the vorbis stream",
+         Bytes(OggStreamPages(5, {TheoraIdPacket()}, 255, (99 << 6) + 1)).raw(Vorbis(255, {"TITLE=T"}, 44100)),
+         "ogg video/ogg 4000 | theora 0x0x0 0 | vorbis 44100x2x0 128000 | T;;;;;;0;0/0;0/0;;"},
         {"a last page cut short: the page before it counts", truncated,
          "ogg audio/ogg 2000 | vorbis 44100x2x0 128000 | T;;;;;;0;0/0;0/0;;"},
         {"no codec this reader knows", OggStreamPages(5, {Bytes().str("\x7Funknown").zeros(40)}, 255, 0), "8"},
