@@ -21,25 +21,10 @@ Bytes FlacBlock(uint8_t header, const Bytes& body) {
     return Bytes().u8(header).be24(static_cast<uint32_t>(body.size())).raw(body);
 }
 
-// Theora 3.2.1, 160x120 in 10x8 macroblocks, 25 fps, keyframe shift 6.
+// Theora 3.2.1: 10x8 macroblocks, 160x120, 25/1 fps, aspect 1:1, keyframe shift 6.
 Bytes TheoraIdPacket() {
-    return Bytes()
-        .str("\x80theora")
-        .u8(3)
-        .u8(2)
-        .u8(1)
-        .be16(10)
-        .be16(8)
-        .be24(160)
-        .be24(120)
-        .be16(0)
-        .be32(25)
-        .be32(1)
-        .be24(1)
-        .be24(1)
-        .u8(0)
-        .be24(0)
-        .be16(6 << 5);
+    return Bytes().str("\x80theora").raw(Bytes{3,  2, 1, 0, 10, 0, 8, 0, 0, 160, 0, 0, 120, 0, 0, 0, 0,     0,
+                                               25, 0, 0, 0, 1,  0, 0, 1, 0, 0,   1, 0, 0,   0, 0, 0, 6 << 5});
 }
 
 const std::vector<std::string> kTags = {"TITLE=T",     "ARTIST=Ar",       "album=Al",         "ALBUMARTIST=AA",
