@@ -19,6 +19,12 @@ namespace {
 Bytes Prefixed(const std::string& prefix, const Bytes& body) { return Bytes().str(prefix).raw(body); }
 Bytes Audio(size_t n) { return Bytes().fill(n, 0x55); }
 
+// Theora 3.2.1: 10x8 macroblocks, 160x120, 25/1 fps, aspect 1:1, keyframe shift 6.
+Bytes TheoraIdPacket() {
+    return Bytes().str("\x80theora").raw(Bytes{3,  2, 1, 0, 10, 0, 8, 0, 0, 160, 0, 0, 120, 0, 0, 0, 0,     0,
+                                               25, 0, 0, 0, 1,  0, 0, 1, 0, 0,   1, 0, 0,   0, 0, 0, 6 << 5});
+}
+
 const std::vector<std::string> kTags = {"TITLE=T",     "ARTIST=Ar",       "album=Al",         "ALBUMARTIST=AA",
                                         "GENRE=Rock",  "DATE=2019-02-03", "TRACKNUMBER=3/11", "DISCNUMBER=1",
                                         "DISCTOTAL=2", "DESCRIPTION=D",   "COMPOSER=C",       "mood=Happy"};
@@ -85,6 +91,9 @@ TEST(AccurateOgg, FactsOfBuiltPages) {
              3, {FlacMappingPacket(32000, 1, 24), FlacBlock(4, VorbisComments(kTags), true), Bytes{0xFF, 0xF8, 0}}, 255,
              48000),
          "ogg audio/ogg 1500 | flac 32000x1x24 0" + kTagSummary},
+        {"theora's frames (keyframe 99, one after it) outlast the vorbis stream",
+         Bytes(OggStreamPages(5, {TheoraIdPacket()}, 255, (99 << 6) + 1)).raw(Vorbis(255, {"TITLE=T"}, 44100)),
+         "ogg video/ogg 4000 | theora 0x0x0 0 | vorbis 44100x2x0 128000 | T;;;;;;0;0/0;0/0;;"},
         {"a last page cut short: the page before it counts", truncated,
          "ogg audio/ogg 2000 | vorbis 44100x2x0 128000 | T;;;;;;0;0/0;0/0;;"},
         {"no codec this reader knows", OggStreamPages(5, {Bytes().str("\x7Funknown").zeros(40)}, 255, 0), "8"},

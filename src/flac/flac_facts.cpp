@@ -9,6 +9,7 @@
 #include "core/text.h"
 #include "flac/vorbis_comment.h"
 #include "metainfo/metainfo.h"
+#include "mp3/id3_facts.h"
 
 namespace metainfo {
 namespace {
@@ -125,6 +126,13 @@ int32_t FlacFacts(const char* path, int /*type*/, MediaFacts* facts) {
     bool oom = false;
     try {
         if (!WalkBlocks(h, start + 4, size, &f, facts, &oom)) return oom ? MM_E_OUTOFMEMORY : MM_E_FAIL;
+        // An ID3v2 tag ahead of the stream fills what the Vorbis comment lacks;
+        // its pictures count when the stream has none of its own.
+        TagFacts id3;
+        std::vector<PictureFacts> id3Pictures;
+        if (start > 0 && !ReadId3FactsAt(path, 0, &id3, &id3Pictures)) return MM_E_OUTOFMEMORY;
+        facts->tags.FillFrom(id3);
+        if (facts->pictures.empty()) facts->pictures = std::move(id3Pictures);
     } catch (const std::bad_alloc&) {
         return MM_E_OUTOFMEMORY;
     }

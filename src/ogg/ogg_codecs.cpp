@@ -51,6 +51,8 @@ void IdentifyTheora(const uint8_t* p, OggStream* s) {
     f.height = ReadBE24(p + 17);
     f.frameRateNum = ReadBE32(p + 22);
     f.frameRateDen = ReadBE32(p + 26);
+    s->granuleShift = (ReadBE16(p + 40) >> 5) & 31u;
+    s->granuleFromZero = ReadBE24(p + 7) < 0x030201u;
     s->done = true;  // its comments repeat what the audio says, if anything
 }
 

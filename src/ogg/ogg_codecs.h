@@ -18,6 +18,8 @@ struct OggStream {
     StreamFacts facts;
     uint32_t granuleRate = 0;  // granule positions per second (audio)
     uint64_t preSkip = 0;  // granules before the first audible sample
+    uint32_t granuleShift = 0;  // Theora: low granule bits count frames since the keyframe
+    bool granuleFromZero = false;  // Theora before 3.2.1: a granule numbers its frame from 0
     uint32_t packets = 0;  // complete packets seen
     bool done = false;  // every header packet read
     std::vector<uint8_t> partial;  // a packet continued on the next page

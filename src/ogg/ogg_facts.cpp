@@ -91,22 +91,38 @@ void WalkHeaders(int h, uint64_t fileSize, Walk* w) {
     }
 }
 
+// The stream's play time in microseconds from its last granule; -1 when it
+// has none or its granules count no time.
+int64_t StreamDuration(int h, uint64_t fileSize, const OggStream& s) {
+    uint64_t granule = 0;
+    if (!FindLastGranule(h, fileSize, s.serial, &granule) || granule >= (uint64_t(1) << 62)) return -1;
+    long double seconds = -1;
+    if (s.codec == OggStream::kTheora && s.facts.frameRateNum != 0 && s.facts.frameRateDen != 0) {
+        const uint64_t frames = (granule >> s.granuleShift) + (granule & ((uint64_t(1) << s.granuleShift) - 1)) +
+                                (s.granuleFromZero ? 1 : 0);
+        seconds = static_cast<long double>(frames) * s.facts.frameRateDen / s.facts.frameRateNum;
+    } else if (s.granuleRate != 0) {
+        const uint64_t samples = granule > s.preSkip ? granule - s.preSkip : 0;
+        seconds = static_cast<long double>(samples) / s.granuleRate;
+    }
+    return seconds < 0 ? -1 : static_cast<int64_t>(seconds * 1e6L + 0.5L);
+}
+
+// The file plays as long as its longest stream.
 void FillFacts(int h, uint64_t fileSize, Walk* w, MediaFacts* facts) {
     facts->format = "ogg";
     facts->mime = "audio/ogg";
-    const OggStream* timed = nullptr;
+    int64_t longest = -1;
     for (OggStream& s : w->streams) {
         if (s.codec == OggStream::kUnknown) continue;
         if (s.facts.kind == StreamFacts::kVideo) facts->mime = "video/ogg";
-        if (timed == nullptr && s.granuleRate != 0) timed = &s;
         facts->streams.push_back(s.facts);
+        longest = std::max(longest, StreamDuration(h, fileSize, s));
     }
     facts->tags = w->tags;
     facts->pictures = w->pictures.list;
-    uint64_t granule = 0;
-    if (timed != nullptr && FindLastGranule(h, fileSize, timed->serial, &granule) && granule < (uint64_t(1) << 62)) {
-        const uint64_t samples = granule > timed->preSkip ? granule - timed->preSkip : 0;
-        facts->durationUs = static_cast<int64_t>(static_cast<long double>(samples) * 1e6L / timed->granuleRate + 0.5L);
+    if (longest >= 0) {
+        facts->durationUs = longest;
         facts->durationExact = true;
     }
 }
