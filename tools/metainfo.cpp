@@ -114,12 +114,13 @@ int main(int argc, char** argv) {
 
     std::string coverFile, coverOut;
     int coverIndex = 0;
-    bool coverAll = false;
+    bool coverAll = false, coverExact = false;
     CLI::App* coverCmd = app.add_subcommand("cover", "Write the embedded picture of a file.");
     coverCmd->add_option("file", coverFile, "the media file")->required();
     coverCmd->add_option("-o,--output", coverOut, "the file to write (default: FILE.cover.jpg, .png, ...)");
     coverCmd->add_option("--index", coverIndex, "which picture (from 0)")->check(CLI::NonNegativeNumber);
     coverCmd->add_flag("--all", coverAll, "write every picture, numbered");
+    coverCmd->add_flag("--exact", coverExact, "the one picture the MM_ interface's tags hold");
     coverCmd->footer(kExitCodes);
 
     scan::ScanOptions scanOpts;
@@ -189,6 +190,6 @@ int main(int argc, char** argv) {
     if (cutCmd->parsed()) return probe::CutCommand(cutFile, startMs, endMs, cutOut, cutExact);
     if (makerCmd->parsed()) return probe::MakerCommand(makerFile, thumbnail);
     if (framesCmd->parsed()) return probe::FramesCommand(framesFile, stream, seekOpt->count() > 0, seekMs);
-    if (coverCmd->parsed()) return probe::CoverCommand(coverFile, coverOut, coverIndex, coverAll);
+    if (coverCmd->parsed()) return probe::CoverCommand(coverFile, coverOut, coverIndex, coverAll, coverExact);
     return kUsageError;
 }

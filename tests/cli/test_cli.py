@@ -6,6 +6,7 @@ import csv
 import io
 import json
 import os
+import shutil
 import struct
 import subprocess
 
@@ -86,6 +87,7 @@ CASES = [
     (["maker", MP3], 1, "no maker box", ""),
     (["cover", "{dir}/cover.mp3", "-o", "{dir}/out.png"], 0, "", "written to"),
     (["cover", "{dir}/cover.mp3", "--index", "1"], 1, "no picture 1", ""),
+    (["cover", "{dir}/cover.mp3", "--exact", "-o", "{dir}/exact.png"], 0, "", "written to"),
     (["cover", MP3], 1, "no picture", ""),
 ]
 
@@ -111,6 +113,15 @@ def test_cover_writes_the_picture_bytes(files):
     out = files["dir"] / "written.png"
     assert run(["cover", str(files["dir"] / "cover.mp3"), "-o", str(out)]).returncode == 0
     assert out.read_bytes() == files["png"]
+    if shutil.which("ffmpeg"):  # a FLAC PICTURE block, which only the accurate answers read
+        flac, png = files["dir"] / "cover.flac", files["dir"] / "red.png"
+        ff = ["ffmpeg", "-loglevel", "error", "-f", "lavfi", "-i"]
+        subprocess.run(ff + ["color=red:size=8x8", "-frames:v", "1", str(png)], check=True)
+        subprocess.run(ff + ["sine=d=1", "-i", str(png), "-map", "0", "-map", "1", "-c:v", "copy", "-disposition:v",
+                             "attached_pic", str(flac)], check=True)
+        assert run(["cover", str(flac), "--all", "-o", str(files["dir"] / "flac.png")]).returncode == 0
+        assert (files["dir"] / "flac-0.png").read_bytes() == png.read_bytes()
+        assert b"no picture" in run(["cover", str(flac), "--exact"]).stderr
     line = json.loads(run(["probe", "--json", str(files["dir"] / "cover.mp3")]).stdout)
     assert line["pictures"] == [{"mime": "image/png", "type": 3, "description": None, "size": len(files["png"])}]
 
