@@ -22,6 +22,12 @@ Bytes& Bytes::patch_le32(size_t offset, uint32_t v) {
     return *this;
 }
 
+std::vector<uint8_t> Join(std::initializer_list<std::vector<uint8_t>> parts) {
+    std::vector<uint8_t> out;
+    for (const auto& p : parts) out.insert(out.end(), p.begin(), p.end());
+    return out;
+}
+
 TempDir::TempDir() {
     const char* base = std::getenv("TMPDIR");
     std::string pattern = std::string(base != nullptr ? base : "/tmp") + "/metainfo-test-XXXXXX";

@@ -2,6 +2,7 @@
 #pragma once
 
 #include <cstdint>
+#include <initializer_list>
 #include <string>
 #include <vector>
 
@@ -70,6 +71,9 @@ public:
 private:
     std::string path_;
 };
+
+// Byte runs one after another.
+std::vector<uint8_t> Join(std::initializer_list<std::vector<uint8_t>> parts);
 
 std::vector<uint8_t> ReadFileBytes(const std::string& path);
 
