@@ -32,9 +32,6 @@
 
 using namespace testing_support;
 using namespace metainfo;
-using metainfo::AacBitReader;
-using metainfo::MakeAacBitReader;
-using metainfo::RawDataStream;
 
 namespace {
 
