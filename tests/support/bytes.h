@@ -76,6 +76,8 @@ private:
 std::vector<uint8_t> Join(std::initializer_list<std::vector<uint8_t>> parts);
 
 std::vector<uint8_t> ReadFileBytes(const std::string& path);
+// Every regular file under root, sorted by path.
+std::vector<std::string> FilesUnder(const std::string& root);
 
 // Folder of real-world media kept beside the project, or "" when absent.
 std::string CorpusDir();
