@@ -28,13 +28,6 @@ namespace {
 constexpr uint64_t kSecond = 10000000;  // 100-ns units
 constexpr uint16_t kString = 0, kBytes = 1, kDword = 3;
 
-// A header followed by a stub Data Object, as files have one.
-std::vector<uint8_t> AsfFile(const std::vector<Bytes>& objects, int64_t count = -1) {
-    Bytes file = AsfHeader(objects, count);
-    file.raw(AsfGuid("75B22636-668E-11CF-A6D9-00AA0062CE6C")).le64(50).fill(26, 0);
-    return file.data();
-}
-
 std::string ClipOf(const std::string& path) {
     _MMClipInfo clip;
     std::memset(&clip, 0x5A, sizeof clip);

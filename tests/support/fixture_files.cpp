@@ -132,7 +132,6 @@ void AddMp4Files(Files& out) {
 
 void AddAsfFiles(Files& out) {
     constexpr uint64_t kSecond = 10000000;
-    const Bytes dataObject = Bytes().raw(AsfGuid("75B22636-668E-11CF-A6D9-00AA0062CE6C")).le64(50).fill(26, 0);
     const std::vector<AsfDescriptor> descriptors = {
         {"WM/AlbumTitle", 0, Utf16("Album").data()},
         {"WM/Year", 0, Utf16("2009").data()},
@@ -141,23 +140,20 @@ void AddAsfFiles(Files& out) {
         {"IsVBR", 2, Bytes().le32(1).data()},
         {"WM/Picture", 1, AsfWmPicture(3, "image/jpeg", "cover", Bytes(kJpeg)).data()},
     };
-    auto file = [&](const std::vector<Bytes>& objects) {
-        return Bytes().raw(AsfHeader(objects)).raw(dataObject).data();
-    };
     const Bytes props = AsfFileProperties(4096, 3 * kSecond, 500, 128000);
     const Bytes audio = AsfAudioStream(1, 0x161, 44100, 2, 128000);
     const Bytes description = AsfContentDescription("Title", "Author", "(c)", "About", "PG");
 
     Add(out, MEDIA_TYPE_ASF, "audio.wma",
-        file({props, audio, description, AsfExtContentDescription(descriptors), AsfStreamBitrates({{1, 128000}})}));
+        AsfFile({props, audio, description, AsfExtContentDescription(descriptors), AsfStreamBitrates({{1, 128000}})}));
     Add(out, MEDIA_TYPE_ASF, "video.wmv",
-        file({AsfFileProperties(8192, 5 * kSecond, 3000, 500000), audio,
-              AsfVideoStream(2, "WMV3", 320, 240, {0x4F, 0xD1, 0x1A, 0x01}),
-              AsfHeaderExtension({AsfExtStreamProperties(2, 333333), AsfMetadata(descriptors)}),
-              AsfStreamBitrates({{1, 128000}, {2, 372000}})}));
+        AsfFile({AsfFileProperties(8192, 5 * kSecond, 3000, 500000), audio,
+                 AsfVideoStream(2, "WMV3", 320, 240, {0x4F, 0xD1, 0x1A, 0x01}),
+                 AsfHeaderExtension({AsfExtStreamProperties(2, 333333), AsfMetadata(descriptors)}),
+                 AsfStreamBitrates({{1, 128000}, {2, 372000}})}));
     Add(out, MEDIA_TYPE_ASF, "branding.asf",
-        file({props, AsfAudioStream(1, 0x0A, 16000, 1, 20000), AsfContentBranding(3, Bytes(kJpeg), "u", "c"),
-              AsfHeaderExtension({AsfMetadata(descriptors, true)})}));
+        AsfFile({props, AsfAudioStream(1, 0x0A, 16000, 1, 20000), AsfContentBranding(3, Bytes(kJpeg), "u", "c"),
+                 AsfHeaderExtension({AsfMetadata(descriptors, true)})}));
 }
 
 void AddRealMediaFiles(Files& out) {
