@@ -32,29 +32,14 @@
 
 using namespace testing_support;
 using namespace metainfo;
-using metainfo::AacBitReader;
-using metainfo::MakeAacBitReader;
-using metainfo::RawDataStream;
 
 namespace {
 
 using Data = std::vector<uint8_t>;
 
-Data Cat(std::initializer_list<Data> parts) {
-    Data out;
-    for (const Data& p : parts) out.insert(out.end(), p.begin(), p.end());
-    return out;
-}
 Data Zeros(size_t n) { return Data(n, 0); }
 Data Frames(size_t n, size_t size, int samplingIndex = 4, int channels = 2, int profile = 1, int sbr = 0) {
     return AdtsFrames(AdtsLayout(samplingIndex, channels, profile), std::vector<size_t>(n, size), sbr);
-}
-
-// n frames of the smallest kind: header and a silent block, 11 bytes.
-Data Silent(int n, const AdtsFields& shape = {}) {
-    Data out;
-    for (int i = 0; i < n; ++i) out = Cat({out, AdtsFrame(shape, SilentAacBlock())});
-    return out;
 }
 
 // The slot functions themselves (durations stay in whole seconds): clip and codec records
@@ -106,7 +91,7 @@ std::vector<uint8_t> Slice(const std::vector<uint8_t>& v, size_t from, size_t to
 std::vector<uint8_t> AdifWithoutSync(uint32_t bitrate) {
     AdifLayout layout;
     layout.bitrate = bitrate;
-    return Join(AdifFile(layout, AacBlock(false, 0, 20)), std::vector<uint8_t>(5000, 0x11));
+    return Join({AdifFile(layout, AacBlock(false, 0, 20)), std::vector<uint8_t>(5000, 0x11)});
 }
 
 struct BufResult {
@@ -220,11 +205,11 @@ TEST(AacClip, ChecksClipAndCodecOfEachFileShape) {
     tooLong[3] = static_cast<uint8_t>((tooLong[3] & 0xFC) | (length >> 11));
     tooLong[4] = static_cast<uint8_t>(length >> 3);
     tooLong[5] = static_cast<uint8_t>((length & 7) << 5 | 0x1F);
-    const Data sbrThird = Cat({Frames(2, 200), Frames(1, 200, 4, 2, 1, 13)});
+    const Data sbrThird = Join({Frames(2, 200), Frames(1, 200, 4, 2, 1, 13)});
     // An ID3v2 tag with a footer is skipped whole (20 bytes past its size) but only
     // its body leaves the count; a trailing 128-byte tag leaves it too.
     const Data footerTag =
-        Cat({Id3v2Tag(4, Zeros(100), 0x10), Bytes().str("3DI").u8(4).u8(0).u8(0x10).syncsafe32(100).data()});
+        Join({Id3v2Tag(4, Zeros(100), 0x10), Bytes().str("3DI").u8(4).u8(0).u8(0x10).syncsafe32(100).data()});
     const Data speech = Frames(15, 128, 11, 1);  // 8 kHz frames of 128 bytes: 8000 bit/s
     AdifLayout pces;  // pairs count twice; a misread field of the first element would garble the second
     pces.variableRate = true;
@@ -254,47 +239,47 @@ TEST(AacClip, ChecksClipAndCodecOfEachFileShape) {
         {"sampling index 13", Frames(8, 60, 13)},
         // Only frames followed by a whole maximal frame's worth of data are walked (besides
         // the first two), so SBR in the third frame of a short file is not seen.
-        {"sbr in a short file", Cat({sbrThird, Frames(5, 200)})},
-        {"sbr in a long file", Cat({sbrThird, Frames(60, 200)})},
+        {"sbr in a short file", Join({sbrThird, Frames(5, 200)})},
+        {"sbr in a long file", Join({sbrThird, Frames(60, 200)})},
         // From four frames on, the average leaves out the first and the two largest:
         // of 130 100 120 300 250 160 it keeps 100 120 160.
-        {"three frames", Cat({AdtsFrames(AdtsLayout(4, 2), {60, 100, 140}), Zeros(200)})},
-        {"six frames", Cat({AdtsFrames(AdtsLayout(4, 2), {130, 100, 120, 300, 250, 160}), Zeros(200)})},
-        {"too long a third frame", Cat({Frames(2, 200), tooLong, Frames(6, 300)})},
-        {"whole third frame", Cat({Frames(2, 200), Frames(7, 300)})},
-        {"too long a first frame", Cat({tooLong, Frames(6, 300)})},
+        {"three frames", Join({AdtsFrames(AdtsLayout(4, 2), {60, 100, 140}), Zeros(200)})},
+        {"six frames", Join({AdtsFrames(AdtsLayout(4, 2), {130, 100, 120, 300, 250, 160}), Zeros(200)})},
+        {"too long a third frame", Join({Frames(2, 200), tooLong, Frames(6, 300)})},
+        {"whole third frame", Join({Frames(2, 200), Frames(7, 300)})},
+        {"too long a first frame", Join({tooLong, Frames(6, 300)})},
         // The second frame must match the first; a lone frame's second header lies beyond the data.
-        {"ssr after lc", Cat({one, Frames(2, 100, 4, 2, 2)})},
-        {"main after lc", Cat({Silent(1), Silent(2, main)})},
-        {"mpeg-2 after mpeg-4", Cat({Silent(1), Silent(2, mpeg2)})},
-        {"lone frame", Cat({Zeros(20), one})},
-        {"one frame", Silent(1)},
+        {"ssr after lc", Join({one, Frames(2, 100, 4, 2, 2)})},
+        {"main after lc", Join({SilentAdts(1), SilentAdts(2, main)})},
+        {"mpeg-2 after mpeg-4", Join({SilentAdts(1), SilentAdts(2, mpeg2)})},
+        {"lone frame", Join({Zeros(20), one})},
+        {"one frame", SilentAdts(1)},
         // Only the first 4096 bytes after the tag (and its footer) are scanned.
-        {"three frames of 11 bytes", Silent(3)},
-        {"50 bytes before", Cat({Zeros(50), Silent(3)})},
-        {"4089 bytes before", Cat({Zeros(4089), Silent(3)})},
-        {"4000-byte tag", Cat({Id3v2Tag(4, Zeros(4000), 0x10), Zeros(10), Silent(3)})},
+        {"three frames of 11 bytes", SilentAdts(3)},
+        {"50 bytes before", Join({Zeros(50), SilentAdts(3)})},
+        {"4089 bytes before", Join({Zeros(4089), SilentAdts(3)})},
+        {"4000-byte tag", Join({Id3v2Tag(4, Zeros(4000), 0x10), Zeros(10), SilentAdts(3)})},
         // (2100 - 100) x 8 / 8000; starting at the footer would give 1990 bytes, 1 second.
-        {"footer tag", Cat({footerTag, speech, Zeros(60)})},
-        {"trailing tag", Cat({speech, Zeros(79), Bytes().str("TAG").zeros(125).data()})},
-        {"four bytes after the tag", Cat({Id3v2Tag(3, Zeros(10)), {0xFF, 0xF1, 0x50, 0x80}})},
-        {"three bytes after the tag", Cat({Id3v2Tag(3, Zeros(10)), {0xFF, 0xF1, 0x50}})},
-        {"tag and two bytes", Cat({Id3v2Tag(3, Zeros(200)), Zeros(2)})},
+        {"footer tag", Join({footerTag, speech, Zeros(60)})},
+        {"trailing tag", Join({speech, Zeros(79), Bytes().str("TAG").zeros(125).data()})},
+        {"four bytes after the tag", Join({Id3v2Tag(3, Zeros(10)), {0xFF, 0xF1, 0x50, 0x80}})},
+        {"three bytes after the tag", Join({Id3v2Tag(3, Zeros(10)), {0xFF, 0xF1, 0x50}})},
+        {"tag and two bytes", Join({Id3v2Tag(3, Zeros(200)), Zeros(2)})},
         {"15 bytes", Zeros(15)},
         {"zeros", Zeros(200)},
         // ADIF is accepted where the check meets it, but read only at the start of the data.
         // The copyright id shifts every later field by 9 bytes; a zero bit rate gives duration
         // 0; SBR in the first block gives the AAC+ code and doubles the rate.
-        {"adif", Cat({AdifFile(Adif(false, false, 3, 96000), AacBlock(true, 0, 20)), Zeros(24000)})},
-        {"adif copyright", Cat({AdifFile(Adif(true, false, 8, 64000), AacBlock(true, 0, 20)), Zeros(24000)})},
-        {"adif copyright vbr", Cat({AdifFile(Adif(true, true, 8, 64000), AacBlock(true, 0, 20)), Zeros(24000)})},
-        {"adif bit rate 0", Cat({AdifFile(Adif(false, false, 3, 0), AacBlock(true, 0, 20)), Zeros(24000)})},
-        {"adif sbr", Cat({AdifFile(Adif(false, true, 6, 64000), AacBlock(true, 13, 20)), Zeros(24000)})},
+        {"adif", Join({AdifFile(Adif(false, false, 3, 96000), AacBlock(true, 0, 20)), Zeros(24000)})},
+        {"adif copyright", Join({AdifFile(Adif(true, false, 8, 64000), AacBlock(true, 0, 20)), Zeros(24000)})},
+        {"adif copyright vbr", Join({AdifFile(Adif(true, true, 8, 64000), AacBlock(true, 0, 20)), Zeros(24000)})},
+        {"adif bit rate 0", Join({AdifFile(Adif(false, false, 3, 0), AacBlock(true, 0, 20)), Zeros(24000)})},
+        {"adif sbr", Join({AdifFile(Adif(false, true, 6, 64000), AacBlock(true, 13, 20)), Zeros(24000)})},
         // Program configuration elements are summed and the last object type kept.
         {"adif pces", AdifFile(pces, AacBlock(true, 0, 20))},
-        {"adif after a tag", Cat({Id3v2Tag(3, Zeros(30)), adif})},
-        {"adif late", Cat({Zeros(40), adif})},
-        {"ADIF mid-file", Cat({Zeros(30), Bytes().str("ADIF").data(), Zeros(30)})},
+        {"adif after a tag", Join({Id3v2Tag(3, Zeros(30)), adif})},
+        {"adif late", Join({Zeros(40), adif})},
+        {"ADIF mid-file", Join({Zeros(30), Bytes().str("ADIF").data(), Zeros(30)})},
     };
     TempDir dir;
     Golden golden("aac", "clips");
@@ -305,7 +290,7 @@ TEST(AacClip, ChecksClipAndCodecOfEachFileShape) {
     }
     golden.Check("missing", Probe(dir.PathOf("missing.aac")));
     int type = 0;  // detection takes the late ADIF file
-    ASSERT_EQ(MM_MediaExtractor_DetectMediaType(dir.Write("late.aac", Cat({Zeros(40), adif})).c_str(), &type), MM_OK);
+    ASSERT_EQ(MM_MediaExtractor_DetectMediaType(dir.Write("late.aac", Join({Zeros(40), adif})).c_str(), &type), MM_OK);
     EXPECT_EQ(type, MEDIA_TYPE_AAC);
 }
 
@@ -348,7 +333,7 @@ TEST(AacClip, TruncatedAdifHeadersAnswerWithoutFault) {
     const Data tag = Id3v2Tag(3, Zeros(20));
     for (size_t cut = 5; cut < full.size(); cut += 3) {
         const std::string path =
-            dir.Write("t.aac", Cat({tag, Data(full.begin(), full.begin() + static_cast<long>(cut))}));
+            dir.Write("t.aac", Join({tag, Data(full.begin(), full.begin() + static_cast<long>(cut))}));
         _MMClipInfo clip;
         EXPECT_EQ(AAC_GetClipInfo(path.c_str(), &clip), MM_OK) << cut;
     }
@@ -364,13 +349,13 @@ TEST(AacExtract, CutsAtTheFirstSyncAtOrAfterEachOffsetWithTheEndClamped) {
     const std::string out = dir.PathOf("out.aac");
     // 1 s -> byte 833 -> sync at 900; 4 s -> byte 3333 -> sync at 3400.
     ASSERT_EQ(MM_OK, AAC_GetAuidoData_File(path.c_str(), 1, 4, out.c_str()));
-    EXPECT_EQ(Join(Slice(input, 128, 148), Slice(input, 900, 3400)), ReadFileBytes(out));
+    EXPECT_EQ(Join({Slice(input, 128, 148), Slice(input, 900, 3400)}), ReadFileBytes(out));
     const BufResult r = CutToBuffer(path, 1, 4);
     ASSERT_EQ(MM_OK, r.result);
     EXPECT_EQ(Slice(input, 900, 3300), r.data);
     EXPECT_TRUE(r.terminated);
     ASSERT_EQ(MM_OK, AAC_GetAuidoData_File(path.c_str(), 6, 1000, out.c_str()));
-    EXPECT_EQ(Join(Slice(input, 128, 148), Slice(input, 5000, input.size())), ReadFileBytes(out));
+    EXPECT_EQ(Join({Slice(input, 128, 148), Slice(input, 5000, input.size())}), ReadFileBytes(out));
 }
 
 TEST(AacExtractFile, LeadingTagBodyAndTrailingTagAreCopied) {
@@ -378,7 +363,7 @@ TEST(AacExtractFile, LeadingTagBodyAndTrailingTagAreCopied) {
     Bytes body;
     for (int i = 0; i < 300; ++i) body.u8(static_cast<uint8_t>(i * 7));
     const std::vector<uint8_t> trailer = Bytes().str("TAG").fill(125, 'x').data();
-    const std::vector<uint8_t> input = Join(Join(Id3v2Tag(3, body.data()), HundredByteFrames(100)), trailer);
+    const std::vector<uint8_t> input = Join({Id3v2Tag(3, body.data()), HundredByteFrames(100), trailer});
     const std::string path = dir.Write("tags.aac", input);
     const std::string out = dir.PathOf("out.aac");
     ASSERT_EQ(MM_OK, AAC_GetAuidoData_File(path.c_str(), 0, 2, out.c_str()));
@@ -413,7 +398,7 @@ TEST(AacExtractFile, AdifFileIsCutAsRawBytes) {
 TEST(AacExtractBuf, RangeWithOneSyncGivesNothingAndWithoutSyncIsRejected) {
     TempDir dir;
     std::vector<uint8_t> input = AdtsFrames(kLayout8k, std::vector<size_t>(30, 128));
-    for (int i = 0; i < 10; ++i) input = Join(input, AdtsFrame(kLayout8k, std::vector<uint8_t>(3993, 0)));
+    for (int i = 0; i < 10; ++i) input = Join({input, AdtsFrame(kLayout8k, std::vector<uint8_t>(3993, 0))});
     const std::string path = dir.Write("big.aac", input);
     ASSERT_EQ(43840u, input.size());  // 43 seconds, 1019 bytes each
     // 39 s: bytes 39763..40782 hold the frame start at 39840 only.
@@ -430,7 +415,7 @@ TEST(AacExtractBuf, RangeWithOneSyncGivesNothingAndWithoutSyncIsRejected) {
 TEST(AacExtractBuf, RangeOfAHundredBytesOrLessIsNotFrontTrimmed) {
     TempDir dir;
     std::vector<uint8_t> input;
-    for (int i = 0; i < 100; ++i) input = Join(input, AdtsFrame(kLayout8k, {0xE0}));
+    for (int i = 0; i < 100; ++i) input = Join({input, AdtsFrame(kLayout8k, {0xE0})});
     const BufResult r = CutToBuffer(dir.Write("small.aac", input), 2, 3);  // 800 bytes, 12 s
     ASSERT_EQ(MM_OK, r.result);
     // Bytes 133..200: kept from 133 (inside a frame) up to the last sync at 192.

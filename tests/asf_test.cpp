@@ -6,7 +6,6 @@
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
-#include <map>
 #include <string>
 #include <tuple>
 #include <vector>
@@ -17,6 +16,7 @@
 #include "metainfo/metainfo.h"
 #include "support/asf_builder.h"
 #include "support/bytes.h"
+#include "support/ffprobe.h"
 #include "support/golden.h"
 #include "support/summary.h"
 
@@ -27,13 +27,6 @@ namespace {
 
 constexpr uint64_t kSecond = 10000000;  // 100-ns units
 constexpr uint16_t kString = 0, kBytes = 1, kDword = 3;
-
-// A header followed by a stub Data Object, as files have one.
-std::vector<uint8_t> AsfFile(const std::vector<Bytes>& objects, int64_t count = -1) {
-    Bytes file = AsfHeader(objects, count);
-    file.raw(AsfGuid("75B22636-668E-11CF-A6D9-00AA0062CE6C")).le64(50).fill(26, 0);
-    return file.data();
-}
 
 std::string ClipOf(const std::string& path) {
     _MMClipInfo clip;
@@ -100,27 +93,6 @@ struct LogLine {
 std::vector<LogLine> g_lines;
 void Capture(int priority, const char* tag, const char* message) {
     g_lines.push_back({priority, tag != nullptr ? tag : "", message});
-}
-
-// key=value lines of ffprobe for one selection of the file (the first of each key).
-std::map<std::string, std::string> Probe(const std::string& path, const std::string& select) {
-    std::map<std::string, std::string> values;
-    FILE* p = popen(("/usr/bin/ffprobe -v error " + select + " -of default=nw=1 '" + path + "'").c_str(), "r");
-    if (p == nullptr) return values;
-    char line[4096];
-    while (std::fgets(line, sizeof line, p) != nullptr) {
-        std::string s(line);
-        if (!s.empty() && s.back() == '\n') s.pop_back();
-        const size_t eq = s.find('=');
-        if (eq != std::string::npos) values.emplace(s.substr(0, eq), s.substr(eq + 1));
-    }
-    pclose(p);
-    return values;
-}
-
-uint32_t Number(const std::map<std::string, std::string>& v, const char* key) {
-    auto it = v.find(key);
-    return it == v.end() ? 0 : static_cast<uint32_t>(std::strtoul(it->second.c_str(), nullptr, 10));
 }
 
 std::string Narrow(const _MMMetaItem& item) {
@@ -478,31 +450,32 @@ TEST(AsfFfmpeg, WrittenFilesAgreeWithFfprobe) {
           Case{"v2.wmv", "-f lavfi -i testsrc=d=2:s=320x240:r=25", "-c:v wmv2", 0x5002}}) {
         SCOPED_TRACE(c.name);
         const std::string path = dir.PathOf(c.name);
-        const std::string cmd = std::string("/usr/bin/ffmpeg -nostdin -v error -y ") + c.videoInput +
-                                " -f lavfi -i sine=f=440:d=2 " + c.videoCodec +
-                                " -ar 44100 -c:a wmav2 -b:a 128k "
-                                "-metadata title=Tone -metadata artist=Someone -metadata album=Record '" +
-                                path + "'";
-        ASSERT_EQ(std::system(cmd.c_str()), 0) << cmd;
+        ASSERT_TRUE(FfmpegWrite(std::string(c.videoInput) + " -f lavfi -i sine=f=440:d=2 " + c.videoCodec +
+                                    " -ar 44100 -c:a wmav2 -b:a 128k -metadata title=Tone -metadata artist=Someone "
+                                    "-metadata album=Record",
+                                path));
         const Answers a(path);
-        auto format = Probe(path, "-show_entries format=duration,size:format_tags=title,artist,album");
-        auto audio = Probe(path, "-select_streams a:0 -show_entries stream=sample_rate,channels");
-        auto video = Probe(path, "-select_streams v:0 -show_entries stream=width,height");
+        // What ffprobe shows as a number, 0 when it shows nothing (no video stream).
+        auto number = [&](const char* entries, const char* select) {
+            return static_cast<uint32_t>(std::stoul("0" + Probe(path, entries, select)));
+        };
         const bool hasVideo = c.videoCode != 0;
         EXPECT_EQ(a.mask, hasVideo ? TRACK_AUDIO | TRACK_VIDEO : TRACK_AUDIO);
         EXPECT_EQ(std::make_tuple(a.codec.nAudioCodec, a.codec.nAudioProfile, a.codec.nVideoCodec),
                   std::make_tuple(0x6001u, 0x6010u, c.videoCode));
         EXPECT_STREQ(a.clip.szFormat, c.name + std::string(c.name).size() - 3);
-        EXPECT_EQ(a.clip.nFileSize, Number(format, "size"));
-        EXPECT_NEAR(a.clip.nDuration, std::strtod(format["duration"].c_str(), nullptr) * 1000.0, 1000.0);
+        EXPECT_EQ(a.clip.nFileSize, number("format=size", ""));
+        EXPECT_NEAR(a.clip.nDuration, std::strtod(Probe(path, "format=duration").c_str(), nullptr) * 1000.0, 1000.0);
         EXPECT_EQ(a.clip.nDuration % 1000, 0u);
         EXPECT_EQ(std::make_tuple(a.clip.nSampleRate, a.clip.nChannels, a.clip.bHasAudio, a.clip.bHasVideo),
-                  std::make_tuple(Number(audio, "sample_rate"), Number(audio, "channels"), 1u, hasVideo ? 1u : 0u));
+                  std::make_tuple(number("stream=sample_rate", "-select_streams a:0"),
+                                  number("stream=channels", "-select_streams a:0"), 1u, hasVideo ? 1u : 0u));
         EXPECT_EQ(std::make_pair(a.clip.nWidth, a.clip.nHeight),
-                  std::make_pair(Number(video, "width"), Number(video, "height")));
-        EXPECT_EQ(format["TAG:title"], "Tone");
-        EXPECT_EQ(Narrow(a.meta.aItems[META_TITLE]), format["TAG:title"]);
-        EXPECT_EQ(Narrow(a.meta.aItems[META_ARTIST]), format["TAG:artist"]);
-        EXPECT_EQ(Narrow(a.meta.aItems[META_ALBUM]), format["TAG:album"]);
+                  std::make_pair(number("stream=width", "-select_streams v:0"),
+                                 number("stream=height", "-select_streams v:0")));
+        EXPECT_EQ(Probe(path, "format_tags=title"), "Tone");
+        EXPECT_EQ(Narrow(a.meta.aItems[META_TITLE]), "Tone");
+        EXPECT_EQ(Narrow(a.meta.aItems[META_ARTIST]), Probe(path, "format_tags=artist"));
+        EXPECT_EQ(Narrow(a.meta.aItems[META_ALBUM]), Probe(path, "format_tags=album"));
     }
 }

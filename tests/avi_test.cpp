@@ -277,36 +277,34 @@ TEST(AviIndexSearch, NextAndPreviousEntriesOfAStream) {
     EXPECT_EQ(f->searchPreIndex(0, 2), 0u) << "entry 0 is never examined";
 }
 
-TEST(AviSeek, VideoLandsOnTheEarlierKeyFrame) {
-    Indexed f(AviVideoOnly(50, 10));  // key frames at 0, 400, 800, 1200, 1600 ms
-    ASSERT_EQ(f.Open(), MM_OK);
-    uint32_t actual = 1;
-    EXPECT_EQ(f->setMediaTime(0, 1000, &actual), MM_OK);
-    EXPECT_EQ(actual, 800u);
-    _FrameInfo frame{};
-    ASSERT_EQ(f->getNextFrame(0, &frame), MM_OK);
-    EXPECT_EQ(frame.dwTimeMs, 800u);
-    EXPECT_EQ(frame.dwFlags, AVI_KEYFRAME_FLAGS);
-    MM_MediaExtractor_FreeBuffer(frame.pData);
-    EXPECT_EQ(f->setMediaTime(0, 2000, &actual), MM_OK) << "the very end stays inside the index";
-    EXPECT_EQ(actual, 1600u);
-}
-
-TEST(AviSeek, KeyFlagWithAnotherBitIsNotAKeyFrame) {
+// Video lands on the key frame at or before the time (a key flag with another bit is
+// none), even at the very end; audio on the first entry at or after it.
+TEST(AviSeek, EachStreamLandsOnItsEntry) {
+    const struct {
+        std::vector<uint8_t> file;
+        uint32_t stream, time, actual;
+    } cases[] = {
+        {AviVideoOnly(50, 10), 0, 1000, 800},  // key frames at 0, 400, 800, 1200, 1600 ms
+        {AviVideoOnly(50, 10), 0, 2000, 1600},
+        {VideoWithFlags({0x10, 0, 0, 0x11, 0, 0}), 0, 150, 0},
+        {Interleaved(25, 5), 1, 600, 750},
+    };
+    for (const auto& c : cases) {
+        SCOPED_TRACE(c.time);
+        Indexed f(c.file);
+        ASSERT_EQ(f.Open(), MM_OK);
+        uint32_t actual = 1;
+        EXPECT_EQ(f->setMediaTime(c.stream, c.time, &actual), MM_OK);
+        EXPECT_EQ(actual, c.actual);
+        _FrameInfo frame{};
+        ASSERT_EQ(f->getNextFrame(c.stream, &frame), MM_OK);
+        EXPECT_EQ(frame.dwTimeMs, c.actual);
+        EXPECT_EQ(frame.dwFlags, AVI_KEYFRAME_FLAGS);
+        MM_MediaExtractor_FreeBuffer(frame.pData);
+    }
     Indexed f(VideoWithFlags({0x10, 0, 0, 0x11, 0, 0}));
     ASSERT_EQ(f.Open(), MM_OK);
     EXPECT_EQ(f.Entry(3).dwFlags, 0x11000000u);
-    uint32_t actual = 1;
-    EXPECT_EQ(f->setMediaTime(0, 150, &actual), MM_OK);
-    EXPECT_EQ(actual, 0u);
-}
-
-TEST(AviSeek, AudioSeeksToTheFirstEntryAtOrAfterTheTime) {
-    Indexed f(Interleaved(25, 4));
-    ASSERT_EQ(f.Open(), MM_OK);
-    uint32_t actual = 0;
-    EXPECT_EQ(f->setMediaTime(1, 600, &actual), MM_OK);
-    EXPECT_EQ(actual, 750u);
 }
 
 TEST(AviFrames, EveryFrameButTheStreamsLastIsDeliveredWithItsBytes) {

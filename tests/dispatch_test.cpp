@@ -19,7 +19,8 @@
 #include "metainfo/metainfo.h"
 #include "support/bytes.h"
 #include "support/golden.h"
-#include "support/media.h"
+#include "support/aac_builder.h"
+#include "support/mp3_builder.h"
 
 using namespace metainfo;
 using testing_support::Bytes;
@@ -51,17 +52,8 @@ Bytes AsfHead() {
     return b;
 }
 
-Bytes Mp3Stream(int frames = 3) {
-    Bytes b;
-    for (int i = 0; i < frames; ++i) b.raw(testing_support::Mp3Frame({}));
-    return b;
-}
-
-Bytes AdtsStream() {
-    Bytes b;
-    for (int i = 0; i < 3; ++i) b.raw(testing_support::AdtsFrame({}, testing_support::SilentAacBlock()));
-    return b;
-}
+Bytes Mp3Stream(int frames = 3) { return Bytes(testing_support::Mp3Frames(frames)); }
+Bytes AdtsStream() { return Bytes(testing_support::SilentAdts(3)); }
 
 int Detect(const std::string& path) {
     int type = -1;

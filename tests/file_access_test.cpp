@@ -19,16 +19,6 @@
 #include "metainfo/metainfo.h"
 #include "support/bytes.h"
 
-using metainfo::GetFileExtension;
-using metainfo::GetUINT32;
-using metainfo::MEx_fclose;
-using metainfo::MEx_feof;
-using metainfo::MEx_fopen;
-using metainfo::MEx_fread;
-using metainfo::MEx_fseek;
-using metainfo::MEx_ftell;
-using metainfo::MEx_fwrite;
-using metainfo::MEx_stat;
 using testing_support::Bytes;
 using testing_support::TempDir;
 using namespace metainfo;

@@ -19,6 +19,7 @@
 #include "mp3/mp3_frame.h"
 #include "mp3/mp3_info.h"
 #include "support/bytes.h"
+#include "support/ffprobe.h"
 #include "support/golden.h"
 #include "support/id3_builder.h"
 #include "support/mp3_builder.h"
@@ -31,19 +32,13 @@ namespace {
 
 using Data = std::vector<uint8_t>;
 
-Data Cat(std::initializer_list<Data> parts) {
-    Bytes b;
-    for (const Data& p : parts) b.raw(p);
-    return b.data();
-}
-
 // Clip information and audio information of one file. Default frames:
 // MPEG-1 Layer III, 128 kbit/s, 44100 Hz, stereo, 417 bytes.
-struct Probe {
+struct Mp3Probe {
     _MMClipInfo clip;
     _MP3AudioInfo info;
     int32_t clipResult, infoResult;
-    explicit Probe(const Data& file) {
+    explicit Mp3Probe(const Data& file) {
         TempDir dir;
         const std::string path = dir.Write("s.mp3", file);
         std::memset(&clip, 0xAB, sizeof clip);
@@ -51,12 +46,12 @@ struct Probe {
         clipResult = MP3_GetClipInfo(path.c_str(), &clip);
         infoResult = GetMediaInfo_MP3(path.c_str(), &info, INFO_MP3_AUDIO);
     }
-    ~Probe() { delete[] info.xingToc; }
+    ~Mp3Probe() { delete[] info.xingToc; }
 };
 
-Data Then20Frames(const Data& first, const Mp3Shape& shape = {}) { return Cat({first, Mp3Frames(20, shape)}); }
+Data Then20Frames(const Data& first, const Mp3Shape& shape = {}) { return Join({first, Mp3Frames(20, shape)}); }
 
-std::string InfoSummary(const Probe& p) {
+std::string InfoSummary(const Mp3Probe& p) {
     if (p.infoResult != MM_OK) return std::to_string(p.infoResult);
     const _MP3AudioInfo& i = p.info;
     char text[256];
@@ -131,21 +126,11 @@ struct Buffer {
     ~Buffer() { MM_MediaExtractor_FreeBuffer(data); }
 };
 
-std::string RunCommand(const std::string& command) {
-    std::string out;
-    if (FILE* p = popen(command.c_str(), "r")) {
-        char buf[256];
-        while (fgets(buf, sizeof buf, p) != nullptr) out += buf;
-        if (pclose(p) != 0) return "failed";
-    }
-    return out;
-}
-
 // Seconds of audio a decoder finds in the file (frames counted by ffprobe), or -1
 // when ffmpeg cannot decode it cleanly.
 double DecodedSeconds(const std::string& path) {
-    if (RunCommand("/usr/bin/ffmpeg -nostdin -v error -i '" + path + "' -f null - 2>&1") != "") return -1;
-    const std::string out = RunCommand(
+    if (RunShell("/usr/bin/ffmpeg -nostdin -v error -i '" + path + "' -f null - 2>&1 && echo ok") != "ok\n") return -1;
+    const std::string out = RunShell(
         "/usr/bin/ffprobe -v error -count_frames -select_streams a:0 -show_entries "
         "stream=nb_read_frames,sample_rate -of csv=p=0 '" +
         path + "'");
@@ -223,7 +208,7 @@ TEST(Mp3Frame, SizesFieldsAndRejectedHeaders) {
 // consecutive frames within what was read make a stream.
 TEST(Mp3Sync, TagsAreSkippedAndTwoConsecutiveFramesMakeAStream) {
     const Data tag = Id3v2Tag(3, Data(20, 0x11));  // 30 bytes
-    const Data footer = Cat({Id3v2Tag(4, Data(20, 0x11), 0x10), Data(10, 0)});
+    const Data footer = Join({Id3v2Tag(4, Data(20, 0x11), 0x10), Data(10, 0)});
     const Data frames = Mp3Frames(3);
     const struct {
         const char* name;
@@ -231,9 +216,9 @@ TEST(Mp3Sync, TagsAreSkippedAndTwoConsecutiveFramesMakeAStream) {
         int32_t result;
         long position;
     } tags[] = {{"untagged", frames, MM_OK, 0},
-                {"two tags", Cat({tag, tag, frames}), MM_OK, 60},
-                {"footer", Cat({footer, frames}), MM_OK, 40},
-                {"fourth tag stays", Cat({tag, tag, tag, tag, frames}), MM_OK, 90},
+                {"two tags", Join({tag, tag, frames}), MM_OK, 60},
+                {"footer", Join({footer, frames}), MM_OK, 40},
+                {"fourth tag stays", Join({tag, tag, tag, tag, frames}), MM_OK, 90},
                 {"9 bytes", Bytes().str("ID3").zeros(6).data(), MM_E_FAIL, -1},
                 {"10 bytes", Bytes().str("ID3").zeros(7).data(), MM_OK, 0}};
     TempDir dir;
@@ -255,13 +240,13 @@ TEST(Mp3Sync, TagsAreSkippedAndTwoConsecutiveFramesMakeAStream) {
         int32_t result;
         uint32_t offset;
     } streams[] = {
-        {"after a tag", Cat({Id3v2Tag(3, Data(100, 0)), Data(7, 0), Mp3Frames(2)}), MM_OK, 117},
-        {"undecodable candidate skipped", Cat({{0xFF, 0xFB, 0xF0, 0x00, 0, 0, 0}, Mp3Frames(2)}), MM_OK, 7},
-        {"sampling rate changes", Cat({Mp3Frame({}), Mp3Frame(other), Mp3Frames(6)}), MM_E_UNSUPPORTED, 0},
-        {"second header past the file", Cat({Data(10, 0), Mp3Frame({})}), MM_E_UNSUPPORTED, 0},
-        {"pair beyond the bytes read", Cat({Data(4000, 0), Mp3Frames(2)}), MM_E_UNSUPPORTED, 0},
+        {"after a tag", Join({Id3v2Tag(3, Data(100, 0)), Data(7, 0), Mp3Frames(2)}), MM_OK, 117},
+        {"undecodable candidate skipped", Join({{0xFF, 0xFB, 0xF0, 0x00, 0, 0, 0}, Mp3Frames(2)}), MM_OK, 7},
+        {"sampling rate changes", Join({Mp3Frame({}), Mp3Frame(other), Mp3Frames(6)}), MM_E_UNSUPPORTED, 0},
+        {"second header past the file", Join({Data(10, 0), Mp3Frame({})}), MM_E_UNSUPPORTED, 0},
+        {"pair beyond the bytes read", Join({Data(4000, 0), Mp3Frames(2)}), MM_E_UNSUPPORTED, 0},
         {"noise", noise, MM_E_UNSUPPORTED, 0},
-        {"3 bytes after the tag", Cat({Id3v2Tag(3, Data(20, 0)), Data(3, 0)}), MM_E_FAIL, 0},
+        {"3 bytes after the tag", Join({Id3v2Tag(3, Data(20, 0)), Data(3, 0)}), MM_E_FAIL, 0},
     };
     for (const auto& c : streams) {
         const std::string path = dir.Write("s.mp3", c.file);
@@ -276,7 +261,7 @@ TEST(Mp3Sync, TagsAreSkippedAndTwoConsecutiveFramesMakeAStream) {
         EXPECT_EQ(std::tie(info.firstFrameOffset, info.frameSize, info.bitRate),
                   std::make_tuple(c.offset, 417u, 128000u));
     }
-    EXPECT_EQ(Probe(streams[2].file).clipResult, MM_E_UNSUPPORTED);
+    EXPECT_EQ(Mp3Probe(streams[2].file).clipResult, MM_E_UNSUPPORTED);
 }
 
 // Stream kind and sizes of one file from the clip and the audio-information requests.
@@ -304,9 +289,9 @@ TEST(Mp3Stream, KindDurationAndRatesOfEachStreamShape) {
         Data file;
     } cases[] = {
         // 1,600,000 audio bytes from the first frame, then an ID3v1 tag that is not audio.
-        {"cbr", Cat({Mp3Frames(3836), Data(1600000 - 3836 * 417, 0), Id3v1Titled("")})},
+        {"cbr", Join({Mp3Frames(3836), Data(1600000 - 3836 * 417, 0), Id3v1Titled("")})},
         // The sampled rate drops the largest and smallest: kept, 32 and 320 kbit/s would raise it.
-        {"sampled", Cat({Mp3Frames(2), Mp3Frame(high), Mp3Frame(low), Mp3Frames(10)})},
+        {"sampled", Join({Mp3Frames(2), Mp3Frame(high), Mp3Frame(low), Mp3Frames(10)})},
         // Duration from the frame count, 3828 * 1152 / 44100; with a table the sampled average stays.
         {"xing", Then20Frames(XingFrame(xing))},
         // No frame count: the clip request reads 0xFFFFFFFF frames; no table: the average is recomputed.
@@ -322,11 +307,11 @@ TEST(Mp3Stream, KindDurationAndRatesOfEachStreamShape) {
         // MPEG-2.5 halves the samples per frame for stereo only.
         {"mpeg-2.5", Mp3Frames(12, mpeg25)},
         {"mpeg-2.5 mono", Mp3Frames(12, mpeg25Mono)},
-        {"15 bytes", Cat({Mp3Header({}), Data(11, 0)})},
+        {"15 bytes", Join({Mp3Header({}), Data(11, 0)})},
     };
     Golden golden("mp3", "streams");
     for (const auto& c : cases) {
-        const Probe p(c.file);
+        const Mp3Probe p(c.file);
         golden.Check(c.name, (p.clipResult == MM_OK ? ClipSummary(p.clip) : std::to_string(p.clipResult)) + " | " +
                                  InfoSummary(p));
     }
@@ -354,7 +339,7 @@ TEST(Mp3Stream, CodecFollowsTheLayerAndMimeReplacesTheOldString) {
     EXPECT_EQ(mask, TRACK_AUDIO);
     EXPECT_EQ(GetMediaInfo_MP3(path.c_str(), &mask, INFO_METADATA), MM_E_FAIL);
     // Files shorter than sixteen bytes fail every request.
-    const std::string tiny = dir.Write("short.mp3", Cat({Mp3Header({}), Data(11, 0)}));
+    const std::string tiny = dir.Write("short.mp3", Join({Mp3Header({}), Data(11, 0)}));
     _MM_CODECTYPE codec{};
     _MM_MIMETYPE none{};
     EXPECT_EQ(MP3_GetMIMEType(tiny.c_str(), &none), MM_E_FAIL);
@@ -406,7 +391,7 @@ TEST(Id3Tags, ItemsOfEachTag) {
     Data truncated = Id3v2Tag(4, Id3Frame(4, "TIT2", TextBody(0, std::string(200, 'a'))));
     truncated.resize(100);  // the tag claims more than the file holds
     auto hugeFrame = [&](uint32_t size) {
-        return Cat({Id3v2Tag(3, Bytes().str("TIT2").be32(size).zeros(42).data()), frames});
+        return Join({Id3v2Tag(3, Bytes().str("TIT2").be32(size).zeros(42).data()), frames});
     };
     const struct {
         const char* name;
@@ -414,9 +399,9 @@ TEST(Id3Tags, ItemsOfEachTag) {
         int limit;
     } cases[] = {
         {"frame table", Tagged(3, table), 1},
-        {"failed v2", Cat({broken, frames}), 1},
-        {"replaced by v1", Cat({broken, frames, v1}), 1},
-        {"v2 over v1", Cat({Tagged(3, {Text3("TIT2", "V2 title")}), v1}), 1},
+        {"failed v2", Join({broken, frames}), 1},
+        {"replaced by v1", Join({broken, frames, v1}), 1},
+        {"v2 over v1", Join({Tagged(3, {Text3("TIT2", "V2 title")}), v1}), 1},
         {"no tag", frames, 1},
         {"v2.4 utf-8", tit2(4, TextBody(3, "T\xC3\xA9")), 1},
         {"v2.4 utf-16be", tit2(4, TextBytes(2, {0, 'A'})), 1},
@@ -456,10 +441,10 @@ TEST(Id3Tags, ItemsOfEachTag) {
                 16, 0x80),
          1},
         {"v2.4 frame unsync", Tagged(4, {Id3Frame(4, "TIT2", unsync24, 0x03)}), 1},
-        {"extended header", Cat({Id3v2Tag(3, extended, 0x40), frames}), 1},
-        {"extended header, unsync", Cat({Id3v2Tag(3, extended, 0xC0), frames}), 1},
-        {"v1", Cat({frames, Id3v1({"Title  \t", "Artist", "Album", "2001", "Note", 200, 17})}), 1},
-        {"v1 track 0, genre 148", Cat({frames, Id3v1({"T", "", "", "", "", 0, 148})}), 1},
+        {"extended header", Join({Id3v2Tag(3, extended, 0x40), frames}), 1},
+        {"extended header, unsync", Join({Id3v2Tag(3, extended, 0xC0), frames}), 1},
+        {"v1", Join({frames, Id3v1({"Title  \t", "Artist", "Album", "2001", "Note", 200, 17})}), 1},
+        {"v1 track 0, genre 148", Join({frames, Id3v1({"T", "", "", "", "", 0, 148})}), 1},
         {"truncated", truncated, 1},
         {"huge tag", Bytes().str("ID3").u8(3).zeros(2).syncsafe32(0x0FFFFFFF).raw(frames).data(), 1},
         {"frame beyond the tag", hugeFrame(0x7FFFFFF0u), 1},
@@ -583,9 +568,6 @@ TEST(Mp3Extract, FileCarriesTagsAndAXingFrameForTheRange) {
 TEST(Mp3Extract, CutFilesDecodeForTheRequestedSpan) {
     if (!HaveFfmpeg()) GTEST_SKIP() << "ffmpeg is not installed";
     TempDir dir;
-    const std::string make =
-        "/usr/bin/ffmpeg -nostdin -v error -y -f lavfi -i sine=frequency=440:duration=30 "
-        "-c:a libmp3lame ";
     const double frame = 1152.0 / 44100;
     const struct {
         std::string options;
@@ -596,7 +578,7 @@ TEST(Mp3Extract, CutFilesDecodeForTheRequestedSpan) {
     };
     for (const auto& c : cases) {
         const std::string source = dir.PathOf("source.mp3"), out = dir.PathOf("cut.mp3");
-        if (RunCommand(make + c.options + " '" + source + "' 2>&1") != "")
+        if (!FfmpegWrite("-f lavfi -i sine=frequency=440:duration=30 -c:a libmp3lame " + c.options, source))
             GTEST_SKIP() << "ffmpeg cannot encode MP3 here";
         ASSERT_EQ(MP3_GetAudioData2File(source.c_str(), 10, 20, out.c_str()), MM_OK) << c.options;
         EXPECT_NEAR(DecodedSeconds(out), 10.0, c.tolerance) << c.options;

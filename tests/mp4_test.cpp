@@ -70,7 +70,11 @@ std::string Summary(const Mp4ClipWalk& w) {
 
 ByteVec MetaBox(const ByteVec& children) { return FullBox("meta", 0, 0, Join({Hdlr("mdir"), children})); }
 ByteVec Ilst(const ByteVec& items) { return Box("ilst", items); }
-ByteVec Item(const std::string& type, const std::string& s) { return IlstItem(type, 1, ByteVec(s.begin(), s.end())); }
+// An iTunes text item: the type's first byte is the copyright sign.
+const std::string kC = "\xA9";
+ByteVec Item(const std::string& type, const std::string& s) {
+    return IlstItem(kC + type, 1, ByteVec(s.begin(), s.end()));
+}
 ByteVec Udta(const ByteVec& children) { return Box("udta", children); }
 
 ByteVec Modl(const std::string& body) { return FullBox("modl", 0, 0, ByteVec(body.begin(), body.end())); }
@@ -396,10 +400,7 @@ TEST(Mp4Boxes, HeaderLengthsAndFileTypeBrandsAreBoundedByTheBox) {
 
 // User data: 3GPP text boxes, iTunes items and the order in which they overwrite each other.
 TEST_F(Mp4, UserDataMetadata) {
-    const ByteVec ilst =
-        MetaBox(Ilst(Item("\xA9"
-                          "nam",
-                          "From ilst")));
+    const ByteVec ilst = MetaBox(Ilst(Item("nam", "From ilst")));
     const ByteVec titl = Udta(TextBox("titl", "From titl"));
     const ByteVec tag =
         Id3Tag(4, {Id3Frame(4, "TIT2", TextBody(3, "Embedded")), Id3Frame(4, "TPE1", TextBody(0, "Band"))});
@@ -423,31 +424,14 @@ TEST_F(Mp4, UserDataMetadata) {
          {}},
         // Long texts are cut to 128 bytes.
         {"long titl", Udta(TextBox("titl", std::string(200, 'x'))), {}},
-        {"long nam",
-         MetaBox(Ilst(Item("\xA9"
-                           "nam",
-                           std::string(300, 'y')))),
-         {}},
+        {"long nam", MetaBox(Ilst(Item("nam", std::string(300, 'y')))), {}},
         // Artist, year, genre and a 4-byte binary track; cmt and covr are not read; a later
         // item replaces an earlier one whole.
         {"itunes",
-         Udta(MetaBox(Ilst(Join({Item("\xA9"
-                                      "ART",
-                                      "Band"),
-                                 Item("\xA9"
-                                      "day",
-                                      "2001-02-03"),
-                                 IlstItem("gnre", 0, {0, 1}), IlstItem("trkn", 0, {0, 0, 0, 7, 0, 12, 0, 0}),
-                                 Item("\xA9"
-                                      "cmt",
-                                      "skipped"),
-                                 IlstItem("covr", 13, ByteVec(50, 0xFF)),
-                                 Item("\xA9"
-                                      "nam",
-                                      "First longer"),
-                                 Item("\xA9"
-                                      "nam",
-                                      "Second")})))),
+         Udta(MetaBox(Ilst(
+             Join({Item("ART", "Band"), Item("day", "2001-02-03"), IlstItem("gnre", 0, {0, 1}),
+                   IlstItem("trkn", 0, {0, 0, 0, 7, 0, 12, 0, 0}), Item("cmt", "skipped"),
+                   IlstItem("covr", 13, ByteVec(50, 0xFF)), Item("nam", "First longer"), Item("nam", "Second")})))),
          {}},
         // Genre numbers count from 1: 0 and 148 stay raw, the last name is out of reach.
         {"gnre 0", MetaBox(Ilst(IlstItem("gnre", 0, {0, 0}))), {}},
@@ -461,15 +445,9 @@ TEST_F(Mp4, UserDataMetadata) {
         {"ID32", MetaBox(FullBox("ID32", 0, 0, Join({Bytes().be16(0x15C7).data(), tag}))), {}},
         {"empty ID32 tag",
          MetaBox(Join({FullBox("ID32", 0, 0, Bytes().be16(0x15C7).str("ID3").u8(4).u8(0).u8(0).syncsafe32(0)),
-                       Ilst(Item("\xA9"
-                                 "ART",
-                                 "Kept"))})),
+                       Ilst(Item("ART", "Kept"))})),
          {}},
-        {"empty ID32 box",
-         MetaBox(Join({FullBox("ID32", 0, 0, {}), Ilst(Item("\xA9"
-                                                            "ART",
-                                                            "Kept"))})),
-         {}},
+        {"empty ID32 box", MetaBox(Join({FullBox("ID32", 0, 0, {}), Ilst(Item("ART", "Kept"))})), {}},
         // A child of size 0 ends the udta walk with a failure: nothing is copied.
         {"udta child of size 0", Udta(Join({TextBox("titl", "Lost"), Bytes().be32(0).str("junk").data()})), {}},
         // Boxes too short for their language field are skipped.
@@ -479,25 +457,12 @@ TEST_F(Mp4, UserDataMetadata) {
         // data shorter than its header, trkn without its bytes, data claiming more than the
         // file, an item of size 0.
         {"hostile items",
-         MetaBox(Ilst(Join({Box("\xA9"
-                                "nam",
-                                Box("data", {1, 2})),
-                            IlstItem("trkn", 0, {0, 0}),
-                            Box("\xA9"
-                                "alb",
-                                Bytes().be32(0x7FFFFF00).str("data").zeros(8)),
-                            Bytes()
-                                .be32(0)
-                                .str("\xA9"
-                                     "ART")
-                                .data()}))),
+         MetaBox(Ilst(Join({Box(kC + "nam", Box("data", {1, 2})), IlstItem("trkn", 0, {0, 0}),
+                            Box(kC + "alb", Bytes().be32(0x7FFFFF00).str("data").zeros(8)),
+                            Bytes().be32(0).str(kC + "ART").data()}))),
          {}},
         // A meta without its version word (QuickTime style) is misread, harmlessly.
-        {"quicktime meta",
-         Udta(Box("meta", Join({Hdlr("mdir"), Ilst(Item("\xA9"
-                                                        "nam",
-                                                        "x"))}))),
-         {}},
+        {"quicktime meta", Udta(Box("meta", Join({Hdlr("mdir"), Ilst(Item("nam", "x"))}))), {}},
     };
     Golden golden("mp4", "user data");
     for (const auto& c : cases) {

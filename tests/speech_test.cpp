@@ -29,11 +29,6 @@ using Data = std::vector<uint8_t>;
 
 std::vector<uint8_t> Qcp(const std::vector<Bytes>& chunks) { return RiffForm("QLCM", chunks); }
 Bytes DataChunk(const Bytes& packets) { return SpeechChunk("data", packets); }
-std::string Hex(int32_t r) {
-    char s[16];
-    std::snprintf(s, sizeof s, "%x", static_cast<unsigned>(r));
-    return s;
-}
 
 // The answers for a file of a type on one line: clip and codec (public), the MIME
 // type slot (one record kept across calls: each answer releases the one before;

@@ -140,11 +140,7 @@ void Stress(const std::vector<std::string>& files) {
 TEST(ThreadStress, SamplesBuiltAndProtectedFilesAnswerAsAlone) {
     ASSERT_TRUE(std::filesystem::is_directory("samples")) << "run from the project folder";
     TempDir dir;
-    std::vector<std::string> files;
-    for (const auto& entry : std::filesystem::recursive_directory_iterator("samples")) {
-        if (entry.is_regular_file()) files.push_back(entry.path().string());
-    }
-    std::sort(files.begin(), files.end());
+    std::vector<std::string> files = FilesUnder("samples");
     for (const FixtureFile& f : FixtureFiles()) files.push_back(dir.Write(f.name, f.bytes));
     const size_t plain = files.size();
     for (size_t i = 0; i < plain; ++i) {
@@ -158,10 +154,5 @@ TEST(ThreadStress, SamplesBuiltAndProtectedFilesAnswerAsAlone) {
 TEST(ThreadStress, CorpusFilesAnswerAsAlone) {
     const std::string corpus = CorpusDir();
     if (corpus.empty()) GTEST_SKIP() << NoCorpusReason();
-    std::vector<std::string> files;
-    for (const auto& entry : std::filesystem::recursive_directory_iterator(corpus)) {
-        if (entry.is_regular_file()) files.push_back(entry.path().string());
-    }
-    std::sort(files.begin(), files.end());
-    Stress(files);
+    Stress(FilesUnder(corpus));
 }

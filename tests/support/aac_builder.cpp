@@ -154,17 +154,18 @@ std::vector<uint8_t> AdtsFrames(const AdtsFields& layout, const std::vector<size
     return out;
 }
 
+std::vector<uint8_t> SilentAdts(int n, const AdtsFields& shape) {
+    std::vector<uint8_t> out;
+    for (int i = 0; i < n; ++i) out = Join({out, AdtsFrame(shape, SilentAacBlock())});
+    return out;
+}
+
 AdtsFields AdtsLayout(int samplingIndex, int channelConfig, int profile) {
     AdtsFields s;
     s.samplingIndex = samplingIndex;
     s.channelConfig = channelConfig;
     s.profile = profile;
     return s;
-}
-
-std::vector<uint8_t> Join(std::vector<uint8_t> a, const std::vector<uint8_t>& b) {
-    a.insert(a.end(), b.begin(), b.end());
-    return a;
 }
 
 }  // namespace testing_support

@@ -67,7 +67,7 @@ std::vector<uint8_t> AdifFile(const AdifLayout& layout, const std::vector<uint8_
 // ADTS frames, one per entry of sizes (each at least 18 bytes: 7 header + 11 block).
 std::vector<uint8_t> AdtsFrames(const AdtsFields& layout, const std::vector<size_t>& sizes, int sbrExtension = 0);
 AdtsFields AdtsLayout(int samplingIndex, int channelConfig, int profile = 1);
-
-std::vector<uint8_t> Join(std::vector<uint8_t> a, const std::vector<uint8_t>& b);
+// n frames of the smallest kind: header and a silent block, 11 bytes.
+std::vector<uint8_t> SilentAdts(int n, const AdtsFields& shape = {});
 
 }  // namespace testing_support

@@ -34,6 +34,10 @@ Bytes AsfHeader(const std::vector<Bytes>& objects, int64_t count) {
     return AsfObject(asf_guid::kHeader, body);
 }
 
+std::vector<uint8_t> AsfFile(const std::vector<Bytes>& objects, int64_t count) {
+    return AsfHeader(objects, count).raw(AsfGuid("75B22636-668E-11CF-A6D9-00AA0062CE6C")).le64(50).fill(26, 0).data();
+}
+
 Bytes AsfFileProperties(uint64_t fileSize, uint64_t playDuration, uint64_t preroll, uint32_t maxBitrate) {
     Bytes b;
     b.fill(16, 0xAB);  // File ID

@@ -39,6 +39,8 @@ Bytes AsfGuid(const char* text);
 Bytes AsfObject(const char* guid, const Bytes& body, int64_t size = -1);
 // Header Object holding the objects; the count defaults to their number.
 Bytes AsfHeader(const std::vector<Bytes>& objects, int64_t count = -1);
+// That header followed by a stub Data Object, as files have one.
+std::vector<uint8_t> AsfFile(const std::vector<Bytes>& objects, int64_t count = -1);
 
 // Durations in 100-ns units, preroll in milliseconds.
 Bytes AsfFileProperties(uint64_t fileSize, uint64_t playDuration, uint64_t preroll, uint32_t maxBitrate);

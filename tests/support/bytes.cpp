@@ -4,8 +4,10 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cstdio>
 #include <cstdlib>
+#include <filesystem>
 #include <fstream>
 #include <iterator>
 #include <stdexcept>
@@ -20,6 +22,21 @@ Bytes& Bytes::patch_be32(size_t offset, uint32_t v) {
 Bytes& Bytes::patch_le32(size_t offset, uint32_t v) {
     for (size_t i = 0; i < 4; ++i) data_.at(offset + i) = static_cast<uint8_t>(v >> (8 * i));
     return *this;
+}
+
+std::vector<uint8_t> Join(std::initializer_list<std::vector<uint8_t>> parts) {
+    std::vector<uint8_t> out;
+    for (const auto& p : parts) out.insert(out.end(), p.begin(), p.end());
+    return out;
+}
+
+std::vector<std::string> FilesUnder(const std::string& root) {
+    std::vector<std::string> files;
+    for (const auto& entry : std::filesystem::recursive_directory_iterator(root)) {
+        if (entry.is_regular_file()) files.push_back(entry.path().string());
+    }
+    std::sort(files.begin(), files.end());
+    return files;
 }
 
 TempDir::TempDir() {

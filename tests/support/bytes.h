@@ -2,6 +2,7 @@
 #pragma once
 
 #include <cstdint>
+#include <initializer_list>
 #include <string>
 #include <vector>
 
@@ -71,7 +72,12 @@ private:
     std::string path_;
 };
 
+// Byte runs one after another.
+std::vector<uint8_t> Join(std::initializer_list<std::vector<uint8_t>> parts);
+
 std::vector<uint8_t> ReadFileBytes(const std::string& path);
+// Every regular file under root, sorted by path.
+std::vector<std::string> FilesUnder(const std::string& root);
 
 // Folder of real-world media kept beside the project, or "" when absent.
 std::string CorpusDir();

@@ -4,8 +4,7 @@
 
 namespace testing_support {
 
-// Output of a shell command, or "" when it failed.
-static std::string RunShell(const std::string& command) {
+std::string RunShell(const std::string& command) {
     std::string out;
     FILE* p = popen(command.c_str(), "r");
     if (p == nullptr) return out;

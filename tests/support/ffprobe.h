@@ -5,6 +5,9 @@
 
 namespace testing_support {
 
+// Output of a shell command, or "" when it failed.
+std::string RunShell(const std::string& command);
+
 // Writes path with ffmpeg from inputs and codec arguments; false when this
 // ffmpeg cannot (an encoder not built in).
 bool FfmpegWrite(const std::string& args, const std::string& path);

@@ -22,12 +22,6 @@ void Add(Files& out, int type, const std::string& name, const Seed& bytes) { out
 
 const Seed kJpeg = {0xFF, 0xD8, 0xFF, 0xE0, 0, 16, 'J', 'F', 'I', 'F', 0, 1, 1, 0, 0, 1, 0, 1, 0, 0, 0xFF, 0xD9};
 
-Seed Cat(std::initializer_list<Seed> parts) {
-    Seed out;
-    for (const Seed& p : parts) out.insert(out.end(), p.begin(), p.end());
-    return out;
-}
-
 Seed Id3Frames(int version) {
     const uint8_t enc = version == 4 ? 3 : 0;
     return Id3Tag(
@@ -47,16 +41,17 @@ void AddMp3Files(Files& out) {
     const VbriFields vbri{0x0102, 1, 4, 40 * Mp3FrameSize({}), 40};
 
     Add(out, MEDIA_TYPE_MP3, "frames.mp3", Mp3Frames(40));
-    Add(out, MEDIA_TYPE_MP3, "id3v23.mp3", Cat({Id3Frames(3), Mp3Frames(20), Id3v1(v1)}));
-    Add(out, MEDIA_TYPE_MP3, "id3v24.mp3", Cat({Id3Frames(4), Mp3Frames(20)}));
+    Add(out, MEDIA_TYPE_MP3, "id3v23.mp3", Join({Id3Frames(3), Mp3Frames(20), Id3v1(v1)}));
+    Add(out, MEDIA_TYPE_MP3, "id3v24.mp3", Join({Id3Frames(4), Mp3Frames(20)}));
     Add(out, MEDIA_TYPE_MP3, "id3v22.mp3",
-        Cat({Id3Tag(2, {Id3Frame22("TT2", TextBody(0, "Title")), Id3Frame22("TP1", TextBody(0, "Artist")),
-                        Id3Frame22("PIC", Bytes().u8(0).str("JPG").u8(3).u8(0).raw(kJpeg).data())}),
-             Mp3Frames(20)}));
+        Join({Id3Tag(2, {Id3Frame22("TT2", TextBody(0, "Title")), Id3Frame22("TP1", TextBody(0, "Artist")),
+                         Id3Frame22("PIC", Bytes().u8(0).str("JPG").u8(3).u8(0).raw(kJpeg).data())}),
+              Mp3Frames(20)}));
     Add(out, MEDIA_TYPE_MP3, "unsync.mp3",
-        Cat({Id3Tag(3, {Unsynchronise(Id3Frame(3, "APIC", ApicBody("image/jpeg", kJpeg)))}, 16, 0x80), Mp3Frames(10)}));
-    Add(out, MEDIA_TYPE_MP3, "xing.mp3", Cat({XingFrame(xing), Mp3Frames(40)}));
-    Add(out, MEDIA_TYPE_MP3, "vbri.mp3", Cat({VbriFrame(vbri), Mp3Frames(40)}));
+        Join(
+            {Id3Tag(3, {Unsynchronise(Id3Frame(3, "APIC", ApicBody("image/jpeg", kJpeg)))}, 16, 0x80), Mp3Frames(10)}));
+    Add(out, MEDIA_TYPE_MP3, "xing.mp3", Join({XingFrame(xing), Mp3Frames(40)}));
+    Add(out, MEDIA_TYPE_MP3, "vbri.mp3", Join({VbriFrame(vbri), Mp3Frames(40)}));
     Add(out, MEDIA_TYPE_MP3, "mpeg2-mono.mp3", Mp3Frames(30, mpeg2));
     Add(out, MEDIA_TYPE_MP3, "layer2.mp3", Mp3Frames(30, layer2));
     Add(out, MEDIA_TYPE_MP3, "mpeg25.mp3", Mp3Frames(30, mpeg25));
@@ -73,7 +68,7 @@ void AddAacFiles(Files& out) {
     Add(out, MEDIA_TYPE_AAC, "adts-sbr.aac", AdtsFrames(AdtsLayout(6, 2), sizes, 13));
     Add(out, MEDIA_TYPE_AAC, "adts-crc-mono.aac", AdtsFrames(crc, sizes));
     Add(out, MEDIA_TYPE_AAC, "adts-id3.aac",
-        Cat({Id3Frames(3), AdtsFrames(AdtsLayout(4, 2), sizes), Id3v1Titled("Title")}));
+        Join({Id3Frames(3), AdtsFrames(AdtsLayout(4, 2), sizes), Id3v1Titled("Title")}));
     Add(out, MEDIA_TYPE_AAC, "adif.aac", AdifFile(adif, AacBlock(true)));
 }
 
@@ -137,7 +132,6 @@ void AddMp4Files(Files& out) {
 
 void AddAsfFiles(Files& out) {
     constexpr uint64_t kSecond = 10000000;
-    const Bytes dataObject = Bytes().raw(AsfGuid("75B22636-668E-11CF-A6D9-00AA0062CE6C")).le64(50).fill(26, 0);
     const std::vector<AsfDescriptor> descriptors = {
         {"WM/AlbumTitle", 0, Utf16("Album").data()},
         {"WM/Year", 0, Utf16("2009").data()},
@@ -146,23 +140,20 @@ void AddAsfFiles(Files& out) {
         {"IsVBR", 2, Bytes().le32(1).data()},
         {"WM/Picture", 1, AsfWmPicture(3, "image/jpeg", "cover", Bytes(kJpeg)).data()},
     };
-    auto file = [&](const std::vector<Bytes>& objects) {
-        return Bytes().raw(AsfHeader(objects)).raw(dataObject).data();
-    };
     const Bytes props = AsfFileProperties(4096, 3 * kSecond, 500, 128000);
     const Bytes audio = AsfAudioStream(1, 0x161, 44100, 2, 128000);
     const Bytes description = AsfContentDescription("Title", "Author", "(c)", "About", "PG");
 
     Add(out, MEDIA_TYPE_ASF, "audio.wma",
-        file({props, audio, description, AsfExtContentDescription(descriptors), AsfStreamBitrates({{1, 128000}})}));
+        AsfFile({props, audio, description, AsfExtContentDescription(descriptors), AsfStreamBitrates({{1, 128000}})}));
     Add(out, MEDIA_TYPE_ASF, "video.wmv",
-        file({AsfFileProperties(8192, 5 * kSecond, 3000, 500000), audio,
-              AsfVideoStream(2, "WMV3", 320, 240, {0x4F, 0xD1, 0x1A, 0x01}),
-              AsfHeaderExtension({AsfExtStreamProperties(2, 333333), AsfMetadata(descriptors)}),
-              AsfStreamBitrates({{1, 128000}, {2, 372000}})}));
+        AsfFile({AsfFileProperties(8192, 5 * kSecond, 3000, 500000), audio,
+                 AsfVideoStream(2, "WMV3", 320, 240, {0x4F, 0xD1, 0x1A, 0x01}),
+                 AsfHeaderExtension({AsfExtStreamProperties(2, 333333), AsfMetadata(descriptors)}),
+                 AsfStreamBitrates({{1, 128000}, {2, 372000}})}));
     Add(out, MEDIA_TYPE_ASF, "branding.asf",
-        file({props, AsfAudioStream(1, 0x0A, 16000, 1, 20000), AsfContentBranding(3, Bytes(kJpeg), "u", "c"),
-              AsfHeaderExtension({AsfMetadata(descriptors, true)})}));
+        AsfFile({props, AsfAudioStream(1, 0x0A, 16000, 1, 20000), AsfContentBranding(3, Bytes(kJpeg), "u", "c"),
+                 AsfHeaderExtension({AsfMetadata(descriptors, true)})}));
 }
 
 void AddRealMediaFiles(Files& out) {
@@ -198,7 +189,8 @@ void AddAviFiles(Files& out) {
 void AddSpeechFiles(Files& out) {
     Add(out, MEDIA_TYPE_AMR_NB, "nb.amr", AmrFile(false, 7, 100));
     Add(out, MEDIA_TYPE_AMR_NB, "nb-mixed.amr",
-        Cat({AmrFile(false, 2, 20), AmrFrame(false, 8).data(), AmrFrame(false, 15).data(), AmrFrame(false, 0).data()}));
+        Join(
+            {AmrFile(false, 2, 20), AmrFrame(false, 8).data(), AmrFrame(false, 15).data(), AmrFrame(false, 0).data()}));
     Add(out, MEDIA_TYPE_AMR_NB, "nb-mc.amr", AmrFile(false, 4, 30, 2));
     Add(out, MEDIA_TYPE_AMR_WB, "wb.awb", AmrFile(true, 8, 100));
     Add(out, MEDIA_TYPE_WAVE, "pcm.wav", CanonicalWave(1, 2, 8000, 16, 8000 * 4 * 3));

@@ -4,12 +4,6 @@
 
 namespace testing_support {
 
-ByteVec Join(std::initializer_list<ByteVec> parts) {
-    ByteVec out;
-    for (const ByteVec& p : parts) out.insert(out.end(), p.begin(), p.end());
-    return out;
-}
-
 ByteVec Box(const std::string& type, const ByteVec& body) {
     return Bytes().be32(static_cast<uint32_t>(8 + body.size())).str(type).raw(body).data();
 }

@@ -13,9 +13,6 @@ namespace testing_support {
 
 using ByteVec = std::vector<uint8_t>;
 
-// Joins boxes (or any byte runs) one after another.
-ByteVec Join(std::initializer_list<ByteVec> parts);
-
 // A box whose 32-bit size covers the header and the body.
 ByteVec Box(const std::string& type, const ByteVec& body = {});
 // A full box: the version byte and 24-bit flags, then the body.
