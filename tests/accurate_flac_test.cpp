@@ -31,12 +31,6 @@ Bytes Flac(const std::vector<Bytes>& blocks, const Bytes& before = Bytes()) {
     return b.fill(300, 0xAA);  // frames
 }
 
-Bytes Cat(const std::vector<std::vector<uint8_t>>& parts) {
-    Bytes b;
-    for (const auto& p : parts) b.raw(p);
-    return b;
-}
-
 void Check(const std::vector<Row>& rows, const char* name) {
     for (const Row& row : rows) {
         SCOPED_TRACE(row.name);
@@ -58,13 +52,14 @@ TEST(AccurateFlac, FactsOfBuiltStreams) {
          "flac audio/flac 3000 | flac 44100x2x16 800 | T;A;B;Al;AA;Rock;2019-05-02;2019;3/11;1/2;D;C FOO=bar | "
          "image/png 3 front 6 89504e47"},
         {"24-bit behind two ID3v2 tags",
-         Flac({FlacBlock(kInfo, FlacStreamInfo(96000, 1, 24, 48000), true)}, Cat({Id3Tag(3, {}), Id3Tag(4, {})})),
+         Flac({FlacBlock(kInfo, FlacStreamInfo(96000, 1, 24, 48000), true)},
+              Bytes(Join({Id3Tag(3, {}), Id3Tag(4, {})}))),
          "flac audio/flac 500 | flac 96000x1x24 4800 | ;;;;;;0;0/0;0/0;;"},
         {"an ID3v2 tag ahead fills what the Vorbis comment lacks",
          Flac({FlacBlock(kInfo, FlacStreamInfo(8000, 1, 16, 8000)),
                FlacBlock(kComments, VorbisComments({"TITLE=T"}), true)},
-              Cat({Id3Tag(3, {Id3Frame(3, "TIT2", TextBody(0, "Id3 title")),
-                              Id3Frame(3, "TPE1", TextBody(0, "Id3 artist"))})})),
+              Bytes(Join({Id3Tag(3, {Id3Frame(3, "TIT2", TextBody(0, "Id3 title")),
+                                     Id3Frame(3, "TPE1", TextBody(0, "Id3 artist"))})}))),
          "flac audio/flac 1000 | flac 8000x1x16 2400 | T;Id3 artist;;;;;0;0/0;0/0;;"},
         {"no sample count: length unknown; blocks after the last one are frames",
          Flac({FlacBlock(kInfo, FlacStreamInfo(8000, 1, 8, 0), true),
@@ -101,21 +96,22 @@ TEST(AccurateFlac, ApeTagsFillWhatId3Lacks) {
                               {"Cover Art (Back)", Bytes().str("no separator"), true}});
     const Bytes bigCover = Bytes().str("c.png").u8(0).raw(kPng).zeros(40000);
     const std::vector<Row> rows = {
-        {"ID3v2, APEv2, ID3v1", Cat({id3.data(), audio.data(), ape.data(), Id3v1Titled("V1")}),
+        {"ID3v2, APEv2, ID3v1", Bytes(Join({id3.data(), audio.data(), ape.data(), Id3v1Titled("V1")})),
          "mp3 audio/mpeg 1045 | mp3 44100x2x0 128000 | Id3 title;A;;AA;;2001-02;2001;3/11;2/0;; Mood=calm | "
          "image/png 3 cover.png 6 89504e47"},
-        {"an APE tag ranks above the ID3v1 tag after it", Cat({audio.data(), ape.data(), Id3v1Titled("V1")}),
+        {"an APE tag ranks above the ID3v1 tag after it", Bytes(Join({audio.data(), ape.data(), Id3v1Titled("V1")})),
          "mp3 audio/mpeg 1045 | mp3 44100x2x0 128000 | Ape title;A;;AA;;2001-02;2001;3/11;2/0;; Mood=calm | "
          "image/png 3 cover.png 6 89504e47"},
         // Over 1 MiB of frames the length comes from the stream's bytes: both tags are left out.
         {"APEv2 then ID3v1 (as mutagen writes them), no ID3v2",
-         Cat({Mp3Frames(2600), ApeTag({{"Artist", Bytes().str("A")}, {"Cover Art (Front)", bigCover, true}}).data(),
-              Id3v1Titled("V1")}),
+         Bytes(Join({Mp3Frames(2600),
+                     ApeTag({{"Artist", Bytes().str("A")}, {"Cover Art (Front)", bigCover, true}}).data(),
+                     Id3v1Titled("V1")})),
          "mp3 audio/mpeg 67763~ | mp3 44100x2x0 128000 | V1;A;;;;;0;0/0;0/0;; | image/png 3 c.png 40006 89504e47"},
-        {"APEv1 alone at the end", Cat({audio.data(), ApeTag({{"Title", Bytes().str("T1")}}, 1000)}),
+        {"APEv1 alone at the end", Bytes(Join({audio.data(), ApeTag({{"Title", Bytes().str("T1")}}, 1000)})),
          "mp3 audio/mpeg 1045 | mp3 44100x2x0 128000 | T1;;;;;;0;0/0;0/0;;"},
         {"a tag size past the start of the file",
-         Cat({audio.data(), Bytes().str("APETAGEX").le32(2000).le32(0x7FFFFFFF).le32(1).zeros(12).data()}),
+         Bytes(Join({audio.data(), Bytes().str("APETAGEX").le32(2000).le32(0x7FFFFFFF).le32(1).zeros(12).data()})),
          "mp3 audio/mpeg 1045 | mp3 44100x2x0 128000 | ;;;;;;0;0/0;0/0;;"},
     };
     Check(rows, "f.mp3");

@@ -22,11 +22,6 @@ using Data = std::vector<uint8_t>;
 
 namespace {
 
-Data Cat(std::initializer_list<Data> parts) {
-    Data out;
-    for (const Data& p : parts) out.insert(out.end(), p.begin(), p.end());
-    return out;
-}
 Data Str(const std::string& s) { return Data(s.begin(), s.end()); }
 Data Frame3(const std::string& id, const Data& body) { return Id3Frame(3, id, body); }
 Data Frame4(const std::string& id, const Data& body) { return Id3Frame(4, id, body); }
@@ -106,15 +101,17 @@ TEST(AccurateId3, TextOfEveryEncodingAndFrameKind) {
          "\xC3\x9C"
          "ber"},
         {4, Frame4("TPE1", TextBody(3, std::string("A\0B", 3))), "artist", "A"},
-        {4, Frame4("TPUB", TextBytes(1, Cat({hiBE, zero2, hiLE}))), "TPUB", "Hi; Hi"},  // a mark per value
+        {4, Frame4("TPUB", TextBytes(1, testing_support::Join({hiBE, zero2, hiLE}))), "TPUB",
+         "Hi; Hi"},  // a mark per value
         {3, Frame3("TPE2", TextBody(0, "AA")), "albumArtist", "AA"},
         {3, Frame3("TCOM", TextBody(0, "C")), "composer", "C"},
         {4, Frame4("TALB", TextBody(3, "Al")), "album", "Al"},
-        {3, Frame3("COMM", Cat({{1}, Str("eng"), hiLE, zero2, Utf16("Text", true, true)})), "comment", "Text"},
+        {3, Frame3("COMM", testing_support::Join({{1}, Str("eng"), hiLE, zero2, Utf16("Text", true, true)})), "comment",
+         "Text"},
         {3,
-         Cat({Frame3("COMM", TextBody(0, std::string("xxxiTunNORM\0 0001", 17))),
-              Frame3("COMM", TextBody(0, std::string("engdesc\0Described", 17))),
-              Frame3("COMM", TextBody(0, std::string("deu\0Plain", 9)))}),
+         testing_support::Join({Frame3("COMM", TextBody(0, std::string("xxxiTunNORM\0 0001", 17))),
+                                Frame3("COMM", TextBody(0, std::string("engdesc\0Described", 17))),
+                                Frame3("COMM", TextBody(0, std::string("deu\0Plain", 9)))}),
          "comment", "Plain"},
         {3, Frame3("COMM", TextBody(0, std::string("engdesc\0Described", 17))), "comment", "Described"},
         {4, Frame4("TXXX", TextBody(3, std::string("MOOD\0Calm", 9))), "TXXX:MOOD", "Calm"},
@@ -128,7 +125,8 @@ TEST(AccurateId3, TextOfEveryEncodingAndFrameKind) {
         {3, Frame3("TCON", TextBody(0, "RX")), "genre", "Remix"},
         {3, Frame3("TCON", TextBody(0, "(CR)")), "genre", "Cover"},
         {4, Frame4("TCON", TextBody(3, std::string("Jazz\0Pop", 8))), "genre", "Jazz"},
-        {3, Cat({Frame3("TYER", TextBody(0, "2021")), Frame3("TDAT", TextBody(0, "0504"))}), "date", "2021-04-05"},
+        {3, testing_support::Join({Frame3("TYER", TextBody(0, "2021")), Frame3("TDAT", TextBody(0, "0504"))}), "date",
+         "2021-04-05"},
         {3, Frame3("TYER", TextBody(0, "2021")), "year", "2021"},
         {4, Frame4("TDRC", TextBody(3, "2021-04-05T10:00")), "date", "2021-04-05T10:00"},
         {3, Frame3("TRCK", TextBody(0, "3/12")), "track", "3/12"},
@@ -150,7 +148,7 @@ TEST(AccurateId3, V1FillsWhatV2LacksAndTagEndCountsEveryLeadingTag) {
     v1.year = "1999";
     v1.track = 7;
     v1.genre = 17;
-    const Accurate a = ReadAccurate(Cat({kPlainTag, Mp3Frames(2), Id3v1(v1)}));
+    const Accurate a = ReadAccurate(testing_support::Join({kPlainTag, Mp3Frames(2), Id3v1(v1)}));
     EXPECT_EQ(a.tags.title, "T");
     EXPECT_EQ(a.tags.artist, "V1 artist");
     EXPECT_EQ(a.tags.date, "1999");
@@ -160,14 +158,14 @@ TEST(AccurateId3, V1FillsWhatV2LacksAndTagEndCountsEveryLeadingTag) {
 
     Data footer = kPlainTag;
     footer[5] = 0x10;
-    const Data footed = Cat({footer, Str("3DI"), Data(footer.begin() + 3, footer.begin() + 10)});
+    const Data footed = testing_support::Join({footer, Str("3DI"), Data(footer.begin() + 3, footer.begin() + 10)});
     const struct {
         Data file;
         uint64_t tagEnd;
     } ends[] = {
-        {Cat({kPlainTag, Mp3Frames(1)}), kPlainTag.size()},
-        {Cat({footed, Mp3Frames(1)}), footed.size()},
-        {Cat({kPlainTag, kPlainTag, Mp3Frames(1)}), 2 * kPlainTag.size()},
+        {testing_support::Join({kPlainTag, Mp3Frames(1)}), kPlainTag.size()},
+        {testing_support::Join({footed, Mp3Frames(1)}), footed.size()},
+        {testing_support::Join({kPlainTag, kPlainTag, Mp3Frames(1)}), 2 * kPlainTag.size()},
         {Mp3Frames(1), 0},
     };
     for (const auto& row : ends) EXPECT_EQ(ReadAccurate(row.file).tagEnd, row.tagEnd);
@@ -176,7 +174,8 @@ TEST(AccurateId3, V1FillsWhatV2LacksAndTagEndCountsEveryLeadingTag) {
 // Each switch: a tag the MM_ answer reads its way, and what the tag holds.
 TEST(AccurateId3, QuirkSwitchesKeepTheContractAndTellTheTruth) {
     const Data cover = Frame3("APIC", ApicBody("image/png", PictureBytes(40)));
-    const Data extended = Id3v2Tag(4, Cat({{0, 0, 0, 6, 1, 0}, Frame4("TIT2", TextBody(0, "T")), Data(16, 0)}), 0x40);
+    const Data extended =
+        Id3v2Tag(4, testing_support::Join({{0, 0, 0, 6, 1, 0}, Frame4("TIT2", TextBody(0, "T")), Data(16, 0)}), 0x40);
     Data syncsafeSized = Id3Frame(4, "TXXX", TextBody(0, std::string(200, 'x')));
     syncsafeSized[3] = 'X';  // a v2.3 frame written with a v2.4 size
     const Data stuffed = Frame3("TXXX", {0, 0xFF, 0xE0, 'x'});
@@ -191,7 +190,8 @@ TEST(AccurateId3, QuirkSwitchesKeepTheContractAndTellTheTruth) {
         {"id3NeedsPadding", Id3Tag(3, {Frame3("TIT2", TextBody(0, "T")), cover}, 0), META_TITLE, "no tag", "title",
          "T"},
         {"id3YearKeepsEncodingByte", Id3Tag(4, {Frame4("TDRC", TextBody(0, "2024"))}), META_YEAR, "", "year", "2024"},
-        {"id3Utf16BeEmpty", Id3Tag(4, {Frame4("COMM", Cat({{2}, Str("eng"), {0, 0}, Utf16("Hi", true, false)}))}),
+        {"id3Utf16BeEmpty",
+         Id3Tag(4, {Frame4("COMM", testing_support::Join({{2}, Str("eng"), {0, 0}, Utf16("Hi", true, false)}))}),
          META_COMMENT, "", "comment", "Hi"},
         {"id3Utf16BeEmpty", Id3Tag(4, {Frame4("TCON", TextBytes(2, Utf16("Rock", true, false)))}), META_GENRE, "",
          "genre", "Rock"},
@@ -199,11 +199,12 @@ TEST(AccurateId3, QuirkSwitchesKeepTheContractAndTellTheTruth) {
         {"id3FrameSizeAsStated", Id3Tag(3, {Frame3("TIT2", TextBody(0, "T")), syncsafeSized}, 4), META_TITLE, "no tag",
          "title", "T"},
         {"id3UnsyncSizeIsStored",
-         Id3v2Tag(3, Unsynchronise(Cat({stuffed, Frame3("TPE1", TextBody(0, "After")), Data(16, 0)})), 0x80),
+         Id3v2Tag(3, Unsynchronise(testing_support::Join({stuffed, Frame3("TPE1", TextBody(0, "After")), Data(16, 0)})),
+                  0x80),
          META_ARTIST, "no tag", "artist", "After"},
     };
     for (const auto& row : rows) {
-        const Data file = Cat({row.tag, Mp3Frames(2)});
+        const Data file = testing_support::Join({row.tag, Mp3Frames(2)});
         EXPECT_EQ(ContractItem(file, row.item), row.contract) << row.quirk;
         EXPECT_EQ(FieldOf(ReadAccurate(file).tags, row.field), row.accurate) << row.quirk;
     }
@@ -226,17 +227,19 @@ TEST(AccurateId3, PicturesLieWhereTheFileKeepsThemAndCopyWhole) {
          "image/jpeg", 4, "Back", false},
         {"v2.2", Id3Tag(2, {Id3Frame22("PIC", PictureBody(2, 0, "JPG", 3, Str("d"), picture))}), "image/jpeg", 3, "d",
          false},
-        {"v2.3 tag unsync", Id3v2Tag(3, Unsynchronise(Cat({Frame3("APIC", apic), Data(8, 0)})), 0x80), "image/png", 3,
-         "Front", true},
+        {"v2.3 tag unsync", Id3v2Tag(3, Unsynchronise(testing_support::Join({Frame3("APIC", apic), Data(8, 0)})), 0x80),
+         "image/png", 3, "Front", true},
         {"v2.2 tag unsync",
-         Id3v2Tag(2, Unsynchronise(Cat({Id3Frame22("PIC", PictureBody(2, 0, "PNG", 0, {}, picture)), Data(8, 0)})),
+         Id3v2Tag(2,
+                  Unsynchronise(
+                      testing_support::Join({Id3Frame22("PIC", PictureBody(2, 0, "PNG", 0, {}, picture)), Data(8, 0)})),
                   0x80),
          "image/png", 0, "", true},
         {"v2.4 frame unsync", Id3Tag(4, {Id3Frame(4, "APIC", dataLength, 0x03)}), "image/png", 3, "Front", true},
     };
     TempDir dir;
     for (const auto& row : rows) {
-        const Data file = Cat({row.tag, Mp3Frames(4)});
+        const Data file = testing_support::Join({row.tag, Mp3Frames(4)});
         const std::string path = dir.Write("p.mp3", file);
         mi_info* info = nullptr;
         ASSERT_EQ(mi_probe(path.c_str(), &info), MI_OK) << row.name;
@@ -264,14 +267,15 @@ TEST(AccurateId3, BrokenSizesStayInsideTheTag) {
     pastTag[pastTag.size() - 7] = 0x7F;  // TPE1 claims more than the tag holds
     Data pastFile = kPlainTag;
     pastFile[6] = 0x7F;
-    const Data hugeFrame = Cat({Str("ID3"), {3, 0, 0, 0, 0, 0, 20}, Str("TIT2"), {0xFF, 0xFF, 0xFF, 0xF0, 0, 0}});
+    const Data hugeFrame =
+        testing_support::Join({Str("ID3"), {3, 0, 0, 0, 0, 0, 20}, Str("TIT2"), {0xFF, 0xFF, 0xFF, 0xF0, 0, 0}});
     const struct {
         Data file;
         const char* title;
         const char* artist;
     } rows[] = {{pastTag, "T", "A"}, {pastFile, "-", "-"}, {hugeFrame, "-", "-"}, {Str("ID3"), "-", "-"}};
     for (const auto& row : rows) {
-        const Accurate a = ReadAccurate(Cat({row.file, Mp3Frames(1)}));
+        const Accurate a = ReadAccurate(testing_support::Join({row.file, Mp3Frames(1)}));
         EXPECT_EQ(a.tags.title.empty() ? "-" : a.tags.title, row.title);
         EXPECT_EQ(a.tags.artist.empty() ? "-" : a.tags.artist, row.artist);
     }
