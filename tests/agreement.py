@@ -126,6 +126,8 @@ mp4_flac_44100.mp4                 A44100:3.3 -ac 2 -c:a flac -strict -2
 m4a_alac_44100.m4a                 A44100:3.3 -ac 2 -c:a alac
 mp4_ac3_48000.mp4                  A48000:3.3 -ac 2 -c:a ac3
 mp4_eac3_44100.mp4                 A44100:3.3 -ac 2 -c:a eac3
+m4a_fragmented_44100_2ch_9.6s.m4a  A44100:9.6 AAC2 -movflags frag_keyframe+empty_moov
+mp4_dash_h264_aac_160x120.mp4      V160x120:25:3.3 A44100:3.3 H264 AAC2 -movflags dash+global_sidx
 3gp_h264_176x144_aac.3gp           V176x144:15:3.3 A16000:3.3 H264 -c:a aac
 3gp_amrnb_copy.3gp                 -i {dir}/amrnb_raw_9.6s.amr -c copy
 3gp_amrnb_encoded.3gp              A8000:9.6 -ac 1 -c:a libopencore_amrnb
