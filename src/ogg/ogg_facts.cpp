@@ -106,8 +106,12 @@ void FillFacts(int h, uint64_t fileSize, Walk* w, MediaFacts* facts) {
     uint64_t granule = 0;
     if (timed != nullptr && FindLastGranule(h, fileSize, timed->serial, &granule) && granule < (uint64_t(1) << 62)) {
         const uint64_t samples = granule > timed->preSkip ? granule - timed->preSkip : 0;
-        facts->durationUs = static_cast<int64_t>(static_cast<long double>(samples) * 1e6L / timed->granuleRate + 0.5L);
-        facts->durationExact = true;
+        // A low rate puts a large granule's length past what a count of microseconds holds.
+        const long double us = static_cast<long double>(samples) * 1e6L / timed->granuleRate + 0.5L;
+        if (us < 9.2e18L) {
+            facts->durationUs = static_cast<int64_t>(us);
+            facts->durationExact = true;
+        }
     }
 }
 
