@@ -105,7 +105,9 @@ int64_t StreamDuration(int h, uint64_t fileSize, const OggStream& s) {
         const uint64_t samples = granule > s.preSkip ? granule - s.preSkip : 0;
         seconds = static_cast<long double>(samples) / s.granuleRate;
     }
-    return seconds < 0 ? -1 : static_cast<int64_t>(seconds * 1e6L + 0.5L);
+    // A low rate puts a large granule's length past what a count of microseconds holds.
+    const long double us = seconds * 1e6L + 0.5L;
+    return seconds < 0 || us >= 9.2e18L ? -1 : static_cast<int64_t>(us);
 }
 
 // The file plays as long as its longest stream.
