@@ -1,6 +1,6 @@
 #!/usr/bin/env bash
 # Writes short real files of the formats only the accurate interface reads
-# (FLAC, Ogg, Matroska/WebM, AIFF/AIFC, MP3 and ADTS with APE tags) into
+# (FLAC, Ogg, Matroska/WebM, AIFF/AIFC, MP3 and ADTS with APE tags, fragmented MP4) into
 # OUT_DIR with ffmpeg, lame and mutagen, for metainfo_make_seeds to route by
 # suffix. A tool that is missing leaves its files out.
 #
@@ -39,6 +39,9 @@ ff "${clip[@]}" "${tone[@]}" -c:v libvpx-vp9 -b:v 50k -c:a libopus -b:a 16k vp9.
 ff "${tone[@]}" "${tags[@]}" -attach cover.png -metadata:s:t mimetype=image/png -c:a flac attached.mka
 ffmpeg -nostdin -loglevel error "${clip[@]}" "${tone[@]}" -c:v libx264 -preset ultrafast -c:a aac -b:a 16k \
   -f matroska - >piped.mkv 2>/dev/null || echo "make_media: ffmpeg failed for piped.mkv"
+# Fragmented MP4: the last fragment named by mfra, and a DASH segment index.
+ff "${tone[@]}" -c:a aac -b:a 16k -movflags frag_keyframe+empty_moov fragmented.m4a
+ff "${clip[@]}" "${tone[@]}" -c:v libx264 -preset ultrafast -c:a aac -b:a 16k -f mp4 -movflags dash+global_sidx dash.mp4
 # AIFF and AIFC, with an ID3 chunk.
 ff "${tone[@]}" "${tags[@]}" -write_id3v2 1 -c:a pcm_s16be tagged.aiff
 ff "${tone[@]}" -c:a pcm_s16le little.aifc
