@@ -57,7 +57,8 @@ def records(frame):
 
 
 def test_scan_gives_the_program_s_rows(client, tree, tmp_path):
-    frame = metainfo.dask.scan(tree, client=client, partition_size=16)
+    # Partitions of a quarter of the tree, however many files the corpus adds.
+    frame = metainfo.dask.scan(tree, client=client, partition_size=max(1, count(tree) // 4))
     assert frame.npartitions > 2
     rows = frame.compute()
     assert list(rows.columns) == metainfo.columns()
@@ -87,6 +88,7 @@ def test_a_worker_dying_mid_scan_loses_no_row(client, tree, tmp_path):
 
 def test_command_writes_every_row(client, tree, tmp_path):
     out = str(tmp_path / "out")
-    metainfo.dask.main([client.scheduler.address, tree, "--out", out, "--partition-size", "20"])
+    size = str(max(1, count(tree) // 3))
+    metainfo.dask.main([client.scheduler.address, tree, "--out", out, "--partition-size", size])
     parts = [pd.read_csv(os.path.join(out, name)) for name in sorted(os.listdir(out))]
     assert len(parts) > 1 and sum(len(p) for p in parts) == count(tree)
