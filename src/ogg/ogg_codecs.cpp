@@ -25,6 +25,7 @@ void IdentifyOpus(const uint8_t* p, OggStream* s) {
     s->facts.codec = "opus";
     s->facts.channels = p[9];
     s->preSkip = ReadLE16(p + 10);
+    s->outputGain = static_cast<int16_t>(ReadLE16(p + 16));
     // Opus always decodes at 48 kHz; the input rate is only a hint.
     s->facts.sampleRate = 48000;
     s->granuleRate = 48000;

@@ -18,6 +18,7 @@ struct OggStream {
     StreamFacts facts;
     uint32_t granuleRate = 0;  // granule positions per second (audio)
     uint64_t preSkip = 0;  // granules before the first audible sample
+    int16_t outputGain = 0;  // Opus: dB in Q7.8 the decoder applies
     uint32_t granuleShift = 0;  // Theora: low granule bits count frames since the keyframe
     bool granuleFromZero = false;  // Theora before 3.2.1: a granule numbers its frame from 0
     uint32_t packets = 0;  // complete packets seen

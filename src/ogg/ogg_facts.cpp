@@ -1,6 +1,7 @@
 #include "ogg/ogg_facts.h"
 
 #include <algorithm>
+#include <cstdio>
 #include <new>
 #include <utility>
 #include <vector>
@@ -123,6 +124,14 @@ void FillFacts(int h, uint64_t fileSize, Walk* w, MediaFacts* facts) {
     }
     facts->tags = w->tags;
     facts->pictures = w->pictures.list;
+    for (const OggStream& s : w->streams) {
+        // A gain the decoder applies changes what is heard: worth telling beside the tags.
+        if (s.codec == OggStream::kOpus && s.outputGain != 0) {
+            char gain[32];
+            std::snprintf(gain, sizeof gain, "%.2f dB", s.outputGain / 256.0);
+            facts->tags.extra.emplace_back("output_gain", gain);
+        }
+    }
     if (longest >= 0) {
         facts->durationUs = longest;
         facts->durationExact = true;

@@ -75,9 +75,9 @@ Bytes VorbisIdPacket(uint32_t channels, uint32_t rate, uint32_t nominalBitRate) 
     return b;
 }
 
-Bytes OpusHeadPacket(uint32_t channels, uint32_t preSkip, uint32_t inputRate) {
+Bytes OpusHeadPacket(uint32_t channels, uint32_t preSkip, uint32_t inputRate, int16_t gain) {
     Bytes b;
-    b.str("OpusHead").u8(1).u8(channels).le16(preSkip).le32(inputRate).le16(0).u8(0);
+    b.str("OpusHead").u8(1).u8(channels).le16(preSkip).le32(inputRate).le16(static_cast<uint16_t>(gain)).u8(0);
     return b;
 }
 

@@ -18,7 +18,8 @@ namespace testing_support {
 Bytes OggStreamPages(uint32_t serial, const std::vector<Bytes>& packets, size_t segmentsPerPage, uint64_t lastGranule);
 
 Bytes VorbisIdPacket(uint32_t channels, uint32_t rate, uint32_t nominalBitRate);
-Bytes OpusHeadPacket(uint32_t channels, uint32_t preSkip, uint32_t inputRate);
+// gain: the output gain in dB, Q7.8.
+Bytes OpusHeadPacket(uint32_t channels, uint32_t preSkip, uint32_t inputRate, int16_t gain = 0);
 // The mapping header with STREAMINFO (not the last metadata block).
 Bytes FlacMappingPacket(uint32_t rate, uint32_t channels, uint32_t bitsPerSample);
 
