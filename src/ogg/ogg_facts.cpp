@@ -128,8 +128,8 @@ void FillFacts(int h, uint64_t fileSize, Walk* w, MediaFacts* facts) {
         // A gain the decoder applies changes what is heard: worth telling beside the tags.
         if (s.codec == OggStream::kOpus && s.outputGain != 0) {
             char gain[32];
-            std::snprintf(gain, sizeof gain, "%.2f dB", s.outputGain / 256.0);
-            facts->tags.extra.emplace_back("output_gain", gain);
+            if (std::snprintf(gain, sizeof gain, "%.2f dB", s.outputGain / 256.0) > 0)
+                facts->tags.extra.emplace_back("output_gain", gain);
         }
     }
     if (longest >= 0) {
