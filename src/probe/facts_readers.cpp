@@ -112,7 +112,7 @@ size_t ReadHead(const char* path, uint8_t* head) {
 // tests judge by the head alone.
 int AccurateTypeOf(const char* path, const uint8_t* head, size_t n) {
     for (const AccurateFormat& f : kAccurateFormats) {
-        if (f.looksLike != nullptr && f.reader != nullptr && f.looksLike(path, head, n)) return f.type;
+        if (f.looksLike(path, head, n)) return f.type;
     }
     return MEDIA_TYPE_UNKNOWN;
 }
@@ -137,7 +137,7 @@ int AccurateMediaType(const char* path) {
 
 int32_t ReadFacts(const char* path, int type, MediaFacts* facts) {
     for (const AccurateFormat& f : kAccurateFormats) {
-        if (f.type == type && f.reader != nullptr) return f.reader(path, type, facts);
+        if (f.type == type) return f.reader(path, type, facts);
     }
     if (type <= 0 || type >= MM_MEDIA_SLOTS) return MM_E_UNSUPPORTED;
     const FactsReader reader = kFactsReaders[type];
