@@ -8,6 +8,7 @@
 #include "asf/asf_guids.h"
 #include "core/byte_reader.h"
 #include "core/file_access.h"
+#include "core/read_ahead.h"
 #include "metainfo/records.h"
 #include "mp3/mp3_frame.h"
 
@@ -132,6 +133,7 @@ int32_t DetectMediaType(const char* path, int* type) {
     if (result != MM_OK) return result;
     FileCloser closer(h);
     *type = DetectContent(h, probe.bytes);
+    ReadAheadForType(h, *type, probe.bytes, sizeof probe.bytes);
     return MM_OK;
 }
 

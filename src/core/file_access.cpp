@@ -408,6 +408,16 @@ bool ReadExactAt(int h, uint64_t pos, size_t n, std::vector<uint8_t>* out) {
     return n == 0 ? SeekToOffset(h, pos) : ReadSomeAt(h, pos, out->data(), n) == n;
 }
 
+bool CanReadAhead(int h) {
+    const MexHandle* handle = Lookup(h);
+    return handle != nullptr && handle->positional && handle->fd >= 0;
+}
+
+void ReadAhead(int h, uint64_t pos, size_t n) {
+    const MexHandle* handle = Lookup(h);
+    if (handle != nullptr && handle->positional && handle->fd >= 0) CacheAhead(handle->fd, handle->id, pos, n);
+}
+
 bool MEx_fsize(const char* path, uint64_t* size) {
     struct stat st;
     if (MEx_stat(path, &st) != 0 || st.st_size < 0) return false;

@@ -49,6 +49,13 @@ size_t ReadSomeAt(int h, uint64_t pos, uint8_t* out, size_t n);
 // when fewer are there.
 bool ReadExactAt(int h, uint64_t pos, size_t n, std::vector<uint8_t>* out);
 
+// Brings [pos, pos + n) of the file into this thread's cache while the handle
+// has it open, so that later handles of the same file read it without opening
+// the file again. Does nothing for other handles.
+void ReadAhead(int h, uint64_t pos, size_t n);
+// True for a handle ReadAhead works on: a plain regular file it has open.
+bool CanReadAhead(int h);
+
 // Size in bytes of the file at path, as MEx_stat reports it; false when the
 // path cannot be looked at.
 bool MEx_fsize(const char* path, uint64_t* size);

@@ -8,6 +8,7 @@
 #include <iterator>
 #include <map>
 #include <string>
+#include <utility>
 #include <vector>
 
 namespace metainfo {
@@ -29,11 +30,33 @@ constexpr int kFiles = 2;
 // identity behind: its bytes serve only the handle that read them.
 constexpr int64_t kSettledNs = 2000000000;
 
+// Bytes read from a file are written by the read itself: growing an extent
+// leaves the new bytes uninitialised instead of zeroing them first.
+template <typename T>
+struct ReadTarget : std::allocator<T> {
+    template <typename U>
+    struct rebind {
+        using other = ReadTarget<U>;
+    };
+    ReadTarget() = default;
+    template <typename U>
+    explicit ReadTarget(const ReadTarget<U>& /*other*/) {}
+    template <typename U>
+    void construct(U* p) noexcept {
+        ::new (static_cast<void*>(p)) U;
+    }
+    template <typename U, typename... Args>
+    void construct(U* p, Args&&... args) {
+        ::new (static_cast<void*>(p)) U(std::forward<Args>(args)...);
+    }
+};
+using Bytes = std::vector<uint8_t, ReadTarget<uint8_t>>;
+
 struct CachedFile {
     FileIdentity id;
     bool used = false;
     uint64_t lastUse = 0;
-    std::map<uint64_t, std::vector<uint8_t>> extents;  // start -> bytes, never overlapping
+    std::map<uint64_t, Bytes> extents;  // start -> bytes, never overlapping
     size_t bytes = 0;
     uint64_t missEnd = UINT64_MAX;
     size_t chunk = kMinChunk;
@@ -44,7 +67,7 @@ struct CachedFile {
     // The extent the last read was served from, tried before the map: most
     // reads of a walk fall in the bytes the previous one came from.
     uint64_t hotStart = 0;
-    const std::vector<uint8_t>* hot = nullptr;
+    const Bytes* hot = nullptr;
 
     void Clear() {
         hot = nullptr;
@@ -106,22 +129,35 @@ size_t ReadAt(int fd, uint8_t* dst, size_t n, uint64_t pos, uint64_t size) {
 
 uint64_t SizeOf(const CachedFile& f) { return f.id.size > 0 ? static_cast<uint64_t>(f.id.size) : 0; }
 
-// Adds bytes read at pos, joining the extents they touch.
-void Insert(CachedFile& f, uint64_t pos, std::vector<uint8_t> data) {
+// Reads up to n bytes at pos straight into the extent that ends at pos (or a
+// new one), then joins it to the extent that follows; how many it read.
+size_t ReadInto(CachedFile& f, int fd, uint64_t pos, size_t n) {
     f.hot = nullptr;
-    f.bytes += data.size();
     auto next = f.extents.upper_bound(pos);
     auto at = next;
     if (next != f.extents.begin() && std::prev(next)->first + std::prev(next)->second.size() == pos) {
         at = std::prev(next);
-        at->second.insert(at->second.end(), data.begin(), data.end());
     } else {
-        at = f.extents.emplace_hint(next, pos, std::move(data));
+        at = f.extents.emplace_hint(next, pos, Bytes());
     }
-    if (next != f.extents.end() && at->first + at->second.size() == next->first) {
-        at->second.insert(at->second.end(), next->second.begin(), next->second.end());
+    Bytes& bytes = at->second;
+    const size_t base = bytes.size();
+    // Room for the extent this read will meet, so that joining it moves no bytes twice.
+    const bool meets = next != f.extents.end() && next->first - pos == n;
+    bytes.reserve(base + n + (meets ? next->second.size() : 0));
+    bytes.resize(base + n);
+    const size_t got = ReadAt(fd, bytes.data() + base, n, pos, SizeOf(f));
+    bytes.resize(base + got);
+    f.bytes += got;
+    if (bytes.empty()) {
+        f.extents.erase(at);
+        return 0;
+    }
+    if (next != f.extents.end() && at->first + bytes.size() == next->first) {
+        bytes.insert(bytes.end(), next->second.begin(), next->second.end());
         f.extents.erase(next);
     }
+    return got;
 }
 
 // Reads the gap at pos (up to gapEnd) into the cache; false at the end.
@@ -134,13 +170,10 @@ bool Fill(CachedFile& f, int fd, uint64_t pos, size_t missing, uint64_t gapEnd) 
     const uint64_t size = SizeOf(f);
     if (want > missing && pos + want > size) want = pos + missing >= size ? missing : static_cast<size_t>(size - pos);
     if (f.bytes + want > kCapacity) f.Clear();
-    std::vector<uint8_t> data(want);
-    const size_t got = ReadAt(fd, data.data(), want, pos, SizeOf(f));
+    const size_t got = ReadInto(f, fd, pos, want);
     if (got < want) f.end = pos + got;
     if (got == 0) return false;
-    data.resize(got);
     f.missEnd = pos + got;
-    Insert(f, pos, std::move(data));
     return true;
 }
 
@@ -158,12 +191,9 @@ void ReadTail(CachedFile& f, int fd) {
     next = f.extents.lower_bound(start);
     const uint64_t end = next != f.extents.end() && next->first < size ? next->first : size;
     if (start >= end || f.end <= start || f.bytes + (end - start) > kCapacity) return;
-    std::vector<uint8_t> data(static_cast<size_t>(end - start));
-    const size_t got = ReadAt(fd, data.data(), data.size(), start, size);
-    if (got < data.size()) f.end = start + got;
-    if (got == 0) return;
-    data.resize(got);
-    Insert(f, start, std::move(data));
+    const auto want = static_cast<size_t>(end - start);
+    const size_t got = ReadInto(f, fd, start, want);
+    if (got < want) f.end = start + got;
 }
 
 }  // namespace
@@ -217,6 +247,9 @@ size_t CachedRead(int fd, const FileIdentity& id, uint64_t pos, void* dst, size_
             }
         }
         if (at >= f.end) break;
+        // Without the file open, its size is the one the stat that confirmed
+        // its identity saw: nothing lies past it, and no open is needed to say so.
+        if (fd < 0 && at >= SizeOf(f)) break;
         if (fd < 0) {
             if (needsFile != nullptr) *needsFile = true;
             break;
@@ -236,6 +269,31 @@ size_t CachedRead(int fd, const FileIdentity& id, uint64_t pos, void* dst, size_
         if (!f.tailRead) ReadTail(f, fd);
     }
     return done;
+}
+
+void CacheAhead(int fd, const FileIdentity& id, uint64_t pos, size_t n) {
+    CachedFile& f = FileFor(id);
+    const uint64_t size = SizeOf(f);
+    const uint64_t end = pos < size && n < size - pos ? pos + n : size;
+    uint64_t at = pos;
+    while (at < end && at < f.end) {
+        const auto next = f.extents.upper_bound(at);
+        if (next != f.extents.begin()) {
+            const auto held = std::prev(next);
+            const uint64_t heldEnd = held->first + held->second.size();
+            if (at < heldEnd) {
+                at = heldEnd;
+                continue;
+            }
+        }
+        const uint64_t gapEnd = next != f.extents.end() && next->first < end ? next->first : end;
+        const auto want = static_cast<size_t>(gapEnd - at);
+        if (f.bytes + want > kCapacity) return;
+        const size_t got = ReadInto(f, fd, at, want);
+        if (got < want) f.end = at + got;
+        if (got == 0) return;
+        at += got;
+    }
 }
 
 void NameCachedFile(const FileIdentity& id, const char* path) {

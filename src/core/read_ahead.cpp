@@ -1,0 +1,77 @@
+#include "core/read_ahead.h"
+
+#include "core/byte_reader.h"
+#include "core/file_access.h"
+#include "metainfo/records.h"
+
+namespace metainfo {
+namespace {
+
+// Past these the later queries read in pieces anyway, and what a file over
+// 1 MiB costs stays within 64 KiB plus its tags.
+constexpr size_t kBoxAhead = size_t{32} * 1024;
+constexpr size_t kTagAhead = size_t{64} * 1024;
+// The frames the clip and codec walks of an AAC or AMR file read from its start.
+constexpr size_t kAacAhead = size_t{16} * 1024;
+constexpr size_t kAmrAhead = size_t{32} * 1024;
+// Top-level boxes or chunks looked at before giving up on finding the index.
+constexpr int kMaxTopLevel = 16;
+
+size_t Capped(uint64_t size, size_t cap) { return size < cap ? static_cast<size_t>(size) : cap; }
+
+// The movie box, wherever it lies: the clip, tag and codec walks all start there.
+void MoovAhead(int h) {
+    uint64_t pos = 0;
+    for (int i = 0; i < kMaxTopLevel; ++i) {
+        uint8_t b[16];
+        if (ReadSomeAt(h, pos, b, sizeof b) < 8) return;
+        uint64_t size = ReadBE32(b);
+        if (size == 1) size = ReadBE64(b + 8);
+        if (size < 8) return;  // to the end of the file, or damaged
+        if (BytesEqual(b + 4, "moov", 4)) {
+            // And the next box's header, which the walks look at too.
+            ReadAhead(h, pos, Capped(size + 16, kBoxAhead));
+            return;
+        }
+        if (size > UINT64_MAX - pos) return;
+        pos += size;
+    }
+}
+
+// The header list in full, and the start of the index after the movie data
+// (reading a chunk's header brings in the bytes after it).
+void AviAhead(int h) {
+    uint64_t pos = 12;
+    for (int i = 0; i < kMaxTopLevel; ++i) {
+        uint8_t b[12];
+        if (ReadSomeAt(h, pos, b, sizeof b) < 8) return;
+        const uint64_t size = ReadLE32(b + 4);
+        if (BytesEqual(b, "LIST", 4) && BytesEqual(b + 8, "hdrl", 4)) ReadAhead(h, pos, Capped(size + 8, kBoxAhead));
+        if (BytesEqual(b, "idx1", 4)) return;
+        pos += 8 + size + (size & 1);
+    }
+}
+
+// An ID3v2 tag at the start, when it is small enough to read whole.
+void Id3Ahead(int h, const uint8_t* head, size_t n) {
+    if (n < 10 || !BytesEqual(head, "ID3", 3)) return;
+    const uint64_t end = uint64_t{10} + ReadSyncsafe32(head + 6) + ((head[5] & 0x10) != 0 ? 10 : 0);
+    if (end <= kTagAhead) ReadAhead(h, 0, static_cast<size_t>(end));
+}
+
+}  // namespace
+
+void ReadAheadForType(int h, int type, const uint8_t* head, size_t n) {
+    if (!CanReadAhead(h)) return;
+    switch (type) {
+        case MEDIA_TYPE_MP4: MoovAhead(h); return;
+        case MEDIA_TYPE_AVI: AviAhead(h); return;
+        case MEDIA_TYPE_MP3: Id3Ahead(h, head, n); return;
+        case MEDIA_TYPE_AAC: ReadAhead(h, 0, kAacAhead); return;
+        case MEDIA_TYPE_AMR_NB:
+        case MEDIA_TYPE_AMR_WB: ReadAhead(h, 0, kAmrAhead); return;
+        default: return;
+    }
+}
+
+}  // namespace metainfo
