@@ -13,6 +13,8 @@ namespace metainfo {
 namespace {
 
 constexpr size_t kAmrProbeBytes = 32768;
+// The longest magic and channel description, and the first frame header.
+constexpr size_t kAmrHeadBytes = 32;
 constexpr size_t kAmrCopyChunk = 32768;
 constexpr int kAmrMaxBlocks = 4096;
 
@@ -133,12 +135,16 @@ int Get_avBlockSize(const uint8_t* data, int kind, size_t length, uint32_t chann
 
 int32_t GetMediaInfo_AMR(const char* path, void* out, int request) {
     if (path == nullptr || out == nullptr) return MM_E_INVALIDARG;
-    std::unique_ptr<uint8_t[]> buffer(new (std::nothrow) uint8_t[kAmrProbeBytes]);
+    // Only the clip's average block needs the frames; the other answers come
+    // from the magic and the first frame header.
+    const bool frames = request == INFO_CLIPINFO || request == INFO_AMR_AUDIO;
+    const size_t want = frames ? kAmrProbeBytes : kAmrHeadBytes;
+    std::unique_ptr<uint8_t[]> buffer(new (std::nothrow) uint8_t[want]);
     if (!buffer) return MM_E_FAIL;
     int h = MEx_fopen(path, "rb");
     if (h == 0) return MM_E_FAIL;
     FileCloser closer(h);
-    int got = MEx_fread(buffer.get(), 1, kAmrProbeBytes, h);
+    int got = MEx_fread(buffer.get(), 1, static_cast<unsigned>(want), h);
     if (got < 16) return MM_E_FAIL;
     _AMR_FrameInfo frame;
     int32_t result = ParseAmrHead(buffer.get(), static_cast<size_t>(got), &frame);
