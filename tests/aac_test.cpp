@@ -294,35 +294,6 @@ TEST(AacClip, ChecksClipAndCodecOfEachFileShape) {
     EXPECT_EQ(type, MEDIA_TYPE_AAC);
 }
 
-// Clip information and codec share one walk of the frames; a file rewritten
-// between the queries is walked anew, whether it had settled before (its times
-// change) or was written moments ago (a rewrite may keep its times).
-TEST(AacClip, AFileRewrittenBetweenQueriesIsWalkedAnew) {
-    const Data lc = Frames(60, 200);
-    const Data sbr = Frames(60, 200, 4, 2, 1, 13);
-    ASSERT_EQ(lc.size(), sbr.size());
-    TempDir dir;
-    dir.Write("settled.aac", lc);
-    // Files this much older than their first read are trusted by their times.
-    std::this_thread::sleep_for(std::chrono::milliseconds(2200));
-    for (const char* name : {"settled.aac", "fresh.aac"}) {
-        const std::string path = dir.PathOf(name);
-        if (std::string(name) == "fresh.aac") dir.Write(name, lc);
-        _MMClipInfo clip{};
-        ASSERT_EQ(AAC_GetClipInfo(path.c_str(), &clip), MM_OK) << name;
-        EXPECT_EQ(clip.nSampleRate, 44100u) << name;
-        dir.Write(name, sbr);
-        _MM_CODECTYPE codec{};
-        ASSERT_EQ(AAC_GetCodecType(path.c_str(), &codec), MM_OK) << name;
-        EXPECT_EQ(codec.nAudioCodec, static_cast<uint32_t>(CODEC_AAC_PLUS_V1_ADTS)) << name;
-        ASSERT_EQ(AAC_GetClipInfo(path.c_str(), &clip), MM_OK) << name;
-        EXPECT_EQ(clip.nSampleRate, 88200u) << name;
-        dir.Write(name, lc);
-        ASSERT_EQ(AAC_GetCodecType(path.c_str(), &codec), MM_OK) << name;
-        EXPECT_EQ(codec.nAudioCodec, static_cast<uint32_t>(CODEC_AAC_ADTS)) << name;
-    }
-}
-
 TEST(AacClip, TruncatedAdifHeadersAnswerWithoutFault) {
     TempDir dir;
     AdifLayout layout;

@@ -5,9 +5,11 @@
 #include <sys/stat.h>
 
 #include <algorithm>
+#include <chrono>
 #include <cstddef>
 #include <cstring>
 #include <string>
+#include <thread>
 #include <vector>
 
 #include "aac/aac_frame.h"
@@ -21,6 +23,7 @@
 #include "support/golden.h"
 #include "support/aac_builder.h"
 #include "support/mp3_builder.h"
+#include "support/mp4_builder.h"
 
 using namespace metainfo;
 using testing_support::Bytes;
@@ -313,4 +316,65 @@ TEST(CheckMediaType, EveryExtensionGroupAcceptsItsContentAndRejectsOther) {
     metainfo::MEx_fclose(h);
     EXPECT_EQ(MM_MediaExtractor_CheckMediaType(mp3.c_str()), expected);
     EXPECT_EQ(Detect(mp3), MEDIA_TYPE_MP3);
+}
+
+// Clip information and codec of raw AAC share one walk of the frames, and an
+// MP4 codec query takes the clip walk's answer: a file rewritten between the
+// queries is walked anew, whether it had settled before (its times change) or
+// was written moments ago (a rewrite may keep its times).
+TEST(SharedWalk, AFileRewrittenBetweenQueriesIsWalkedAnew) {
+    using testing_support::AdtsFrames;
+    using testing_support::AdtsLayout;
+    namespace mp4 = testing_support;
+    auto m4a = [](uint8_t config) {
+        const auto entry = mp4::AudioEntry("mp4a", 2, 16, 44100, mp4::Esds(0x40, 96000, {config, 0x10}));
+        return mp4::Movie(
+            mp4::Join({mp4::Mvhd(0, 1000, 10000),
+                       mp4::Trak("soun", 1000, 10000, mp4::Join({mp4::Stsd({entry}), mp4::Stsz(100, 10)}))}));
+    };
+    const std::vector<size_t> sizes(60, 200);
+    struct Version {
+        std::vector<uint8_t> bytes;
+        uint32_t rate, audioCodec, audioSubType;
+    };
+    const struct {
+        const char* name;
+        int type;
+        Version a, b;
+    } kCases[] = {
+        {"aac",
+         MEDIA_TYPE_AAC,
+         {AdtsFrames(AdtsLayout(4, 2), sizes), 44100, CODEC_AAC_ADTS, PROFILE_AAC_LC},
+         {AdtsFrames(AdtsLayout(4, 2), sizes, 13), 88200, CODEC_AAC_PLUS_V1_ADTS, PROFILE_AAC_LC}},
+        {"m4a",
+         MEDIA_TYPE_MP4,
+         {m4a(0x12), 44100, CODEC_MP4AUDIO_MP4A_AAC, PROFILE_AAC_LC},
+         {m4a(0x0A), 44100, CODEC_MP4AUDIO_MP4A_AAC, PROFILE_AAC_MAIN}},
+    };
+    TempDir dir;
+    for (const auto& c : kCases) {
+        ASSERT_EQ(c.a.bytes.size(), c.b.bytes.size()) << c.name;
+        dir.Write(std::string("settled.") + c.name, c.a.bytes);
+    }
+    // Files this much older than their first read are trusted by their times.
+    std::this_thread::sleep_for(std::chrono::milliseconds(2200));
+    for (const auto& c : kCases) {
+        for (const char* age : {"settled.", "fresh."}) {
+            SCOPED_TRACE(std::string(age) + c.name);
+            const std::string path = dir.PathOf(age + std::string(c.name));
+            if (std::string(age) == "fresh.") dir.Write(age + std::string(c.name), c.a.bytes);
+            // Clip information of one version, then the other written and its codec asked.
+            for (const Version* now : {&c.a, &c.b}) {
+                const Version& next = now == &c.a ? c.b : c.a;
+                _MMClipInfo clip{};
+                ASSERT_EQ(MM_MediaExtractor_GetClipInfo(path.c_str(), c.type, &clip), MM_OK);
+                EXPECT_EQ(clip.nSampleRate, now->rate);
+                dir.Write(age + std::string(c.name), next.bytes);
+                _MM_CODECTYPE codec{};
+                ASSERT_EQ(MM_MediaExtractor_GetCodecType(path.c_str(), c.type, &codec), MM_OK);
+                EXPECT_EQ(codec.nAudioCodec, next.audioCodec);
+                EXPECT_EQ(codec.nAudioSubType, next.audioSubType);
+            }
+        }
+    }
 }

@@ -343,10 +343,15 @@ int32_t MP4_ParseFile(int h, int mode, void* out) {
     return MM_OK;
 }
 
-int32_t MP4_GetMediaInfo(const char* path, int mode, void* out) {
+int32_t MP4_GetMediaInfo(const char* path, int mode, void* out, Mp4WalkKey* key) {
     const int h = MEx_fopen(path, "rb");
     if (h == 0) return kMp4NotOpened;
     FileCloser closer(h);
+    if (key != nullptr) *key = Mp4WalkKeyOf(h);
+    return Mp4WalkOpened(h, path, mode, out);
+}
+
+int32_t Mp4WalkOpened(int h, const char* path, int mode, void* out) {
     uint64_t size = 0;
     if (!OpenedFileSize(h, path, &size)) return MM_E_FAIL;
     return OpenedWalk(h, size, mode, out);
@@ -380,7 +385,9 @@ int32_t MP4_GetClipInfo(const char* path, _MMClipInfo* clip) {
     if (path == nullptr || clip == nullptr) return MM_E_INVALIDARG;
     _ME_ClipInfoEx info;
     std::memset(&info, 0, sizeof info);
-    int32_t result = MP4_GetMediaInfo(path, kModeClip, &info);
+    Mp4WalkKey key;
+    int32_t result = MP4_GetMediaInfo(path, kModeClip, &info, &key);
+    RememberCodecAnswer(key, result, info);
     if (result == MM_OK) {
         RefineClipInfo(&info);
         std::memcpy(clip, &info.clip, sizeof *clip);
@@ -390,53 +397,11 @@ int32_t MP4_GetClipInfo(const char* path, _MMClipInfo* clip) {
     return result;
 }
 
-namespace {
-
-int32_t CodecFromWalk(int32_t walk, _ME_ClipInfoEx* info, _MM_CODECTYPE* codec) {
-    if (walk != MM_OK) {
-        FreeTrackList(info);
-        return MM_E_FAIL;
-    }
-    std::memset(codec, 0, sizeof *codec);
-    if (info->tracks == nullptr) return MM_E_FAIL;
-    ListNode* node = &info->tracks->link;
-    do {
-        const MP4TrackNode* track = reinterpret_cast<const MP4TrackNode*>(node);
-        if (track->kind == 1) {
-            if (codec->nAudioCodec == 0) codec->nAudioCodec = track->codec;
-            if (codec->nAudioSubType == 0) codec->nAudioSubType = track->codecDetail;
-        } else if (track->kind == 16) {
-            if (codec->nVideoCodec == 0) codec->nVideoCodec = track->codec;
-        }
-        node = node->next;
-    } while (node != &info->tracks->link);
-    FreeTrackList(info);
-    return MM_OK;
-}
-
-}  // namespace
-
-int32_t MP4_GetCodecType(const char* path, _MM_CODECTYPE* codec) {
-    if (path == nullptr || codec == nullptr) return MM_E_INVALIDARG;
-    _ME_ClipInfoEx info;
-    std::memset(&info, 0, sizeof info);
-    info.codecOnly = true;
-    return CodecFromWalk(MP4_GetMediaInfo(path, kModeClip, &info), &info, codec);
-}
-
 }  // namespace metainfo
 
 using namespace metainfo;
 
 extern "C" {
-
-int32_t MP4_GetCodecTypeEx(int fd, _MM_CODECTYPE* codec) {
-    if (codec == nullptr) return MM_E_INVALIDARG;
-    _ME_ClipInfoEx info;
-    std::memset(&info, 0, sizeof info);
-    info.codecOnly = true;
-    return CodecFromWalk(MP4_GetMediaInfoFd(fd, kModeClip, &info), &info, codec);
-}
 
 int32_t MP4_GetMakerInfo(const char* path, _MAKERINFO* maker) {
     if (path == nullptr || maker == nullptr) return MM_E_INVALIDARG;

@@ -1,0 +1,108 @@
+// The codec query: the audio and video codecs of the first tracks of each
+// kind, from the same walk as the clip information.
+#include <cstring>
+
+#include "core/file_access.h"
+#include "core/read_cache.h"
+#include "metainfo/mp4.h"
+#include "mp4/mp4_file.h"
+#include "mp4/mp4_internal.h"
+
+namespace metainfo {
+namespace {
+
+// What a codec query answers after a walk: whether the record was written,
+// and the result.
+struct CodecAnswer {
+    bool written = false;
+    int32_t result = MM_E_FAIL;
+    _MM_CODECTYPE codec{};
+};
+
+CodecAnswer AnswerOf(int32_t walk, const _ME_ClipInfoEx& info) {
+    CodecAnswer a;
+    if (walk != MM_OK) return a;
+    a.written = true;
+    if (info.tracks == nullptr) return a;
+    const ListNode* node = &info.tracks->link;
+    do {
+        const auto* track = reinterpret_cast<const MP4TrackNode*>(node);
+        if (track->kind == 1) {
+            if (a.codec.nAudioCodec == 0) a.codec.nAudioCodec = track->codec;
+            if (a.codec.nAudioSubType == 0) a.codec.nAudioSubType = track->codecDetail;
+        } else if (track->kind == 16) {
+            if (a.codec.nVideoCodec == 0) a.codec.nVideoCodec = track->codec;
+        }
+        node = node->next;
+    } while (node != &info.tracks->link);
+    a.result = MM_OK;
+    return a;
+}
+
+int32_t Give(const CodecAnswer& a, _MM_CODECTYPE* codec) {
+    if (a.written) *codec = a.codec;
+    return a.result;
+}
+
+// The answer of this thread's last clip walk of a file by path.
+struct CodecMemo {
+    Mp4WalkKey key;
+    CodecAnswer answer;
+};
+
+thread_local CodecMemo t_lastCodec;
+
+bool Recall(const Mp4WalkKey& key, CodecAnswer* answer) {
+    const Mp4WalkKey& last = t_lastCodec.key;
+    if (!key.valid || !last.valid || !(last.id == key.id) || !LearntAfterSettling(last.id, last.readNs)) return false;
+    *answer = t_lastCodec.answer;
+    return true;
+}
+
+int32_t WalkForCodec(int h, const char* path, _MM_CODECTYPE* codec) {
+    _ME_ClipInfoEx info;
+    std::memset(&info, 0, sizeof info);
+    info.codecOnly = true;
+    const CodecAnswer a = AnswerOf(h != 0 ? Mp4WalkOpened(h, path, kModeClip, &info) : MM_E_FAIL, info);
+    FreeTrackList(&info);
+    return Give(a, codec);
+}
+
+}  // namespace
+
+Mp4WalkKey Mp4WalkKeyOf(int h) {
+    Mp4WalkKey key;
+    key.valid = HandleIdentity(h, &key.id) && MEx_ftell(h) == 0;
+    key.readNs = NowNs();
+    return key;
+}
+
+void RememberCodecAnswer(const Mp4WalkKey& key, int32_t walk, const _ME_ClipInfoEx& info) {
+    if (!key.valid) return;
+    t_lastCodec.key = key;
+    t_lastCodec.answer = AnswerOf(walk, info);
+}
+
+int32_t MP4_GetCodecType(const char* path, _MM_CODECTYPE* codec) {
+    if (path == nullptr || codec == nullptr) return MM_E_INVALIDARG;
+    const int h = MEx_fopen(path, "rb");
+    if (h == 0) return MM_E_FAIL;
+    FileCloser closer(h);
+    CodecAnswer recalled;
+    if (Recall(Mp4WalkKeyOf(h), &recalled)) return Give(recalled, codec);
+    return WalkForCodec(h, path, codec);
+}
+
+}  // namespace metainfo
+
+using namespace metainfo;
+
+extern "C" int32_t MP4_GetCodecTypeEx(int fd, _MM_CODECTYPE* codec) {
+    if (codec == nullptr) return MM_E_INVALIDARG;
+    _ME_ClipInfoEx info;
+    std::memset(&info, 0, sizeof info);
+    info.codecOnly = true;
+    const CodecAnswer a = AnswerOf(MP4_GetMediaInfoFd(fd, kModeClip, &info), info);
+    FreeTrackList(&info);
+    return Give(a, codec);
+}
