@@ -413,9 +413,9 @@ bool CanReadAhead(int h) {
     return handle != nullptr && handle->positional && handle->fd >= 0;
 }
 
-void ReadAhead(int h, uint64_t pos, size_t n) {
+void ReadAhead(int h, uint64_t pos, size_t n, size_t atLeast) {
     const MexHandle* handle = Lookup(h);
-    if (handle != nullptr && handle->positional && handle->fd >= 0) CacheAhead(handle->fd, handle->id, pos, n);
+    if (handle != nullptr && handle->positional && handle->fd >= 0) CacheAhead(handle->fd, handle->id, pos, n, atLeast);
 }
 
 bool MEx_fsize(const char* path, uint64_t* size) {

@@ -51,8 +51,9 @@ bool ReadExactAt(int h, uint64_t pos, size_t n, std::vector<uint8_t>* out);
 
 // Brings [pos, pos + n) of the file into this thread's cache while the handle
 // has it open, so that later handles of the same file read it without opening
-// the file again. Does nothing for other handles.
-void ReadAhead(int h, uint64_t pos, size_t n);
+// the file again; a gap not held is read to at least atLeast bytes. Does
+// nothing for other handles.
+void ReadAhead(int h, uint64_t pos, size_t n, size_t atLeast = 0);
 // True for a handle ReadAhead works on: a plain regular file it has open.
 bool CanReadAhead(int h);
 

@@ -16,10 +16,51 @@ constexpr size_t kAacAhead = size_t{16} * 1024;
 constexpr size_t kAmrAhead = size_t{32} * 1024;
 // Top-level boxes or chunks looked at before giving up on finding the index.
 constexpr int kMaxTopLevel = 16;
+// Box headers looked at inside a large movie box, and how deep.
+constexpr int kMaxBoxHeaders = 64;
+constexpr int kMaxBoxDepth = 6;
+// A box the walks read whole, or the part of a larger one they read first.
+constexpr size_t kSmallBox = 4096;
 
 size_t Capped(uint64_t size, size_t cap) { return size < cap ? static_cast<size_t>(size) : cap; }
 
-// The movie box, wherever it lies: the clip, tag and codec walks all start there.
+// Boxes the walks descend into; a "meta" box has a version and flags first.
+bool IsContainer(const uint8_t* type) {
+    static const char* const kContainers[] = {"trak", "mdia", "minf", "stbl", "edts", "udta", "meta", "dinf"};
+    for (const char* c : kContainers) {
+        if (BytesEqual(type, c, 4)) return true;
+    }
+    return false;
+}
+
+// The boxes in [pos, end), and their children, as the walks visit them: each
+// header (reading one brings in the bytes after it) and the whole of each
+// small box, which the walks read whole. At most *budget boxes.
+void WalkBoxesAhead(int h, uint64_t pos, uint64_t end, int depth, int* budget) {
+    while (end - pos >= 8 && *budget > 0) {
+        --*budget;
+        uint8_t b[16];
+        if (ReadSomeAt(h, pos, b, sizeof b) < 8) return;
+        uint64_t size = ReadBE32(b);
+        uint64_t header = 8;
+        if (size == 1) {
+            size = ReadBE64(b + 8);
+            header = 16;
+        }
+        if (size < header || size > end - pos) return;
+        if (!IsContainer(b + 4)) {
+            ReadAhead(h, pos, Capped(size, kSmallBox), kSmallBox);
+        } else if (depth < kMaxBoxDepth) {
+            const uint64_t first = pos + header + (BytesEqual(b + 4, "meta", 4) ? 4 : 0);
+            if (first <= pos + size) WalkBoxesAhead(h, first, pos + size, depth + 1, budget);
+        }
+        pos += size;
+    }
+}
+
+// The movie box, wherever it lies: the clip, tag and codec walks all start
+// there. A small one is read whole with the next box's header, which the walks
+// look at too; a large one (long sample tables) box by box.
 void MoovAhead(int h) {
     uint64_t pos = 0;
     for (int i = 0; i < kMaxTopLevel; ++i) {
@@ -28,12 +69,17 @@ void MoovAhead(int h) {
         uint64_t size = ReadBE32(b);
         if (size == 1) size = ReadBE64(b + 8);
         if (size < 8) return;  // to the end of the file, or damaged
+        if (size > UINT64_MAX - pos - 16) return;
         if (BytesEqual(b + 4, "moov", 4)) {
-            // And the next box's header, which the walks look at too.
-            ReadAhead(h, pos, Capped(size + 16, kBoxAhead));
+            if (size + 16 <= kBoxAhead) {
+                ReadAhead(h, pos, static_cast<size_t>(size + 16));
+            } else {
+                int budget = kMaxBoxHeaders;
+                WalkBoxesAhead(h, pos + 8, pos + size, 0, &budget);
+                ReadAhead(h, pos + size, 16);
+            }
             return;
         }
-        if (size > UINT64_MAX - pos) return;
         pos += size;
     }
 }

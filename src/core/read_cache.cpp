@@ -271,7 +271,7 @@ size_t CachedRead(int fd, const FileIdentity& id, uint64_t pos, void* dst, size_
     return done;
 }
 
-void CacheAhead(int fd, const FileIdentity& id, uint64_t pos, size_t n) {
+void CacheAhead(int fd, const FileIdentity& id, uint64_t pos, size_t n, size_t atLeast) {
     CachedFile& f = FileFor(id);
     const uint64_t size = SizeOf(f);
     const uint64_t end = pos < size && n < size - pos ? pos + n : size;
@@ -286,8 +286,11 @@ void CacheAhead(int fd, const FileIdentity& id, uint64_t pos, size_t n) {
                 continue;
             }
         }
-        const uint64_t gapEnd = next != f.extents.end() && next->first < end ? next->first : end;
-        const auto want = static_cast<size_t>(gapEnd - at);
+        // A gap is read to at least atLeast bytes, up to what is held next or the file's end.
+        const uint64_t limit = next != f.extents.end() && next->first < size ? next->first : size;
+        const uint64_t gapEnd = limit < end ? limit : end;
+        auto want = static_cast<size_t>(gapEnd - at);
+        if (want < atLeast) want = static_cast<size_t>(limit - at < atLeast ? limit - at : atLeast);
         if (f.bytes + want > kCapacity) return;
         const size_t got = ReadInto(f, fd, at, want);
         if (got < want) f.end = at + got;

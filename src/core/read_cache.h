@@ -58,9 +58,10 @@ bool HoldsSettled(const char* path, const FileIdentity& id);
 size_t CachedRead(int fd, const FileIdentity& id, uint64_t pos, void* dst, size_t n, bool* needsFile = nullptr);
 
 // Reads what this thread does not hold of [pos, pos + n) of the open file fd
-// (known as id), one read per gap, so that the later queries of a probe find
+// (known as id), one read per gap of at least atLeast bytes (where the file and
+// what is held after the gap allow), so that the later queries of a probe find
 // those bytes held. Bounded by the file's size and what one file may hold.
-void CacheAhead(int fd, const FileIdentity& id, uint64_t pos, size_t n);
+void CacheAhead(int fd, const FileIdentity& id, uint64_t pos, size_t n, size_t atLeast = 0);
 
 // Drops what this thread holds of a file that is about to be written.
 void ForgetCachedFile(uint64_t device, uint64_t inode);
