@@ -19,6 +19,7 @@ std::vector<std::unique_ptr<Peer>> MakePeers(const std::vector<std::string>& wan
     std::vector<std::unique_ptr<Peer>> all;
     all.push_back(bench::MakeMetainfoPeer());
     all.push_back(bench::MakeAccuratePeer());
+    all.push_back(bench::MakeFloorPeer());
     all.push_back(bench::MakeTaglibPeer(false));
     all.push_back(bench::MakeTaglibPeer(true));
     all.push_back(bench::MakeAvformatPeer(false));

@@ -32,6 +32,8 @@ int64_t ReadCharCount();
 
 std::unique_ptr<Peer> MakeMetainfoPeer();
 std::unique_ptr<Peer> MakeAccuratePeer();
+// The system calls of a four-query job alone, nothing parsed.
+std::unique_ptr<Peer> MakeFloorPeer();
 std::unique_ptr<Peer> MakeTaglibPeer(bool fast);
 std::unique_ptr<Peer> MakeAvformatPeer(bool streamInfo);
 std::unique_ptr<Peer> MakeMediainfoPeer();  // null when built without it
