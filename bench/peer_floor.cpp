@@ -18,8 +18,11 @@ bool FloorJob(const char* path) {
     if (fd < 0) return false;
     struct stat st {};
     bool ok = ::fstat(fd, &st) == 0 && ::pread(fd, bytes, sizeof bytes, 0) > 0;
-    if (ok && st.st_size > static_cast<off_t>(sizeof bytes)) {
-        ok = ::pread(fd, bytes, sizeof bytes, st.st_size - static_cast<off_t>(sizeof bytes)) > 0;
+    // The last 4 KiB, or what of the file lies past the first.
+    const auto head = static_cast<off_t>(sizeof bytes);
+    if (ok && st.st_size > head) {
+        const off_t tail = st.st_size - head > head ? st.st_size - head : head;
+        ok = ::pread(fd, bytes, static_cast<size_t>(st.st_size - tail), tail) > 0;
     }
     ::close(fd);
     for (int query = 0; query < 3; ++query) ok = ::stat(path, &st) == 0 && ok;
