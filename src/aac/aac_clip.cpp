@@ -10,7 +10,7 @@
 #include "aac/aac_walker.h"
 #include "core/byte_reader.h"
 #include "core/file_access.h"
-#include "core/read_cache.h"
+#include "core/file_memo.h"
 
 namespace metainfo {
 
@@ -102,51 +102,9 @@ int32_t OpenPastTags(const char* path, _MMClipInfo* clip, int* handle, uint32_t*
     return MM_OK;
 }
 
-// Where a walk's bytes came from: the file, where its data starts, and when
-// they were read. A handle with no identity (protected, not a regular file)
-// has no key and its walks are not kept.
-struct WalkKey {
-    bool valid = false;
-    FileIdentity id;
-    int64_t start = 0;
-    int64_t readNs = 0;
-};
-
-WalkKey KeyOf(int h) {
-    WalkKey key;
-    key.valid = HandleIdentity(h, &key.id);
-    key.start = MEx_ftell(h);
-    key.readNs = NowNs();
-    return key;
-}
-
 // The walk of the file this thread asked about last: clip information and
 // codec both need it, and the second query takes it from here.
-struct WalkMemo {
-    WalkKey key;
-    AacWalk walk;
-};
-
-thread_local WalkMemo t_lastWalk;
-
-// True (and *walk filled) when this thread walked the same bytes of a file
-// that had settled before they were read.
-bool RecallWalk(const WalkKey& key, AacWalk* walk) {
-    const WalkKey& last = t_lastWalk.key;
-    if (!key.valid || !last.valid || !(last.id == key.id) || last.start != key.start ||
-        !LearntAfterSettling(last.id, last.readNs)) {
-        return false;
-    }
-    *walk = t_lastWalk.walk;
-    walk->walk = false;
-    return true;
-}
-
-void RememberWalk(const WalkKey& key, const AacWalk& walk) {
-    if (!key.valid) return;
-    t_lastWalk.key = key;
-    t_lastWalk.walk = walk;
-}
+thread_local FileMemo<AacWalk> t_lastWalk;
 
 }  // namespace
 
@@ -273,7 +231,7 @@ int32_t ParseClipInfo(int h, _MMClipInfo* clip, uint32_t skippedTagBytes, uint32
     // Zeroed, so no byte of the buffer is ever undefined.
     uint8_t* buf = new (std::nothrow) uint8_t[kReadSize + 1]();
     if (buf == nullptr) return MM_E_FAIL;
-    const WalkKey key = KeyOf(h);
+    const FileMemoKey key = FileMemoKey::Of(h);
     const int bytesRead = MEx_fread(buf, 1, kReadSize, h);
     int32_t result = MM_E_UNSUPPORTED;
     if (bytesRead < 4) {
@@ -299,13 +257,14 @@ int32_t ParseClipInfo(int h, _MMClipInfo* clip, uint32_t skippedTagBytes, uint32
             AacWalk walk;
             walk.state = *codec;
             walk.profile = *profile;
-            const bool recalled = RecallWalk(key, &walk);
+            const bool recalled = t_lastWalk.Recall(key, &walk);
+            if (recalled) walk.walk = false;
             if (adts) {
                 result = UnpackADTSHeader(buf, bytesRead, start, clip, skippedTagBytes, &walk);
             } else {
                 result = UnpackADIFHeader(buf, bytesRead, start, clip, skippedTagBytes, &walk);
             }
-            if (!recalled) RememberWalk(key, walk);
+            if (!recalled) t_lastWalk.Remember(key, walk);
             *profile = walk.profile;
             *codec = adts ? AdtsCode(walk.state) : AdifCode(walk.state);
         }

@@ -3,7 +3,7 @@
 #include <cstring>
 
 #include "core/file_access.h"
-#include "core/read_cache.h"
+#include "core/file_memo.h"
 #include "metainfo/mp4.h"
 #include "mp4/mp4_file.h"
 #include "mp4/mp4_internal.h"
@@ -45,19 +45,7 @@ int32_t Give(const CodecAnswer& a, _MM_CODECTYPE* codec) {
 }
 
 // The answer of this thread's last clip walk of a file by path.
-struct CodecMemo {
-    Mp4WalkKey key;
-    CodecAnswer answer;
-};
-
-thread_local CodecMemo t_lastCodec;
-
-bool Recall(const Mp4WalkKey& key, CodecAnswer* answer) {
-    const Mp4WalkKey& last = t_lastCodec.key;
-    if (!key.valid || !last.valid || !(last.id == key.id) || !LearntAfterSettling(last.id, last.readNs)) return false;
-    *answer = t_lastCodec.answer;
-    return true;
-}
+thread_local FileMemo<CodecAnswer> t_lastCodec;
 
 int32_t WalkForCodec(int h, const char* path, _MM_CODECTYPE* codec) {
     _ME_ClipInfoEx info;
@@ -70,17 +58,8 @@ int32_t WalkForCodec(int h, const char* path, _MM_CODECTYPE* codec) {
 
 }  // namespace
 
-Mp4WalkKey Mp4WalkKeyOf(int h) {
-    Mp4WalkKey key;
-    key.valid = HandleIdentity(h, &key.id) && MEx_ftell(h) == 0;
-    key.readNs = NowNs();
-    return key;
-}
-
-void RememberCodecAnswer(const Mp4WalkKey& key, int32_t walk, const _ME_ClipInfoEx& info) {
-    if (!key.valid) return;
-    t_lastCodec.key = key;
-    t_lastCodec.answer = AnswerOf(walk, info);
+void RememberCodecAnswer(const FileMemoKey& key, int32_t walk, const _ME_ClipInfoEx& info) {
+    t_lastCodec.Remember(key, AnswerOf(walk, info));
 }
 
 int32_t MP4_GetCodecType(const char* path, _MM_CODECTYPE* codec) {
@@ -89,7 +68,7 @@ int32_t MP4_GetCodecType(const char* path, _MM_CODECTYPE* codec) {
     if (h == 0) return MM_E_FAIL;
     FileCloser closer(h);
     CodecAnswer recalled;
-    if (Recall(Mp4WalkKeyOf(h), &recalled)) return Give(recalled, codec);
+    if (t_lastCodec.Recall(FileMemoKey::Of(h), &recalled)) return Give(recalled, codec);
     return WalkForCodec(h, path, codec);
 }
 

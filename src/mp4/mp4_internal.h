@@ -7,7 +7,7 @@
 
 #include "core/list_node.h"
 #include "core/quirks.h"
-#include "core/read_cache.h"
+#include "core/file_memo.h"
 #include "metainfo/records.h"
 
 namespace metainfo {
@@ -144,18 +144,10 @@ int32_t WalkChildren(int h, int64_t end, Visit&& visit) {
     return MM_OK;
 }
 
-// Which bytes a walk of a file by path read: the file's identity (none for a
-// protected or irregular file) and when they were read.
-struct Mp4WalkKey {
-    bool valid = false;
-    FileIdentity id;
-    int64_t readNs = 0;
-};
-
 // The walk (mp4_walk.cpp).
 int32_t MP4_ParseFile(int h, int mode, void* out);
 // Opens path and walks it; *key (when given) tells what was walked.
-int32_t MP4_GetMediaInfo(const char* path, int mode, void* out, Mp4WalkKey* key = nullptr);
+int32_t MP4_GetMediaInfo(const char* path, int mode, void* out, FileMemoKey* key = nullptr);
 // Walks the file open as h from the start.
 int32_t Mp4WalkOpened(int h, const char* path, int mode, void* out);
 int32_t MP4_GetMediaInfoFd(int fd, int mode, void* out);
@@ -165,10 +157,9 @@ int32_t AnaTkhd(int h, _ME_ClipInfoEx* info);
 int32_t AnaHdlr(int h, uint32_t* handlerType);
 
 // The codec query (mp4_codec.cpp).
-Mp4WalkKey Mp4WalkKeyOf(int h);
 // Keeps the codec answer the clip walk of key's file gave: the codec query of
 // the same settled file, which walks the same boxes, then takes it.
-void RememberCodecAnswer(const Mp4WalkKey& key, int32_t walk, const _ME_ClipInfoEx& info);
+void RememberCodecAnswer(const FileMemoKey& key, int32_t walk, const _ME_ClipInfoEx& info);
 
 // Sample descriptions (mp4_sample.cpp).
 int32_t AnaStsd(int h, uint32_t handlerType, _ME_ClipInfoEx* info);

@@ -343,11 +343,11 @@ int32_t MP4_ParseFile(int h, int mode, void* out) {
     return MM_OK;
 }
 
-int32_t MP4_GetMediaInfo(const char* path, int mode, void* out, Mp4WalkKey* key) {
+int32_t MP4_GetMediaInfo(const char* path, int mode, void* out, FileMemoKey* key) {
     const int h = MEx_fopen(path, "rb");
     if (h == 0) return kMp4NotOpened;
     FileCloser closer(h);
-    if (key != nullptr) *key = Mp4WalkKeyOf(h);
+    if (key != nullptr) *key = FileMemoKey::Of(h);
     return Mp4WalkOpened(h, path, mode, out);
 }
 
@@ -385,7 +385,7 @@ int32_t MP4_GetClipInfo(const char* path, _MMClipInfo* clip) {
     if (path == nullptr || clip == nullptr) return MM_E_INVALIDARG;
     _ME_ClipInfoEx info;
     std::memset(&info, 0, sizeof info);
-    Mp4WalkKey key;
+    FileMemoKey key;
     int32_t result = MP4_GetMediaInfo(path, kModeClip, &info, &key);
     RememberCodecAnswer(key, result, info);
     if (result == MM_OK) {
