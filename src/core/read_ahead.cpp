@@ -1,5 +1,7 @@
 #include "core/read_ahead.h"
 
+#include <cstring>
+
 #include "core/byte_reader.h"
 #include "core/file_access.h"
 #include "metainfo/records.h"
@@ -33,28 +35,42 @@ bool IsContainer(const uint8_t* type) {
     return false;
 }
 
+struct BoxHead {
+    uint64_t size = 0;
+    uint64_t header = 8;
+    uint8_t type[4] = {};
+};
+
+// The header of the box at pos; false when it cannot be read or the box
+// declares less than its header.
+bool ReadBoxHead(int h, uint64_t pos, BoxHead* box) {
+    uint8_t b[16] = {};
+    if (ReadSomeAt(h, pos, b, sizeof b) < 8) return false;
+    box->size = ReadBE32(b);
+    box->header = 8;
+    if (box->size == 1) {
+        box->size = ReadBE64(b + 8);
+        box->header = 16;
+    }
+    std::memcpy(box->type, b + 4, sizeof box->type);
+    return box->size >= box->header;
+}
+
 // The boxes in [pos, end), and their children, as the walks visit them: each
 // header (reading one brings in the bytes after it) and the whole of each
 // small box, which the walks read whole. At most *budget boxes.
 void WalkBoxesAhead(int h, uint64_t pos, uint64_t end, int depth, int* budget) {
+    BoxHead box;
     while (end - pos >= 8 && *budget > 0) {
         --*budget;
-        uint8_t b[16];
-        if (ReadSomeAt(h, pos, b, sizeof b) < 8) return;
-        uint64_t size = ReadBE32(b);
-        uint64_t header = 8;
-        if (size == 1) {
-            size = ReadBE64(b + 8);
-            header = 16;
-        }
-        if (size < header || size > end - pos) return;
-        if (!IsContainer(b + 4)) {
-            ReadAhead(h, pos, Capped(size, kSmallBox), kSmallBox);
+        if (!ReadBoxHead(h, pos, &box) || box.size > end - pos) return;
+        if (!IsContainer(box.type)) {
+            ReadAhead(h, pos, Capped(box.size, kSmallBox), kSmallBox);
         } else if (depth < kMaxBoxDepth) {
-            const uint64_t first = pos + header + (BytesEqual(b + 4, "meta", 4) ? 4 : 0);
-            if (first <= pos + size) WalkBoxesAhead(h, first, pos + size, depth + 1, budget);
+            const uint64_t first = pos + box.header + (BytesEqual(box.type, "meta", 4) ? 4 : 0);
+            if (first <= pos + box.size) WalkBoxesAhead(h, first, pos + box.size, depth + 1, budget);
         }
-        pos += size;
+        pos += box.size;
     }
 }
 
@@ -63,24 +79,21 @@ void WalkBoxesAhead(int h, uint64_t pos, uint64_t end, int depth, int* budget) {
 // look at too; a large one (long sample tables) box by box.
 void MoovAhead(int h) {
     uint64_t pos = 0;
+    BoxHead box;
     for (int i = 0; i < kMaxTopLevel; ++i) {
-        uint8_t b[16];
-        if (ReadSomeAt(h, pos, b, sizeof b) < 8) return;
-        uint64_t size = ReadBE32(b);
-        if (size == 1) size = ReadBE64(b + 8);
-        if (size < 8) return;  // to the end of the file, or damaged
-        if (size > UINT64_MAX - pos - 16) return;
-        if (BytesEqual(b + 4, "moov", 4)) {
-            if (size + 16 <= kBoxAhead) {
-                ReadAhead(h, pos, static_cast<size_t>(size + 16));
+        // A size of 0 (to the end of the file) has nothing after it.
+        if (!ReadBoxHead(h, pos, &box) || box.size > UINT64_MAX - pos - 16) return;
+        if (BytesEqual(box.type, "moov", 4)) {
+            if (box.size + 16 <= kBoxAhead) {
+                ReadAhead(h, pos, static_cast<size_t>(box.size + 16));
             } else {
                 int budget = kMaxBoxHeaders;
-                WalkBoxesAhead(h, pos + 8, pos + size, 0, &budget);
-                ReadAhead(h, pos + size, 16);
+                WalkBoxesAhead(h, pos + box.header, pos + box.size, 0, &budget);
+                ReadAhead(h, pos + box.size, 16);
             }
             return;
         }
-        pos += size;
+        pos += box.size;
     }
 }
 
