@@ -102,7 +102,7 @@ void MoovAhead(int h) {
 void AviAhead(int h) {
     uint64_t pos = 12;
     for (int i = 0; i < kMaxTopLevel; ++i) {
-        uint8_t b[12];
+        uint8_t b[12] = {};
         if (ReadSomeAt(h, pos, b, sizeof b) < 8) return;
         const uint64_t size = ReadLE32(b + 4);
         if (BytesEqual(b, "LIST", 4) && BytesEqual(b + 8, "hdrl", 4)) ReadAhead(h, pos, Capped(size + 8, kBoxAhead));
