@@ -434,6 +434,14 @@ bool OpenedFileSize(int h, const char* path, uint64_t* size) {
     return MEx_fsize(path, size);
 }
 
+OpenedFile::OpenedFile(const char* path) : h_(path != nullptr ? MEx_fopen(path, "rb") : 0) {
+    sized_ = h_ != 0 && OpenedFileSize(h_, path, &size_);
+}
+
+OpenedFile::~OpenedFile() {
+    if (h_ != 0) MEx_fclose(h_);
+}
+
 uint32_t GetUINT32(int h, bool bLittle) {
     uint8_t b[4] = {0, 0, 0, 0};
     MEx_fread(b, 1, 4, h);

@@ -83,6 +83,24 @@ int GetFileExtension(const char* path, char* ext);
 // container name (szFormat, 128 bytes). 0, or MM_E_FAIL without an extension.
 int32_t CopyExtensionAsFormat(const char* path, char* szFormat);
 
+// A file a reader takes whole: opened by path for reading, its size known (see
+// OpenedFileSize), closed when the scope ends. ok() is false when either failed.
+class OpenedFile {
+public:
+    explicit OpenedFile(const char* path);
+    ~OpenedFile();
+    OpenedFile(const OpenedFile&) = delete;
+    OpenedFile& operator=(const OpenedFile&) = delete;
+    bool ok() const { return sized_; }
+    int handle() const { return h_; }
+    uint64_t size() const { return size_; }
+
+private:
+    int h_;
+    uint64_t size_ = 0;
+    bool sized_ = false;
+};
+
 // Closes a handle when the scope ends.
 class FileCloser {
 public:

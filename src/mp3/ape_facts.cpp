@@ -126,12 +126,11 @@ bool FindTag(int h, uint64_t fileSize, uint64_t* itemsAt, uint64_t* itemsSize, u
 }  // namespace
 
 bool ReadApeFacts(const char* path, TagFacts* tags, std::vector<PictureFacts>* pictures) {
-    const int h = MEx_fopen(path, "rb");
-    if (h == 0) return true;
-    FileCloser closer(h);
-    uint64_t size = 0, itemsAt = 0, itemsSize = 0;
+    const OpenedFile file(path);
+    const int h = file.handle();
+    uint64_t itemsAt = 0, itemsSize = 0;
     uint32_t count = 0;
-    if (!OpenedFileSize(h, path, &size) || !FindTag(h, size, &itemsAt, &itemsSize, &count)) return true;
+    if (!file.ok() || !FindTag(h, file.size(), &itemsAt, &itemsSize, &count)) return true;
     try {
         std::vector<uint8_t> b;
         if (!ReadExactAt(h, itemsAt, static_cast<size_t>(itemsSize), &b)) return true;

@@ -74,11 +74,10 @@ void YearFromDate(TagFacts* t) {
 bool ReadId3Facts(const char* path, TagFacts* tags, std::vector<PictureFacts>* pictures, uint64_t* tagEnd,
                   const TagFacts* beforeV1) {
     *tagEnd = 0;
-    const int h = path != nullptr ? MEx_fopen(path, "rb") : 0;
-    if (h == 0) return true;
-    FileCloser closer(h);
-    uint64_t fileSize = 0;
-    if (!OpenedFileSize(h, path, &fileSize)) return true;
+    const OpenedFile file(path);
+    if (!file.ok()) return true;
+    const int h = file.handle();
+    const uint64_t fileSize = file.size();
     *tagEnd = TagsEnd(h, fileSize);
     bool memory = true;
     try {
@@ -96,11 +95,10 @@ bool ReadId3Facts(const char* path, TagFacts* tags, std::vector<PictureFacts>* p
 }
 
 bool ReadId3FactsAt(const char* path, uint64_t offset, TagFacts* tags, std::vector<PictureFacts>* pictures) {
-    const int h = path != nullptr ? MEx_fopen(path, "rb") : 0;
-    if (h == 0) return true;
-    FileCloser closer(h);
-    uint64_t fileSize = 0;
-    if (!OpenedFileSize(h, path, &fileSize) || offset >= fileSize || TagLengthAt(h, offset, fileSize) == 0) return true;
+    const OpenedFile file(path);
+    const int h = file.handle();
+    const uint64_t fileSize = file.size();
+    if (!file.ok() || offset >= fileSize || TagLengthAt(h, offset, fileSize) == 0) return true;
     try {
         const bool memory = ReadId3V2Facts(h, fileSize, offset, tags, pictures);
         YearFromDate(tags);

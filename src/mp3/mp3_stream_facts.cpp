@@ -135,11 +135,10 @@ void CountFrames(const char* path, MediaFacts* f) {
 }  // namespace
 
 int32_t Mp3StreamFacts(const char* path, MediaFacts* f) {
-    const int h = MEx_fopen(path, "rb");
-    if (h == 0) return MM_E_FAIL;
-    FileCloser closer(h);
-    uint64_t size = 0;
-    if (!OpenedFileSize(h, path, &size)) return MM_E_FAIL;
+    const OpenedFile file(path);
+    if (!file.ok()) return MM_E_FAIL;
+    const int h = file.handle();
+    const uint64_t size = file.size();
     _FrameHeader_Info header;
     std::memset(&header, 0, sizeof header);
     uint8_t probe[128];

@@ -47,11 +47,13 @@ int32_t Give(const CodecAnswer& a, _MM_CODECTYPE* codec) {
 // The answer of this thread's last clip walk of a file by path.
 thread_local FileMemo<CodecAnswer> t_lastCodec;
 
-int32_t WalkForCodec(int h, const char* path, _MM_CODECTYPE* codec) {
+// The answer of a codec-only clip walk made by walk(&info).
+template <typename Walk>
+int32_t CodecOfWalk(const Walk& walk, _MM_CODECTYPE* codec) {
     _ME_ClipInfoEx info;
     std::memset(&info, 0, sizeof info);
     info.codecOnly = true;
-    const CodecAnswer a = AnswerOf(h != 0 ? Mp4WalkOpened(h, path, kModeClip, &info) : MM_E_FAIL, info);
+    const CodecAnswer a = AnswerOf(walk(&info), info);
     FreeTrackList(&info);
     return Give(a, codec);
 }
@@ -69,7 +71,7 @@ int32_t MP4_GetCodecType(const char* path, _MM_CODECTYPE* codec) {
     FileCloser closer(h);
     CodecAnswer recalled;
     if (t_lastCodec.Recall(FileMemoKey::Of(h), &recalled)) return Give(recalled, codec);
-    return WalkForCodec(h, path, codec);
+    return CodecOfWalk([&](_ME_ClipInfoEx* info) { return Mp4WalkOpened(h, path, kModeClip, info); }, codec);
 }
 
 }  // namespace metainfo
@@ -78,10 +80,5 @@ using namespace metainfo;
 
 extern "C" int32_t MP4_GetCodecTypeEx(int fd, _MM_CODECTYPE* codec) {
     if (codec == nullptr) return MM_E_INVALIDARG;
-    _ME_ClipInfoEx info;
-    std::memset(&info, 0, sizeof info);
-    info.codecOnly = true;
-    const CodecAnswer a = AnswerOf(MP4_GetMediaInfoFd(fd, kModeClip, &info), info);
-    FreeTrackList(&info);
-    return Give(a, codec);
+    return CodecOfWalk([&](_ME_ClipInfoEx* info) { return MP4_GetMediaInfoFd(fd, kModeClip, info); }, codec);
 }

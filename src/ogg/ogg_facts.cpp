@@ -139,11 +139,10 @@ void FillFacts(int h, uint64_t fileSize, Walk* w, MediaFacts* facts) {
 }
 
 int32_t ReadOgg(const char* path, MediaFacts* facts) {
-    const int h = MEx_fopen(path, "rb");
-    if (h == 0) return MM_E_FAIL;
-    FileCloser closer(h);
-    uint64_t fileSize = 0;
-    if (!OpenedFileSize(h, path, &fileSize)) return MM_E_FAIL;
+    const OpenedFile file(path);
+    if (!file.ok()) return MM_E_FAIL;
+    const int h = file.handle();
+    const uint64_t fileSize = file.size();
     Walk w;
     WalkHeaders(h, fileSize, &w);
     bool any = false;
@@ -157,14 +156,11 @@ int32_t ReadOgg(const char* path, MediaFacts* facts) {
 
 bool OggPictureBytes(const char* path, uint32_t ordinal, std::vector<uint8_t>* bytes) {
     try {
-        const int h = MEx_fopen(path, "rb");
-        if (h == 0) return false;
-        FileCloser closer(h);
-        uint64_t fileSize = 0;
-        if (!OpenedFileSize(h, path, &fileSize)) return false;
+        const OpenedFile file(path);
+        if (!file.ok()) return false;
         Walk w;
         w.pictures.want = ordinal;
-        WalkHeaders(h, fileSize, &w);
+        WalkHeaders(file.handle(), file.size(), &w);
         if (ordinal >= w.pictures.list.size()) return false;
         *bytes = std::move(w.pictures.bytes);
         return true;

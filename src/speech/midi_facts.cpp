@@ -136,13 +136,11 @@ int32_t ReadSong(const std::vector<uint8_t>& b, MediaFacts* facts) {
 }  // namespace
 
 int32_t MidiFacts(const char* path, MediaFacts* facts) {
-    const int h = MEx_fopen(path, "rb");
-    if (h == 0) return MM_E_FAIL;
-    FileCloser closer(h);
-    uint64_t size = 0;
+    const OpenedFile file(path);
     std::vector<uint8_t> b;
     try {
-        if (!OpenedFileSize(h, path, &size) || size > kMaxFile || !ReadExactAt(h, 0, static_cast<size_t>(size), &b))
+        if (!file.ok() || file.size() > kMaxFile ||
+            !ReadExactAt(file.handle(), 0, static_cast<size_t>(file.size()), &b))
             return MM_E_FAIL;
         return ReadSong(b, facts);
     } catch (const std::bad_alloc&) {
